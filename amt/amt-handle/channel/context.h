@@ -1,0 +1,67 @@
+#pragma once
+
+#include <atomic>
+#include <stdint.h>
+
+#include "amt/amt-buf.h"
+#include "amt/amt-handle/channel/worker.h"
+#include "pub/pty/pty.h"
+
+/* Command ids 0 to 254 have a handler slot. */
+constexpr uint32_t AMT_HANDLE_FUNC_COUNT = 255;
+
+/*
+ * The one hub record: threads, descriptors, buffers and handler tables. Zeroed at start-up before any thread exists.
+ * A descriptor of 0 or less is closed. Each buffer belongs to the one reader thread that fills it.
+ */
+struct handle_context_st
+{
+    amt_worker_st m_app_reader;
+    amt_worker_st m_pc_reader;
+    amt_worker_st m_modem_reader;
+    amt_worker_st m_usb_monitor;
+    pub_pty_st m_pty;             /* the app's pseudo-terminal */
+    std::atomic<int> m_fd_pc;     /* PC serial port */
+    std::atomic<int> m_fd_at;     /* AT-mux tty of the modem: the AT command channel */
+    std::atomic<int> m_fd_modem;  /* modem data tty */
+    amt_buf_st m_req;             /* what the PC or the app has sent; the two paths never run together */
+    uint8_t m_req_end;            /* always 0: text searches in m_req stop here */
+    amt_buf_st m_rsp_pc;          /* responses to the PC */
+    amt_buf_st m_rsp_app;         /* responses to the app */
+    amt_buf_st m_modem;           /* what the modem has sent and the PC has not got yet */
+    uint8_t m_modem_end;          /* always 0: text searches in m_modem stop here */
+    amt_buf_st m_pc;              /* the PC request without its envelope */
+    amt_handle_func m_handle_pc_func_a[AMT_HANDLE_FUNC_COUNT];
+    amt_handle_func m_handle_app_func_a[AMT_HANDLE_FUNC_COUNT];
+};
+extern handle_context_st g_handle_context;
+
+/* The manufacturing-test modes the hub can be in. */
+constexpr int AMT_MODE_1 = 1; /* PC path, packets seen */
+constexpr int AMT_MODE_3 = 3; /* packet path running */
+constexpr int AMT_MODE_4 = 4; /* PC path, AT text seen */
+
+/* States of the USB link. */
+constexpr uint8_t AMT_USB_DISCONNECTED = 0;
+constexpr uint8_t AMT_USB_CONFIGURED = 1;
+constexpr uint8_t AMT_USB_OTHER = 2;
+constexpr uint8_t AMT_USB_UNKNOWN = 255;
+
+/* Process-wide state beside the context: small numbers that several threads touch. */
+struct handle_state_st
+{
+    std::atomic<int> m_amt_mode;
+    std::atomic<int> m_is_normal_mode; /* the argument of amt_handle_init, stored when init succeeded */
+    std::atomic<int> m_is_no_modem;    /* 1 when the AT device could not be opened */
+    std::atomic<uint8_t> m_usb_state;
+};
+extern handle_state_st g_handle_state;
+
+/* Zeroes the whole context and its tables. Requires that no worker runs. */
+void amt_handle_clear_context();
+
+/* Zeroes a whole buffer. */
+void amt_handle_clear_buf(amt_buf_st *buf_ptr);
+
+/* Closes the descriptor if it is open (above 0) and marks it closed. Safe against two threads doing it at once. */
+void amt_handle_close_fd(std::atomic<int> *fd_ptr);

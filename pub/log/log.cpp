@@ -1,0 +1,90 @@
+#include "pub/log/log.h"
+
+#include <errno.h>
+#include <stdarg.h>
+#include <stdio.h>
+
+#include "platform/include/android/log.h"
+
+namespace {
+
+/* Holds the longest text there is: a whole 4096-byte receive area after its title. */
+constexpr uint32_t TEXT_SIZE = 4608;
+constexpr uint32_t FLAG_TEXT_SIZE = 32;
+
+/* Set while this thread is inside the platform's log, whose locks a signal handler must not meet again. */
+thread_local volatile bool t_is_logging = false;
+
+void write_record(const char *tag, const char *text)
+{
+    if (t_is_logging) {
+        return;
+    }
+    t_is_logging = true;
+    __android_log_print(ANDROID_LOG_DEBUG, tag, "%s", text);
+    t_is_logging = false;
+}
+
+} // namespace
+
+void pub_log_print(const char *tag, const char *format, ...)
+{
+    const int saved_errno = errno;
+    char text_a[TEXT_SIZE];
+    va_list args;
+    va_start(args, format);
+    vsnprintf(text_a, sizeof(text_a), format, args);
+    va_end(args);
+    write_record(tag, text_a);
+    errno = saved_errno;
+}
+
+void pub_log_entry(const pub_log_source_st &source, const char *func)
+{
+    PUB_LOG(source, "%s()", func);
+}
+
+void pub_log_error(const pub_log_source_st &source, int line, const char *func, int error_code)
+{
+    PUB_LOG(source, "FILE-%s, LINE-%d, FUNC-%s(), error_code=%d, errno=%d", source.m_name_ptr, line, func, error_code,
+            errno);
+}
+
+void pub_log_sys_call(const pub_log_source_st &source, const char *call)
+{
+    PUB_LOG(source, "sys call: %s() failed! errno = %d", call, errno);
+}
+
+void pub_log_flags(const pub_log_source_st &source, std::initializer_list<bool> fault_list)
+{
+    char text_a[FLAG_TEXT_SIZE] = {};
+    uint32_t used = 0;
+    for (const bool fault : fault_list) {
+        if (used + sizeof(", 1") > sizeof(text_a)) {
+            break;
+        }
+        if (used != 0) {
+            text_a[used++] = ',';
+            text_a[used++] = ' ';
+        }
+        text_a[used++] = fault ? '1' : '0';
+    }
+    PUB_LOG(source, "%s", text_a);
+}
+
+void pub_log_dump(const pub_log_source_st &source, const char *title, const uint8_t *data, uint32_t length)
+{
+    static constexpr char digit_a[] = "0123456789ABCDEF";
+    char text_a[PUB_LOG_DUMP_SIZE * 2 + sizeof("...")];
+    const uint32_t shown = length < PUB_LOG_DUMP_SIZE ? length : PUB_LOG_DUMP_SIZE;
+    char *out = text_a;
+    for (uint32_t i = 0; i < shown; i++) {
+        *out++ = digit_a[data[i] >> 4];
+        *out++ = digit_a[data[i] & 0x0F];
+    }
+    for (const char *dot = shown < length ? "..." : ""; *dot != '\0'; dot++) {
+        *out++ = *dot;
+    }
+    *out = '\0';
+    PUB_LOG(source, "%s: (data_len = %u) -- %s", title, length, text_a);
+}
