@@ -1,0 +1,20 @@
+#pragma once
+
+#include <stdint.h>
+
+/* One signal, as the handset's kernel numbers it. */
+struct pub_util_signal_st
+{
+    int32_t m_number;
+    const char *m_name_ptr; /* null in the row that ends the table */
+    char m_action; /* default: T terminate, A abort with core, I ignore, C continue, S stop, ? not classified
+                    */
+    const char *m_description_ptr;
+};
+
+/* All signals in ascending order; a number with two names has two rows, the usual name first. */
+extern const pub_util_signal_st pub_util_signal_table[];
+
+/* The usual name of the signal, "" for a number that is not in the table. Logs nothing; fit for signal
+ * handlers. */
+const char *pub_util_get_signal_name(int signal_number);
