@@ -1,0 +1,255 @@
+#include "amt/amt-handle/request/identity-store.h"
+
+#include <errno.h>
+#include <stdio.h>
+#include <stdlib.h>
+#include <string.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include "amt/amt-handle/channel/identity-slots.h"
+#include "amt/amt-handle/request/factory-file.h"
+#include "amt/amt-handle/request/line-file.h"
+#include "amt/amt-log.h"
+#include "pub/error.h"
+
+/* A handset whose system was reflashed from an older layout has its Bluetooth address here. */
+static constexpr const char *BT_ADDRESS_FILE_2 = "/mnt/opl/nvm/BT_Address.txt";
+
+static constexpr mode_t FOLDER_MODE = 0777;
+static constexpr uint32_t FOLDER_COMMAND_SIZE = 100;
+
+/* The modem channel whose texts have files of their own. */
+static constexpr uint8_t SECOND_CHANNEL = 1;
+
+namespace {
+
+/* One kind of identity text: where it is saved, and what the log calls it. */
+struct identity_file_st
+{
+    int m_kind;
+    const char *m_name_ptr;
+    const char *m_path_ptr;
+    const char *m_second_path_ptr;
+};
+
+constexpr identity_file_st g_identity_file_a[] = {
+    {AMT_IDENTITY_IMEI, "imei", "/amt/imei.txt", "/amt/imei-2.txt"},
+    {AMT_IDENTITY_SN, "sn", "/amt/sn.txt", AMT_PCBA_SN_FILE},
+};
+
+} // namespace
+
+/* The open line is one text for readers and writers, under the name of the operation that failed. */
+static int fail_open(int line, const char *func, const char *path)
+{
+    pub_log_error(g_amt_handle_log, line, func, PUB_ERR_FILE);
+    PUB_LOG(g_amt_handle_log, "open(\"%s\") fail: %d - %s", path, errno, strerror(errno));
+    return PUB_ERR_FILE;
+}
+
+/* Reads the first line of the file into line_ptr (AMT_LINE_SIZE bytes), for the operation of that name. */
+static int read_first_line(int line, const char *func, const char *path, char *line_ptr)
+{
+    switch (amt_line_file_read(path, line_ptr)) {
+    case amt_line_step_en::OPEN_FAILED:
+        return fail_open(line, func, path);
+    case amt_line_step_en::READ_FAILED:
+        pub_log_error(g_amt_handle_log, line, func, PUB_ERR_FILE);
+        PUB_LOG(g_amt_handle_log, "read fail: %d - %s", errno, strerror(errno));
+        return PUB_ERR_FILE;
+    case amt_line_step_en::DONE:
+        break;
+    }
+    return PUB_ERR_NONE;
+}
+
+int amt_write_pcba_sn(const char *text, const char *path)
+{
+    PUB_LOG_ENTRY(g_amt_handle_log);
+    if (text == nullptr || text[0] == '\0') {
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
+        PUB_LOG_FLAGS(g_amt_handle_log, text == nullptr, text != nullptr);
+        return PUB_ERR_PARAM;
+    }
+    int ret_val = PUB_ERR_NONE;
+    switch (amt_factory_file_put(path, text)) {
+    case amt_factory_step_en::OPEN_FAILED:
+        return fail_open(__LINE__, __func__, path);
+    case amt_factory_step_en::WRITE_FAILED:
+        ret_val = PUB_ERR_FILE;
+        PUB_LOG_ERROR(g_amt_handle_log, ret_val);
+        PUB_LOG(g_amt_handle_log, "fputs fail: %d - %s", errno, strerror(errno));
+        break;
+    case amt_factory_step_en::DONE:
+        PUB_LOG(g_amt_handle_log, "write pcba-sn: %s", text);
+        break;
+    }
+    amt_factory_file_sync();
+    return ret_val;
+}
+
+int amt_read_pcba_sn(char *buf)
+{
+    PUB_LOG_ENTRY(g_amt_handle_log);
+    memset(buf, 0, AMT_PCBA_SN_SIZE);
+    char line_a[AMT_LINE_SIZE];
+    const int ret_val = read_first_line(__LINE__, __func__, AMT_PCBA_SN_FILE, line_a);
+    if (ret_val != PUB_ERR_NONE) {
+        return ret_val;
+    }
+    amt_line_copy(buf, AMT_PCBA_SN_SIZE, line_a);
+    PUB_LOG(g_amt_handle_log, "read pcba-sn: %s", buf);
+    return PUB_ERR_NONE;
+}
+
+int amt_read_data_from_file(char *buf, uint32_t size, const char *path)
+{
+    PUB_LOG_ENTRY(g_amt_handle_log);
+    if (buf == nullptr || size == 0 || path == nullptr) {
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
+        PUB_LOG_FLAGS(g_amt_handle_log, buf == nullptr, size == 0, path == nullptr);
+        return PUB_ERR_PARAM;
+    }
+    memset(buf, 0, size);
+    char line_a[AMT_LINE_SIZE];
+    const int ret_val = read_first_line(__LINE__, __func__, path, line_a);
+    if (ret_val != PUB_ERR_NONE) {
+        return ret_val;
+    }
+    amt_line_copy(buf, size, line_a);
+    PUB_LOG(g_amt_handle_log, "read content: %s", buf);
+    return PUB_ERR_NONE;
+}
+
+static const identity_file_st *find_identity_file(int kind)
+{
+    for (const identity_file_st &file : g_identity_file_a) {
+        if (file.m_kind == kind) {
+            return &file;
+        }
+    }
+    return nullptr;
+}
+
+int handle_amt_imei_and_sn_save_file(int kind)
+{
+    PUB_LOG_ENTRY(g_amt_handle_log);
+    const identity_file_st *const file_ptr = find_identity_file(kind);
+    if (file_ptr == nullptr) {
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
+        PUB_LOG_FLAGS(g_amt_handle_log, true);
+        return PUB_ERR_PARAM;
+    }
+    char text_a[AMT_IDENTITY_TEXT_SIZE];
+    amt_identity_get_text(kind, text_a);
+    if (text_a[0] == '\0') {
+        return PUB_ERR_NONE;
+    }
+    const uint8_t channel = amt_identity_get_channel();
+    const int ret_val = amt_write_pcba_sn(text_a, channel == SECOND_CHANNEL ? file_ptr->m_second_path_ptr
+                                                                            : file_ptr->m_path_ptr);
+    PUB_LOG(g_amt_handle_log, "save %s to file. channel:%d; content:%s;", file_ptr->m_name_ptr, channel,
+            text_a);
+    if (ret_val != PUB_ERR_NONE) {
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        PUB_LOG(g_amt_handle_log, "write %s error.", file_ptr->m_name_ptr);
+        return PUB_ERR_FAIL;
+    }
+    PUB_LOG(g_amt_handle_log, "Writed %s to file success.", file_ptr->m_name_ptr);
+    return PUB_ERR_NONE;
+}
+
+const char *get_bt_addr_file()
+{
+    PUB_LOG_ENTRY(g_amt_handle_log);
+    for (const char *const path : {AMT_BT_ADDRESS_FILE, BT_ADDRESS_FILE_2}) {
+        if (access(path, F_OK) == 0) {
+            return path;
+        }
+    }
+    PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FILE);
+    PUB_LOG(g_amt_handle_log, "can not access file \"%s\" or \"%s\"", AMT_BT_ADDRESS_FILE, BT_ADDRESS_FILE_2);
+    return nullptr;
+}
+
+/* verb is a constant of this file; only the path is cut when both do not fit. */
+static void run_on_folder(const char *verb, const char *path)
+{
+    char command_a[FOLDER_COMMAND_SIZE];
+    snprintf(command_a, sizeof(command_a), "%s %s", verb, path);
+    const int ignored_status = system(command_a);
+    static_cast<void>(ignored_status);
+}
+
+int amt_make_folder(const char *path)
+{
+    PUB_LOG_ENTRY(g_amt_handle_log);
+    if (access(path, F_OK) == 0) {
+        PUB_LOG(g_amt_handle_log, "amt_make_folder: %s exist.\r\n", path);
+        return PUB_ERR_NONE;
+    }
+    PUB_LOG(g_amt_handle_log, "amt_make_folder: %s does not exist.\r\n", path);
+    if (mkdir(path, FOLDER_MODE) != 0) {
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FILE);
+        PUB_LOG(g_amt_handle_log, "amt_make_folder mkdir(%s) faild errno[%d] strerror[%s]", path, errno,
+                strerror(errno));
+        return PUB_ERR_FILE;
+    }
+    PUB_LOG(g_amt_handle_log, "amt_make_folder mkdir(%s) successfully", path);
+    run_on_folder("chgrp -R radio", path);
+    run_on_folder("chmod 766", path);
+    return PUB_ERR_NONE;
+}
+
+int amt_read_wifi_address(char *buf)
+{
+    PUB_LOG_ENTRY(g_amt_handle_log);
+    buf[0] = '\0';
+    char line_a[AMT_LINE_SIZE];
+    switch (amt_line_file_read(AMT_WIFI_ADDRESS_FILE, line_a)) {
+    case amt_line_step_en::OPEN_FAILED:
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        PUB_LOG(g_amt_handle_log, "open %s fail", AMT_WIFI_ADDRESS_FILE);
+        return PUB_ERR_FAIL;
+    case amt_line_step_en::READ_FAILED:
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        PUB_LOG(g_amt_handle_log, "read fail");
+        return PUB_ERR_FAIL;
+    case amt_line_step_en::DONE:
+        break;
+    }
+    const size_t length = strlen(line_a);
+    PUB_LOG(g_amt_handle_log, "wifi_addr_len: %d", static_cast<int>(length));
+    line_a[length > 0 ? length - 1 : 0] = '\0';
+    amt_line_copy(buf, AMT_WIFI_ADDRESS_SIZE, line_a);
+    return PUB_ERR_NONE;
+}
+
+int amt_write_wifi_address(const char *text)
+{
+    PUB_LOG_ENTRY(g_amt_handle_log);
+    if (text == nullptr || text[0] == '\0') {
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
+        PUB_LOG_FLAGS(g_amt_handle_log, text == nullptr, text != nullptr);
+        return PUB_ERR_PARAM;
+    }
+    int ret_val = PUB_ERR_NONE;
+    switch (amt_factory_file_put(AMT_WIFI_ADDRESS_FILE, text, "\n")) {
+    case amt_factory_step_en::OPEN_FAILED:
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        PUB_LOG(g_amt_handle_log, "open %s fail", AMT_WIFI_ADDRESS_FILE);
+        return PUB_ERR_FAIL;
+    case amt_factory_step_en::WRITE_FAILED:
+        ret_val = PUB_ERR_FILE;
+        PUB_LOG_ERROR(g_amt_handle_log, ret_val);
+        PUB_LOG_SYS_CALL(g_amt_handle_log, "fputs");
+        break;
+    case amt_factory_step_en::DONE:
+        /* The station's log readers know this text, and it is about this file in spite of its words. */
+        PUB_LOG(g_amt_handle_log, "write BT address: %s", text);
+        break;
+    }
+    amt_factory_file_sync();
+    return ret_val;
+}
