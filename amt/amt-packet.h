@@ -36,9 +36,15 @@
 
 constexpr uint8_t AMT_PACKET_HEAD = 0xBB;
 constexpr uint32_t AMT_PACKET_HEADER_SIZE = 6;
+constexpr uint32_t AMT_PACKET_HEAD_OFFSET = 2;
+constexpr uint32_t AMT_PACKET_CMD_OFFSET = 3;
+constexpr uint32_t AMT_PACKET_ATOM_LENGTH_OFFSET = 4;
 
 constexpr uint8_t AMT_ATOM_HEAD = 0xEE;
 constexpr uint32_t AMT_ATOM_HEADER_SIZE = 5;
+constexpr uint32_t AMT_ATOM_ID_OFFSET = 1;
+constexpr uint32_t AMT_ATOM_TYPE_OFFSET = 2;
+constexpr uint32_t AMT_ATOM_LENGTH_OFFSET = 3;
 constexpr uint8_t AMT_ATOM_TYPE_INT = 1;
 constexpr uint8_t AMT_ATOM_TYPE_STRING = 2;
 constexpr uint8_t AMT_ATOM_TYPE_BYTES = 3;
@@ -47,6 +53,10 @@ constexpr uint16_t AMT_ATOM_INT_SIZE = 4;
 constexpr uint16_t AMT_ATOM_BOOL_SIZE = 1;
 
 constexpr uint32_t AMT_ENVELOPE_MAGIC = 0xDDCCBBAAU;
+constexpr uint8_t AMT_ENVELOPE_FLAG_A = 2;
+constexpr uint8_t AMT_ENVELOPE_FLAG_B = 0;
+constexpr uint32_t AMT_ENVELOPE_LENGTH_OFFSET = 4;
+constexpr uint32_t AMT_ENVELOPE_FLAG_OFFSET = 8;
 constexpr uint32_t AMT_ENVELOPE_HEAD_SIZE = 12;
 constexpr uint32_t AMT_ENVELOPE_CHECKSUM_SIZE = 4;
 constexpr uint32_t AMT_ENVELOPE_OVERHEAD = AMT_ENVELOPE_HEAD_SIZE + AMT_ENVELOPE_CHECKSUM_SIZE;
@@ -57,8 +67,7 @@ constexpr uint32_t AMT_CHECKSUM_FAILED = 0xFFFFFFFFU;
 /* Zeroes size bytes at buf. Nothing happens for an absent buf. */
 void amt_packet_clear(void *buf, uint32_t size);
 
-/* Starts an empty packet with the command id, the rest of the area zeroed. Returns the atom length, which is
- * 0. */
+/* Starts an empty packet with the command id and zeroes the rest of the area. Returns the atom length, 0. */
 uint16_t amt_packet_init(uint8_t *packet, uint8_t cmd);
 
 /* The command id; 0 for an absent packet. */
@@ -76,6 +85,10 @@ uint8_t *amt_packet_get_end(uint8_t *packet);
 /* Adds n to the total length, which wraps at 16 bits, and returns the new atom length. 0 for an absent
  * packet. */
 uint16_t amt_packet_add_length(uint8_t *packet, uint16_t n);
+
+/* Whether an atom with a value of n bytes still fits the area behind the packet's end. False for an absent
+ * packet. */
+bool amt_packet_has_room(const uint8_t *packet, uint32_t n);
 
 /*
  * The adders append one atom. One that would pass the end of the area is not added: the packet stays as it

@@ -1,0 +1,198 @@
+#include <string.h>
+
+#include "amt/amt-byte-order.h"
+#include "amt/amt-command.h"
+#include "amt/amt-convert.h"
+#include "amt/amt-log.h"
+#include "amt/amt-packet.h"
+#include "pub/error.h"
+
+namespace {
+
+/* What one step reads from a block. */
+enum class field_e
+{
+    NONE,
+    INT,          /* 4 bytes, big-endian */
+    BOOL,         /* 1 byte */
+    BYTES,        /* a fixed count of bytes */
+    BYTES_U16_LE, /* a count, then so many bytes */
+    BYTES_U32_LE,
+};
+
+struct step_st
+{
+    field_e m_field = field_e::NONE;
+    uint8_t m_atom_id = 0;
+    uint32_t m_count = 0; /* of BYTES */
+};
+
+/* Two fields are the most a response has. Only the last one's result counts. */
+constexpr uint32_t STEP_COUNT = 2;
+
+struct row_st
+{
+    uint8_t m_cmd;
+    step_st m_step_a[STEP_COUNT];
+};
+
+constexpr uint8_t RESULT_ATOM_ID = 1;
+
+/* What follows the result code, by command. A command without a row has nothing more. */
+constexpr row_st g_row_a[] = {
+    {AMT_READIMEI_RSPCMD, {{field_e::BYTES, 21, 15}}},
+    {AMT_RXDATA_RSPCMD, {{field_e::INT, 12}, {field_e::BYTES_U32_LE, 4}}},
+    {AMT_IQPOWER_RSPCMD, {{field_e::INT, 13}}},
+    {AMT_VERSION_RSPCMD, {{field_e::INT, 19}, {field_e::BYTES, 18, 64}}},
+    {AMT_READTABLE_MEMORY_RSPCMD, {{field_e::BYTES_U32_LE, 4}}},
+    {AMT_READTABLE_FLASH_RSPCMD, {{field_e::BYTES_U32_LE, 4}}},
+    {AMT_GSM_READTABLE_MEMORY_RSPCMD, {{field_e::BYTES_U32_LE, 4}}},
+    {AMT_READ_RFADC_RSPCMD, {{field_e::INT, 24}}},
+    {AMT_IQSERIAL_RSPCMD, {{field_e::BYTES_U32_LE, 34}}},
+    {AMT_USIMCHECK_RSPCMD, {{field_e::BOOL, 41}}},
+    {AMT_GSM_TRANSPARENT_CONTROL_RSPCMD, {{field_e::BYTES_U32_LE, 43}}},
+    {AMT_GSM_READTABLE_FLAG_FLASH_RSPCMD, {{field_e::BOOL, 44}}},
+    {AMT_DSP_TRANSPARENT_CONTROL_RSPCMD, {{field_e::BYTES_U16_LE, 62}}},
+    {AMT_DSP_TRANSPARENT_CONTROL_INDCMD, {{field_e::BYTES_U16_LE, 62}}},
+};
+
+/*
+ * A count that fits the packet never leads the cursor out of the area: the packet has more in front of the
+ * bytes than the block ever has.
+ */
+constexpr uint32_t MOST_BEFORE_BYTES = sizeof(uint8_t) + 3 * sizeof(uint32_t);
+static_assert(AMT_PACKET_HEADER_SIZE + 2 * AMT_ATOM_HEADER_SIZE + AMT_ATOM_INT_SIZE >= MOST_BEFORE_BYTES);
+
+const row_st *find_row(uint8_t cmd)
+{
+    for (const row_st &row : g_row_a) {
+        if (row.m_cmd == cmd) {
+            return &row;
+        }
+    }
+    return nullptr;
+}
+
+bool is_target_absent(const uint8_t **cursor)
+{
+    return cursor == nullptr || *cursor == nullptr;
+}
+
+uint32_t read_count(const uint8_t **cursor, const step_st &step)
+{
+    uint32_t count = step.m_count;
+    if (step.m_field == field_e::BYTES_U16_LE) {
+        count = amt_get_u16_le(*cursor);
+        *cursor += sizeof(uint16_t);
+    } else if (step.m_field == field_e::BYTES_U32_LE) {
+        count = amt_get_u32_le(*cursor);
+        *cursor += sizeof(uint32_t);
+    }
+    return count;
+}
+
+int run_step(const uint8_t **cursor, uint8_t *packet, const step_st &step)
+{
+    switch (step.m_field) {
+    case field_e::INT:
+        return rsp_at_data_2_amt_data_atom_int(cursor, packet, step.m_atom_id);
+    case field_e::BOOL:
+        return rsp_at_data_2_amt_data_atom_bool(cursor, packet, step.m_atom_id);
+    case field_e::BYTES:
+    case field_e::BYTES_U16_LE:
+    case field_e::BYTES_U32_LE: {
+        const uint32_t count = read_count(cursor, step);
+        return rsp_at_data_2_amt_data_atom_byte(cursor, packet, count, step.m_atom_id);
+    }
+    case field_e::NONE:
+        break;
+    }
+    return PUB_ERR_NONE;
+}
+
+int run_row(const uint8_t **cursor, uint8_t *packet, const row_st &row)
+{
+    int result = PUB_ERR_NONE;
+    for (const step_st &step : row.m_step_a) {
+        if (step.m_field != field_e::NONE) {
+            result = run_step(cursor, packet, step);
+        }
+    }
+    return result;
+}
+
+/* The check of the steps that read a field of fixed size. The last flag is the atom id's: any id will do. */
+int check_step(int line, const char *func, const uint8_t **cursor, const uint8_t *packet)
+{
+    if (!is_target_absent(cursor) && packet != nullptr) {
+        return PUB_ERR_NONE;
+    }
+    pub_log_error(g_amt_convert_log, line, func, PUB_ERR_PARAM);
+    PUB_LOG_FLAGS(g_amt_convert_log, cursor == nullptr, is_target_absent(cursor), packet == nullptr, false);
+    return PUB_ERR_PARAM;
+}
+
+} // namespace
+
+int rsp_at_data_2_amt_data_atom_int(const uint8_t **cursor, uint8_t *packet, uint8_t atom_id)
+{
+    if (check_step(__LINE__, __func__, cursor, packet) != PUB_ERR_NONE) {
+        return PUB_ERR_PARAM;
+    }
+    amt_packet_add_int(packet, atom_id, static_cast<int32_t>(amt_get_u32_be(*cursor)));
+    *cursor += AMT_ATOM_INT_SIZE;
+    return PUB_ERR_NONE;
+}
+
+int rsp_at_data_2_amt_data_atom_bool(const uint8_t **cursor, uint8_t *packet, uint8_t atom_id)
+{
+    if (check_step(__LINE__, __func__, cursor, packet) != PUB_ERR_NONE) {
+        return PUB_ERR_PARAM;
+    }
+    amt_packet_add_bool(packet, atom_id, **cursor);
+    *cursor += AMT_ATOM_BOOL_SIZE;
+    return PUB_ERR_NONE;
+}
+
+int rsp_at_data_2_amt_data_atom_byte(const uint8_t **cursor, uint8_t *packet, uint32_t count, uint8_t atom_id)
+{
+    if (is_target_absent(cursor) || packet == nullptr || count == 0) {
+        PUB_LOG_ERROR(g_amt_convert_log, PUB_ERR_PARAM);
+        PUB_LOG_FLAGS(g_amt_convert_log, cursor == nullptr, is_target_absent(cursor), packet == nullptr,
+                      count == 0, false);
+        return PUB_ERR_PARAM;
+    }
+    if (!amt_packet_has_room(packet, count)) {
+        PUB_LOG_ERROR(g_amt_convert_log, PUB_ERR_FAIL);
+        PUB_LOG(g_amt_convert_log, "atom of %u bytes does not fit the packet", count);
+        return PUB_ERR_FAIL;
+    }
+    amt_packet_add_bytes(packet, atom_id, *cursor, static_cast<uint16_t>(count));
+    *cursor += count;
+    return PUB_ERR_NONE;
+}
+
+int amt_convert_rsp_at_data_2_amt_data(const uint8_t *block, uint32_t len, uint8_t *packet, uint32_t capacity)
+{
+    PUB_LOG_ENTRY(g_amt_convert_log);
+    if (block == nullptr || len == 0 || packet == nullptr || capacity != AMT_PACKET_SIZE) {
+        PUB_LOG_ERROR(g_amt_convert_log, PUB_ERR_PARAM);
+        PUB_LOG_FLAGS(g_amt_convert_log, block == nullptr, len == 0, packet == nullptr,
+                      capacity != AMT_PACKET_SIZE);
+        return PUB_ERR_PARAM;
+    }
+    /* The fields may claim more than the block has: what lies behind it reads as zero bytes, to the end of
+     * the area. */
+    uint8_t area_a[AMT_PACKET_SIZE] = {};
+    memcpy(area_a, block, len < sizeof(area_a) ? len : sizeof(area_a));
+
+    const uint8_t *cursor = area_a;
+    const uint8_t cmd = *cursor++;
+    amt_packet_init(packet, cmd);
+    const int result = rsp_at_data_2_amt_data_atom_int(&cursor, packet, RESULT_ATOM_ID);
+    if (result != PUB_ERR_NONE || cursor >= area_a + len) {
+        return result;
+    }
+    const row_st *row_ptr = find_row(cmd);
+    return row_ptr == nullptr ? PUB_ERR_NONE : run_row(&cursor, packet, *row_ptr);
+}
