@@ -46,8 +46,8 @@ void pub_log_entry(const pub_log_source_st &source, const char *func)
 
 void pub_log_error(const pub_log_source_st &source, int line, const char *func, int error_code)
 {
-    PUB_LOG(source, "FILE-%s, LINE-%d, FUNC-%s(), error_code=%d, errno=%d", source.m_name_ptr, line, func, error_code,
-            errno);
+    PUB_LOG(source, "FILE-%s, LINE-%d, FUNC-%s(), error_code=%d, errno=%d", source.m_name_ptr, line, func,
+            error_code, errno);
 }
 
 void pub_log_sys_call(const pub_log_source_st &source, const char *call)
@@ -75,7 +75,7 @@ void pub_log_flags(const pub_log_source_st &source, std::initializer_list<bool> 
 void pub_log_dump(const pub_log_source_st &source, const char *title, const uint8_t *data, uint32_t length)
 {
     static constexpr char digit_a[] = "0123456789ABCDEF";
-    char text_a[PUB_LOG_DUMP_SIZE * 2 + sizeof("...")];
+    char text_a[2 * sizeof(uint8_t[PUB_LOG_DUMP_SIZE]) + sizeof("...")];
     const uint32_t shown = length < PUB_LOG_DUMP_SIZE ? length : PUB_LOG_DUMP_SIZE;
     char *out = text_a;
     for (uint32_t i = 0; i < shown; i++) {

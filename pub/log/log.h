@@ -6,9 +6,9 @@
 /*
  * Every log text of the daemon and its library is made here: one record a call, at debug priority.
  *
- * All operations preserve errno, so a run of lines about one failure shows the failing call's errno in each of them.
- * They may be called from a signal handler: a record that would interrupt the same thread in the middle of another
- * record is dropped instead of waiting for a lock that its own thread holds.
+ * All operations preserve errno, so a run of lines about one failure shows the failing call's errno in each
+ * of them. They may be called from a signal handler: a record that would interrupt the same thread in the
+ * middle of another record is dropped instead of waiting for a lock that its own thread holds.
  */
 
 /* Where a record comes from: the log tag and the source name shown in error lines. */
@@ -43,8 +43,8 @@ void pub_log_flags(const pub_log_source_st &source, std::initializer_list<bool> 
 /* Channel traffic: title, length and the first PUB_LOG_DUMP_SIZE bytes in hexadecimal. */
 void pub_log_dump(const pub_log_source_st &source, const char *title, const uint8_t *data, uint32_t length);
 
-#define PUB_LOG(source, ...)             pub_log_print((source).m_tag_ptr, __VA_ARGS__)
-#define PUB_LOG_ENTRY(source)            pub_log_entry(source, __func__)
-#define PUB_LOG_ERROR(source, code)      pub_log_error(source, __LINE__, __func__, code)
-#define PUB_LOG_SYS_CALL(source, call)   pub_log_sys_call(source, call)
-#define PUB_LOG_FLAGS(source, ...)       pub_log_flags(source, {__VA_ARGS__})
+#define PUB_LOG(source, ...)           pub_log_print((source).m_tag_ptr, __VA_ARGS__)
+#define PUB_LOG_ENTRY(source)          pub_log_entry(source, __func__)
+#define PUB_LOG_ERROR(source, code)    pub_log_error(source, __LINE__, __func__, code)
+#define PUB_LOG_SYS_CALL(source, call) pub_log_sys_call(source, call)
+#define PUB_LOG_FLAGS(source, ...)     pub_log_flags(source, {__VA_ARGS__})

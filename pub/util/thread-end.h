@@ -5,9 +5,9 @@
 /*
  * When a worker thread may be ended by SIGUSR1.
  *
- * A thread that is ended in the middle of a log call or an allocation would take the lock of it along, and whoever
- * shuts the process down would wait for that lock for ever. So a worker defers its end while it works and allows it
- * while it waits. A thread that never calls these is ended wherever the signal finds it.
+ * A thread that is ended in the middle of a log call or an allocation would take the lock of it along, and
+ * whoever shuts the process down would wait for that lock for ever. So a worker defers its end while it works
+ * and allows it while it waits. A thread that never calls these is ended wherever the signal finds it.
  */
 
 /* From here on the signal only leaves a note. */
@@ -17,8 +17,8 @@ void pub_util_defer_thread_end();
 void pub_util_allow_thread_end();
 
 /*
- * From here on, for ever, the signal does nothing on this thread: it is ending the process itself, or is the main
- * thread. Deferring and allowing have no effect any more.
+ * From here on, for ever, the signal does nothing on this thread: it is ending the process itself, or is the
+ * main thread. Deferring and allowing have no effect any more.
  */
 void pub_util_forbid_thread_end();
 

@@ -1,0 +1,77 @@
+#include "pub/util/util.h"
+
+#include <stdio.h>
+#include <string.h>
+#include <sys/statfs.h>
+
+#include "pub/cfg/cfg.h"
+#include "pub/error.h"
+#include "pub/log/log.h"
+
+namespace {
+
+constexpr uint32_t LINE_SIZE = 200;
+
+/* Whether a line of the list of mounts contains the text. */
+bool is_listed(FILE *mounts, const char *text)
+{
+    char line_a[LINE_SIZE + 1] = {}; /* one more zero byte behind a line that fills the rest */
+    uint32_t length = 0;
+    int is_eof = 0;
+    while (is_eof == 0) {
+        pub_cfg_get_line(mounts, line_a, LINE_SIZE, &length, &is_eof);
+        if (strstr(line_a, text) != nullptr) {
+            return true;
+        }
+    }
+    return false;
+}
+
+void store_kib(uint32_t *out_ptr, uint64_t block_size, uint64_t blocks)
+{
+    if (out_ptr != nullptr) {
+        *out_ptr = static_cast<uint32_t>(block_size * blocks / 1024);
+    }
+}
+
+} // namespace
+
+int pub_util_get_mount_fs_info(const char *mount_point, uint32_t *total_ptr, uint32_t *used_ptr,
+                               uint32_t *available_ptr)
+{
+    PUB_LOG_ENTRY(g_pub_util_log);
+    const bool has_no_output = total_ptr == nullptr && used_ptr == nullptr && available_ptr == nullptr;
+    if (mount_point == nullptr || *mount_point == '\0' || has_no_output) {
+        PUB_LOG_ERROR(g_pub_util_log, PUB_ERR_PARAM);
+        PUB_LOG_FLAGS(g_pub_util_log, mount_point == nullptr, mount_point != nullptr && *mount_point == '\0',
+                      has_no_output);
+        return PUB_ERR_PARAM;
+    }
+
+    bool is_mounted = false;
+    FILE *mounts = fopen("/proc/mounts", "re");
+    if (mounts == nullptr) {
+        PUB_LOG_SYS_CALL(g_pub_util_log, "fopen");
+        PUB_LOG_ERROR(g_pub_util_log, PUB_ERR_SYS_CALL);
+    } else {
+        is_mounted = is_listed(mounts, mount_point);
+        fclose(mounts);
+    }
+    if (!is_mounted) {
+        PUB_LOG_ERROR(g_pub_util_log, PUB_ERR_NOT_FOUND);
+        PUB_LOG(g_pub_util_log, "file system \"%s\" has not been mounted", mount_point);
+        return PUB_ERR_NOT_FOUND;
+    }
+
+    struct statfs64 info = {};
+    if (statfs64(mount_point, &info) != 0) {
+        PUB_LOG_SYS_CALL(g_pub_util_log, "statfs");
+        PUB_LOG_ERROR(g_pub_util_log, PUB_ERR_SYS_CALL);
+        return PUB_ERR_FILE;
+    }
+    const uint64_t block_size = static_cast<uint64_t>(info.f_bsize);
+    store_kib(total_ptr, block_size, info.f_blocks);
+    store_kib(used_ptr, block_size, info.f_blocks - info.f_bavail);
+    store_kib(available_ptr, block_size, info.f_bavail);
+    return PUB_ERR_NONE;
+}
