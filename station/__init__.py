@@ -1,0 +1,1 @@
+"""The test station's side of the handset's manufacturing-test protocol."""

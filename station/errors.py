@@ -1,0 +1,153 @@
+"""What can go wrong at the station, each with the exit status that the command ends with."""
+
+from __future__ import annotations
+
+from enum import Enum
+from typing import Any, Sequence
+
+EXIT_PASS = 0
+EXIT_REFUSED = 1
+EXIT_USAGE = 2
+EXIT_NO_PORT = 3
+EXIT_BUSY = 4
+EXIT_NO_ANSWER = 5
+EXIT_BAD_FRAME = 6
+EXIT_INTERRUPTED = 130
+
+
+class WireError(Exception):
+    """Bytes that are not what the protocol allows, or a value that it cannot carry."""
+
+
+class TruncatedError(WireError):
+    """The bytes end before what they announce."""
+
+
+class MagicError(WireError):
+    """A frame does not begin with the magic word."""
+
+
+class LengthError(WireError):
+    """A length field that cannot be, or disagrees with another."""
+
+
+class HeadError(WireError):
+    """A packet or an atom does not begin with its head byte."""
+
+
+class ChecksumError(WireError):
+    """The checksum at the end of a frame is not that of its bytes."""
+
+
+class AtomTypeError(WireError):
+    """An atom with a value type that does not exist, or with the wrong length for its type."""
+
+
+class ValueRangeError(WireError):
+    """A value does not fit the field that is to carry it."""
+
+
+class StrayBytesError(WireError):
+    """Bytes between frames that are neither a frame nor text."""
+
+
+class StationError(Exception):
+    """A failed operation; its text is one clear line."""
+
+    exit_status = EXIT_REFUSED
+    kind = "error"
+
+    def details(self) -> dict[str, Any]:
+        """The failure for ``--json``."""
+        return {"kind": self.kind, "message": str(self)}
+
+
+class UsageProblem(StationError):
+    """The operation cannot be asked for like this."""
+
+    exit_status = EXIT_USAGE
+    kind = "usage"
+
+
+class NoPort(StationError):
+    """No port was named, it is not there, or it went away."""
+
+    exit_status = EXIT_NO_PORT
+    kind = "no-port"
+
+
+class PortBusy(StationError):
+    """Somebody else holds the port."""
+
+    exit_status = EXIT_BUSY
+    kind = "port-busy"
+
+
+class NoAnswer(StationError):
+    """The handset did not answer in time."""
+
+    exit_status = EXIT_NO_ANSWER
+    kind = "no-answer"
+
+    def __init__(self, message: str, arrived: Sequence[Any] = ()) -> None:
+        """``arrived`` is what came instead."""
+        super().__init__(message)
+        self.arrived = tuple(arrived)
+
+
+class BadFrame(StationError):
+    """The handset answered with bytes that are not a proper frame."""
+
+    exit_status = EXIT_BAD_FRAME
+    kind = "bad-frame"
+
+    def __init__(self, message: str, cause: WireError | None = None) -> None:
+        super().__init__(message)
+        self.cause = cause
+
+
+class Held(str, Enum):
+    """What a refusal leaves in the handset's request buffer."""
+
+    NOTHING = ""
+    TEXT = "text"
+    PACKET = "packet"
+    UNKNOWN = "unknown"
+
+
+_ADVICE = {
+    Held.NOTHING: "",
+    Held.TEXT:
+        "the refused text stays in the handset's request buffer and is read again with whatever "
+        "follows; flush it with `amt-station recover`, which sends AT^DBTADDR=? and checks its OK",
+    Held.PACKET:
+        "the refused packet stays in the handset's request buffer and is carried out again with "
+        "whatever follows, until the service restarts; unplug the USB cable and plug it in "
+        "again, then check with `amt-station recover`",
+    Held.UNKNOWN:
+        "if it was the handset and not its modem that refused, the request still lies in the "
+        "handset's request buffer; check with `amt-station recover`",
+}
+
+
+class Refused(StationError):
+    """The handset said no: an error packet, a result code other than 0, or an AT error."""
+
+    kind = "refused"
+
+    def __init__(self, message: str, *, code: int | None = None, response: int | None = None,
+                 held: Held = Held.NOTHING) -> None:
+        """``code`` is the result code, ``response`` the id of the packet that carried it."""
+        super().__init__(message)
+        self.code = code
+        self.response = response
+        self.held = held
+
+    @property
+    def advice(self) -> str:
+        """What the station has to do before it goes on; empty when nothing."""
+        return _ADVICE[self.held]
+
+    def details(self) -> dict[str, Any]:
+        return {**super().details(), "code": self.code, "response": self.response,
+                "held": self.held.value or None, "advice": self.advice or None}
