@@ -10,6 +10,7 @@
 #include <time.h>
 #include <unistd.h>
 
+#include "platform/host/log/calendar.h"
 #include "platform/host/stand-in/stand-in.h"
 
 /*
@@ -109,20 +110,6 @@ char *put_number(char *to, uint32_t value, uint32_t width)
     return to;
 }
 
-/* Month and day of a day counted from 1970-01-01; the C library's conversion takes a lock. */
-void month_and_day(int64_t days, uint32_t *month, uint32_t *day)
-{
-    /* Years counted from March put the leap day at the end; 719468 days lie between 0000-03-01 and
-     * 1970-01-01. */
-    const uint32_t day_of_era = static_cast<uint32_t>((days + 719468) % 146097);
-    const uint32_t year_of_era =
-        (day_of_era - day_of_era / 1460 + day_of_era / 36524 - day_of_era / 146096) / 365;
-    const uint32_t day_of_year = day_of_era - (365 * year_of_era + year_of_era / 4 - year_of_era / 100);
-    const uint32_t month_from_march = (5 * day_of_year + 2) / 153;
-    *day = day_of_year - (153 * month_from_march + 2) / 5 + 1;
-    *month = month_from_march < 10 ? month_from_march + 3 : month_from_march - 9;
-}
-
 char *put_time(char *to)
 {
     struct timespec now;
@@ -130,7 +117,7 @@ char *put_time(char *to)
     const uint32_t second_of_day = static_cast<uint32_t>(now.tv_sec % 86400);
     uint32_t month = 0;
     uint32_t day = 0;
-    month_and_day(now.tv_sec / 86400, &month, &day);
+    log_month_and_day(now.tv_sec / 86400, &month, &day);
     to = put_number(to, month, 2);
     *to++ = '-';
     to = put_number(to, day, 2);

@@ -48,12 +48,18 @@ void leave_starter()
     signal(SIGHUP, SIG_DFL);
 }
 
+int64_t monotonic_ms()
+{
+    struct timespec now;
+    clock_gettime(CLOCK_MONOTONIC, &now);
+    return int64_t{now.tv_sec} * 1000 + now.tv_nsec / 1000000;
+}
+
 /* Plays for a number of seconds; 0: without an end. */
 void play(int32_t seconds)
 {
     const long own_pid = getpid();
-    struct timespec start;
-    clock_gettime(CLOCK_MONOTONIC, &start);
+    const int64_t end_ms = monotonic_ms() + int64_t{seconds} * 1000;
     for (;;) {
         const struct timespec pause = {0, LOOK_PAUSE_NS};
         nanosleep(&pause, nullptr);
@@ -61,9 +67,7 @@ void play(int32_t seconds)
         if (pid != 0 && pid != own_pid) {
             return;
         }
-        struct timespec now;
-        clock_gettime(CLOCK_MONOTONIC, &now);
-        if (seconds != 0 && now.tv_sec - start.tv_sec >= seconds) {
+        if (seconds != 0 && monotonic_ms() >= end_ms) {
             if (pid == own_pid) {
                 unlink(PID_FILE);
             }
