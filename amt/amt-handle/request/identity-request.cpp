@@ -33,7 +33,7 @@ static int fail_request(int line, const char *func, const char *text)
     return PUB_ERR_FAIL;
 }
 
-/* A packet of this id with the result 0 as its last atom, sent. */
+/* The result 0 is the last atom of either response. */
 static int send_result(uint32_t channel, amt_buf_st *rsp_ptr)
 {
     amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_RESULT, 0);
