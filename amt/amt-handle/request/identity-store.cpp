@@ -185,6 +185,11 @@ static void run_on_folder(const char *verb, const char *path)
 int amt_make_folder(const char *path)
 {
     PUB_LOG_ENTRY(g_amt_handle_log);
+    if (path == nullptr) {
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
+        PUB_LOG_FLAGS(g_amt_handle_log, true);
+        return PUB_ERR_PARAM;
+    }
     if (access(path, F_OK) == 0) {
         PUB_LOG(g_amt_handle_log, "amt_make_folder: %s exist.\r\n", path);
         return PUB_ERR_NONE;

@@ -52,7 +52,7 @@ const char *get_bt_addr_file();
 
 /*
  * Makes the folder if nothing of that name exists, and gives it to the group "radio" with mode 766: written
- * by all, searched by its owner only. Returns 0, or -118 when it cannot be made.
+ * by all, searched by its owner only. Returns 0, -101 (absent path) or -118 (it cannot be made).
  */
 int amt_make_folder(const char *path);
 

@@ -187,6 +187,14 @@ TEST(make_folder, reports_a_folder_that_cannot_be_made)
                     "amt_make_folder mkdir(" + path + ") faild errno[2] strerror[" + strerror(ENOENT) + "]"));
 }
 
+TEST(make_folder, refuses_an_absent_path)
+{
+    const log_capture_c capture;
+    EXPECT_EQ(amt_make_folder(nullptr), PUB_ERR_PARAM);
+    EXPECT_THAT(capture.texts(),
+                ElementsAre("amt_make_folder()", is_error_line("amt_make_folder", -101), "1"));
+}
+
 TEST(save_file, refuses_any_other_kind)
 {
     for (const int kind : {0, 3, -1}) {
