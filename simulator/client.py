@@ -1,0 +1,62 @@
+"""The outside's end of a handset's control socket."""
+
+import json
+import os
+import socket
+from pathlib import Path
+from typing import Any
+
+from .errors import HandsetError
+from .waiting import scaled
+
+MESSAGE_SIZE = 1 << 18
+ANSWER_SECONDS = 30.0
+
+
+class Refused(HandsetError):
+    """The handset's init answered that it cannot."""
+
+
+class Client:
+    """Asks the init of the handset whose control socket is PATH."""
+
+    def __init__(self, path: Path) -> None:
+        self.path = path
+
+    def ask(self, operation: str, **request: Any) -> dict[str, Any]:
+        """Have an operation done; returns its answer."""
+        answer, fds = self._exchange(operation, request, ANSWER_SECONDS)
+        for fd in fds:
+            os.close(fd)
+        return answer
+
+    def ask_fd(self, operation: str, **request: Any) -> tuple[int, dict[str, Any]]:
+        """Have an operation done that hands out a descriptor, which is the caller's then."""
+        answer, fds = self._exchange(operation, request, ANSWER_SECONDS)
+        if len(fds) != 1:
+            raise HandsetError(f"{operation} handed out {len(fds)} descriptors")
+        return fds[0], answer
+
+    def ask_slowly(self, operation: str, timeout: float, **request: Any) -> dict[str, Any]:
+        """Have an operation done that answers when something has ended."""
+        return self._exchange(operation, request, timeout)[0]
+
+    def _exchange(self, operation: str, request: dict[str, Any],
+                  timeout: float) -> tuple[dict[str, Any], list[int]]:
+        with socket.socket(socket.AF_UNIX, socket.SOCK_SEQPACKET) as connection:
+            connection.settimeout(scaled(timeout))
+            try:
+                connection.connect(str(self.path))
+                connection.send(json.dumps({"op": operation, **request}).encode())
+                data, fds, _, _ = socket.recv_fds(connection, MESSAGE_SIZE, 1,
+                                                  socket.MSG_CMSG_CLOEXEC)
+            except socket.timeout:
+                raise TimeoutError(f"no answer to {operation}") from None
+            except OSError as error:
+                raise HandsetError(f"the handset is not up ({error.strerror})") from None
+        if not data:
+            raise HandsetError("the handset went down")
+        answer = json.loads(data)
+        if not answer.pop("ok"):
+            raise Refused(answer["error"])
+        return answer, list(fds)

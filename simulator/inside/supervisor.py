@@ -1,0 +1,70 @@
+"""The init of the simulated handset: process 1 inside, told by /handset/init.json what to do."""
+
+import json
+import os
+import signal
+import sys
+from typing import Any
+
+from . import mounts
+from .control import ControlServer
+from .lines import AppLine, Line
+from .loop import Loop
+from .modem import Modem
+from .modem_lines import MODEM_LINES, ModemLines
+from .operations import Operations
+from .processes import Launch, Processes, Service
+
+SPECIFICATION = "/handset/init.json"
+
+
+def _make_lines(loop: Loop, paths: dict[str, str]) -> dict[str, Line]:
+    lines = {name: Line(loop, name, paths[name]) for name in ("pc", *MODEM_LINES)}
+    if lines["pc"].path:
+        lines["pc"].connect()
+    return lines
+
+
+def _launch(given: dict[str, Any]) -> Launch:
+    return Launch(argv=given["argv"], program=given["program"], env=given["env"],
+                  stdout="/handset/stdout.txt", stderr="/handset/stderr.txt",
+                  no_randomize=given["no_randomize"])
+
+
+def main() -> None:
+    """Bring the handset up and serve it until the sandbox ends."""
+    control_fd, ready_fd = int(sys.argv[1]), int(sys.argv[2])
+    # Process 1 gets only the signals it asks for; the sandbox is ended from outside.
+    for number in (signal.SIGINT, signal.SIGTERM, signal.SIGHUP):
+        signal.signal(number, signal.SIG_IGN)
+    os.set_inheritable(ready_fd, False)
+    with open(SPECIFICATION, encoding="utf-8") as stream:
+        specification = json.load(stream)
+    mounts.protect_devices()
+    loop = Loop()
+    lines = _make_lines(loop, specification["lines"])
+    modem = ModemLines(Modem(specification["modem_answers"]), lines)
+    modem.set_mode(specification["modem"])
+    if specification["card"] is not None:
+        mounts.insert_card(specification["card"])
+
+    def forget_input() -> None:
+        for line in lines.values():
+            line.discard_input()
+
+    processes = Processes(loop)
+    service = Service(loop, processes, _launch(specification["daemon"]),
+                      specification["restart"], specification["restart_pause"], forget_input)
+    operations = Operations(loop, processes, service, lines, modem,
+                            AppLine(specification["lines"]["app"]))
+    # The loop holds the server through its callbacks, and runs until the sandbox ends.
+    ControlServer(loop, control_fd, operations.table())
+    if specification["start"]:
+        service.start()
+    os.write(ready_fd, b"up\n")
+    os.close(ready_fd)
+    loop.run()
+
+
+if __name__ == "__main__":
+    main()

@@ -1,0 +1,91 @@
+"""What is put into a handset from the PC: the daemon of a build, its libraries, init's modules."""
+
+import re
+import shutil
+from dataclasses import dataclass
+from pathlib import Path
+
+from .errors import HandsetError
+from .root import ROOT
+
+PROJECT = Path(__file__).resolve().parent.parent
+DAEMON = "vx-kel-amt"
+PRELOAD = "libhandset-devices.so"
+LIBRARIES = {
+    "liblog.so": "system/lib", "libcutils.so": "system/lib", "libldt.so": "system/lib",
+    PRELOAD: "system/lib", "amt.tq5530.misc.so": "system/lib/hw",
+    "audio.primary.tq5530.amt.so": "system/lib/hw",
+}
+PROGRAMS = ("amt-audio", "sync")
+# Init's modules, and the wire codec that its modem speaks.
+MODULES = ("simulator/inside", "station")
+SANITIZER = re.compile(rb"lib([at])san\.so\.\d+\0")
+
+# In the handset, and on the PC beside the root.
+INSIDE = "/run/handset"
+MODULE_DIRECTORY = "modules"
+DAEMON_COPY = "daemon"
+
+
+@dataclass(frozen=True)
+class Program:
+    """The daemon to run: the program itself and, when it comes from a build, what belongs to it."""
+
+    daemon: Path
+    build: Path | None
+    sanitizer: str = ""
+
+    @property
+    def has_preload(self) -> bool:
+        """Whether the build has the library that answers device requests."""
+        return self.build is not None and (self.build / "lib" / PRELOAD).exists()
+
+
+def build_directory(build: "str | Path") -> Path:
+    """The directory of a build: a preset's name, or a directory."""
+    return build if isinstance(build, Path) else PROJECT / "build" / build
+
+
+def find_program(build: "str | Path | None", daemon: Path | None) -> Program:
+    """Find the daemon of a build, or take another program in its place."""
+    directory = build_directory(build) if build is not None else None
+    if daemon is None:
+        if directory is None:
+            raise HandsetError("neither a build nor a daemon was given")
+        daemon = directory / "bin" / DAEMON
+    if not daemon.is_file():
+        raise HandsetError(f"{daemon} is not there; ./dev build makes the build "
+                           f"{directory.name if directory else ''}".rstrip())
+    match = SANITIZER.search(daemon.read_bytes())
+    return Program(daemon, directory, {b"a": "asan", b"t": "tsan"}[match[1]] if match else "")
+
+
+def _copy(source: Path, target: Path) -> None:
+    target.parent.mkdir(parents=True, exist_ok=True)
+    shutil.copy2(source, target)
+
+
+def install(directory: Path, program: Program) -> None:
+    """Copy everything into the handset's directory: a build may change while the handset is up."""
+    daemon = directory / DAEMON_COPY
+    _copy(program.daemon, daemon)
+    daemon.chmod(0o755)
+    root = directory / ROOT
+    if program.build is not None:
+        for name, place in LIBRARIES.items():
+            if (program.build / "lib" / name).exists():
+                _copy(program.build / "lib" / name, root / place / name)
+        for name in PROGRAMS:
+            if (program.build / "bin" / name).exists():
+                _copy(program.build / "bin" / name, root / "system/bin" / name)
+    for name in MODULES:
+        for source in (PROJECT / name).rglob("*.py*"):
+            _copy(source, directory / MODULE_DIRECTORY / source.relative_to(PROJECT))
+    (directory / MODULE_DIRECTORY / "simulator" / "__init__.py").touch()
+
+
+def sanitizer_environment() -> dict[str, str]:
+    """What a sanitizer build needs: reports to files, and its place behind the preload library."""
+    log = "log_path=/handset/sanitizer"
+    return {"ASAN_OPTIONS": f"verify_asan_link_order=0:{log}", "TSAN_OPTIONS": log,
+            "UBSAN_OPTIONS": f"print_stacktrace=1:{log}", "LSAN_OPTIONS": log}
