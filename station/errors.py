@@ -57,6 +57,9 @@ class StationError(Exception):
     exit_status = EXIT_REFUSED
     kind = "error"
 
+    # Set when the JSON document that tells of the failure has been printed.
+    reported = False
+
     def details(self) -> dict[str, Any]:
         """The failure for ``--json``."""
         return {"kind": self.kind, "message": str(self)}

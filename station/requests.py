@@ -28,6 +28,7 @@ class Field:
 
     ``absent`` says what the handset takes when the atom is missing, ``width`` that a bytes atom
     holds a number of so many bytes, ``length_of`` that the value is another atom's byte count.
+    On the command line a ``positional`` field is an argument, one with ``flags`` a flag a choice.
     """
 
     atom: int
@@ -40,8 +41,8 @@ class Field:
     longest: int | None = None
     choices: Mapping[str, int] = field(default_factory=dict)
     absent: str = ""
-    optional: bool = False
     positional: bool = False
+    flags: bool = False
     width: int = 0
     text: bool = False
     length_of: str = ""
@@ -84,7 +85,7 @@ class Field:
     def _encode_text(self, text: str) -> Atom:
         atom = (Atom.string(self.atom, text) if self.type is AtomType.STRING
                 else Atom.raw(self.atom, text.encode("utf-8", "surrogateescape")))
-        if not text and not self.optional:
+        if not text:
             raise UsageProblem(f"{self.name}: empty")
         if "\0" in text:
             raise UsageProblem(f"{self.name}: holds a zero byte")
@@ -138,6 +139,7 @@ class Operation:
     summary: str
     fixed: Mapping[str, int] = field(default_factory=dict)
     takes: tuple[str, ...] = ()
+    may_take: tuple[str, ...] = ()
     channels: tuple[Channel, ...] = (Channel.PC, Channel.APP)
     before: tuple[str, ...] = ()
 

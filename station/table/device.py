@@ -76,9 +76,9 @@ REQUESTS: tuple[Request, ...] = (
         app=on_app("calls the audio library",
                    Refusal("the audio library or its entry is missing")),
         operations=(
-            Operation(("audio", "loop", "on"), "close an audio loop", {"on": 1}, ("type",),
+            Operation(("audio", "loop", "on"), "close an audio loop", {"on": 1}, may_take=("type",),
                       channels=_APP),
-            Operation(("audio", "loop", "off"), "open an audio loop", {"on": 0}, ("type",),
+            Operation(("audio", "loop", "off"), "open an audio loop", {"on": 0}, may_take=("type",),
                       channels=_APP))),
     Request(
         139, "camera-preview", FAMILY, "select the main camera's preview",

@@ -39,13 +39,11 @@ REQUESTS: tuple[Request, ...] = (
         fields=(Field(154, BYTES, "step", "what to do; the first byte of the atom counts, "
                       "whatever its type", choices=_WIFI_STEPS, width=1, absent="0 (refused)"),
                 Field(155, BYTES, "channel", "Wi-Fi channel", width=1, low=0, high=255,
-                      optional=True, absent="refused where it is needed"),
-                Field(156, BYTES, "rate", "rate", width=2, low=0, high=65535, optional=True,
-                      unit="the test library's",
                       absent="refused where it is needed"),
+                Field(156, BYTES, "rate", "rate", width=2, low=0, high=65535,
+                      unit="the test library's", absent="refused where it is needed"),
                 Field(157, BYTES, "power", "transmit power", width=2, low=0, high=65535,
-                      optional=True, unit="the test library's",
-                      absent="refused where it is needed")),
+                      unit="the test library's", absent="refused where it is needed")),
         answer_fields=(Field(154, BYTES, "step", "the step asked for", choices=_WIFI_STEPS,
                              width=1),
                        Field(158, INT, "packets", "packets received, only in the answer to the "

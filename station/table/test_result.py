@@ -8,7 +8,7 @@ from station.table.common import INT, MODEM_ERROR, STRING, VERDICTS, asks_modem,
 FAMILY = "test result"
 
 _VERDICT = Field(36, INT, "verdict", "1 pass, 2 fail, anything else unknown", choices=VERDICTS,
-                 low=0, high=2, absent="0 (unknown)")
+                 low=0, high=2, flags=True, absent="0 (unknown)")
 _STATION_OUT = Field(39, INT, "station", "station number")
 _DESCRIPTION_OUT = Field(37, STRING, "description", "test description, at most 127 characters")
 
@@ -19,13 +19,13 @@ REQUESTS: tuple[Request, ...] = (
                       "/amt/amt_result.txt", low=0, absent="0"),
                 _VERDICT,
                 Field(37, STRING, "description", "test description, at most 126 characters; app "
-                      "channel only", longest=126, optional=True, absent="none")),
+                      "channel only", longest=126, absent="none")),
         pc=Service("modem", False, "writes the verdict to /amt/amt_result.txt, whatever comes of "
                    "it, then passes the request on to the modem unchanged; the modem answers"),
         app=asks_modem("writes the verdict to /amt/amt_result.txt, whatever comes of it, and to "
                        "the modem (AT^DATOMW)", MODEM_ERROR),
         operations=(Operation(("test-result", "write"), "store a station's verdict",
-                              takes=("station", "verdict", "description")),)),
+                              takes=("station", "verdict"), may_take=("description",)),)),
     Request(
         89, "test-result-read", FAMILY, "read a station's verdict from the modem",
         fields=(Field(39, INT, "station", "station number", low=0, absent="0"),),
