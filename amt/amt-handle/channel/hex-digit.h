@@ -1,0 +1,18 @@
+#pragma once
+
+#include <stdint.h>
+
+/* The number a hexadecimal digit of either case stands for; -1 for any other character. */
+constexpr int amt_hex_digit(char c)
+{
+    if (c >= '0' && c <= '9') {
+        return c - '0';
+    }
+    if (c >= 'A' && c <= 'F') {
+        return c - 'A' + 10;
+    }
+    if (c >= 'a' && c <= 'f') {
+        return c - 'a' + 10;
+    }
+    return -1;
+}
