@@ -1,0 +1,218 @@
+#include "amt/amt-handle/request/ap-version.h"
+
+#include <errno.h>
+#include <stdio.h>
+#include <string.h>
+#include <strings.h>
+
+#include "amt/amt-handle/request/identity-store.h"
+#include "amt/amt-log.h"
+#include "platform/include/cutils/properties.h"
+#include "pub/error.h"
+
+namespace {
+
+constexpr const char *BOARD_INFO_FILE = "/sys/sarvo/board_info";
+constexpr const char *EMMC_INFO_FILE = "/sys/devinfo/emmc_info";
+constexpr const char *CARRIER_FILE = "/data/orla/current/cust.prop";
+constexpr const char *CARRIER_KEY = "ro.carrier.name=";
+
+/* An unset property reads as one blank, so that its field still shows in the text. */
+constexpr const char *UNSET = " ";
+constexpr const char *UNSET_MAKER = "null";
+
+constexpr uint32_t BOARD_INFO_SIZE = 92;
+
+/* The version text while it grows: room for every source at its longest, so that the real length can be
+ * logged. */
+struct version_text_st
+{
+    uint32_t m_len;
+    char m_text_a[512];
+};
+static_assert(sizeof("ORLA ") + 2 * (PROPERTY_VALUE_MAX + 2) + BOARD_INFO_SIZE + 2 +
+                  2 * (AMT_AP_LINE_SIZE + 2) <
+              sizeof(version_text_st::m_text_a));
+
+void append(version_text_st *version_ptr, const char *before, const char *text, const char *after)
+{
+    const size_t room = sizeof(version_ptr->m_text_a) - version_ptr->m_len;
+    const int length =
+        snprintf(version_ptr->m_text_a + version_ptr->m_len, room, "%s%s%s", before, text, after);
+    if (length > 0 && static_cast<size_t>(length) < room) {
+        version_ptr->m_len += static_cast<uint32_t>(length);
+    }
+}
+
+void append_field(version_text_st *version_ptr, const char *text)
+{
+    append(version_ptr, "(", text, ")");
+}
+
+/* Reads a property into value (PROPERTY_VALUE_MAX bytes); false when there is nothing to read. */
+bool read_property(const char *key, char *value, const char *unset)
+{
+    memset(value, 0, PROPERTY_VALUE_MAX);
+    return property_get(key, value, unset) > 0;
+}
+
+bool is_own_brand()
+{
+    char value_a[PROPERTY_VALUE_MAX];
+    if (read_property("ro.build.customer", value_a, UNSET_MAKER) && strcasecmp(value_a, "BRENTA") == 0) {
+        return true;
+    }
+    return read_property("ro.product.manufacturer", value_a, UNSET_MAKER) &&
+           strcasecmp(value_a, "Brenta") == 0;
+}
+
+/* The start of the text on the maker's own brand. *is_complete_ptr tells that nothing else follows. */
+int append_own_brand(version_text_st *version_ptr, bool *is_complete_ptr)
+{
+    char value_a[PROPERTY_VALUE_MAX];
+    if (!read_property("ro.build.version.incremental", value_a, UNSET)) {
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        PUB_LOG(g_amt_handle_log, "read ro.build.version.incremental error");
+        return PUB_ERR_FAIL;
+    }
+    append(version_ptr, "ORLA ", value_a, "");
+    *is_complete_ptr = !read_property("ro.build.display.vx.id", value_a, UNSET);
+    if (!*is_complete_ptr) {
+        append_field(version_ptr, value_a);
+    }
+    return PUB_ERR_NONE;
+}
+
+/* The start of the text on every other handset. */
+int append_other_brand(version_text_st *version_ptr)
+{
+    char value_a[PROPERTY_VALUE_MAX];
+    if (!read_property("ro.build.display.id", value_a, UNSET)) {
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        PUB_LOG(g_amt_handle_log, "read ro.build.display.id error");
+        return PUB_ERR_FAIL;
+    }
+    append_field(version_ptr, value_a);
+    return PUB_ERR_NONE;
+}
+
+/* Factory id and board information. Returns the status of reading the latter, 0 when there is no factory id.
+ */
+int append_board(version_text_st *version_ptr)
+{
+    char value_a[PROPERTY_VALUE_MAX];
+    if (!read_property("ro.build.factory.id", value_a, UNSET)) {
+        return PUB_ERR_NONE;
+    }
+    append_field(version_ptr, value_a);
+    char board_a[BOARD_INFO_SIZE] = {};
+    const int status = amt_read_data_from_file(board_a, sizeof(board_a), BOARD_INFO_FILE);
+    if (status == PUB_ERR_NONE) {
+        PUB_LOG(g_amt_handle_log, "readed success from file(%s). flag: %s.", BOARD_INFO_FILE, board_a);
+        append_field(version_ptr, board_a);
+    }
+    return status;
+}
+
+/* The fields that follow on every brand. A missing eMMC or carrier field does not count as a failure. */
+int append_tail(version_text_st *version_ptr)
+{
+    const int status = append_board(version_ptr);
+    char line_a[AMT_AP_LINE_SIZE] = {};
+    if (amt_read_emmc_info(line_a) == PUB_ERR_NONE) {
+        PUB_LOG(g_amt_handle_log, "emmc_info(%s). flag: %s.", EMMC_INFO_FILE, line_a);
+        append_field(version_ptr, line_a);
+    }
+    if (amt_read_cm_info(line_a) == PUB_ERR_NONE) {
+        PUB_LOG(g_amt_handle_log, "cm_info(%s). flag: %s.", CARRIER_FILE, line_a);
+        append_field(version_ptr, line_a);
+    }
+    return status;
+}
+
+void put_text(const version_text_st &version, char *buf, uint32_t *length_ptr)
+{
+    constexpr uint32_t limit = AMT_AP_VERSION_SIZE - 1;
+    PUB_LOG(g_amt_handle_log, "getted sw-module: %s", version.m_text_a);
+    if (version.m_len > limit) {
+        PUB_LOG(g_amt_handle_log, "buf's len(%u) is smaller than sw's len(%u). data will be discard", limit,
+                version.m_len);
+    }
+    *length_ptr = version.m_len < limit ? version.m_len : limit;
+    memcpy(buf, version.m_text_a, *length_ptr);
+}
+
+} // namespace
+
+int get_ap_sw_version(char *buf, uint32_t *length_ptr)
+{
+    PUB_LOG_ENTRY(g_amt_handle_log);
+    if (buf == nullptr || length_ptr == nullptr) {
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
+        PUB_LOG(g_amt_handle_log, " %d, %d", buf == nullptr, length_ptr == nullptr);
+        return PUB_ERR_PARAM;
+    }
+    *length_ptr = 0;
+    version_text_st version = {};
+    bool is_complete = false;
+    int status = is_own_brand() ? append_own_brand(&version, &is_complete) : append_other_brand(&version);
+    if (status != PUB_ERR_NONE) {
+        return status;
+    }
+    if (!is_complete) {
+        status = append_tail(&version);
+    }
+    put_text(version, buf, length_ptr);
+    return status;
+}
+
+int amt_read_emmc_info(char *buf)
+{
+    buf[0] = '\0';
+    FILE *const stream = fopen(EMMC_INFO_FILE, "r");
+    if (stream == nullptr) {
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        PUB_LOG(g_amt_handle_log, "open %s fail", EMMC_INFO_FILE);
+        return PUB_ERR_FAIL;
+    }
+    const bool is_read = fgets(buf, AMT_AP_LINE_SIZE - 1, stream) != nullptr;
+    const int read_errno = errno;
+    fclose(stream);
+    if (!is_read) {
+        errno = read_errno;
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        PUB_LOG(g_amt_handle_log, "read fail");
+        return PUB_ERR_FAIL;
+    }
+    const size_t length = strlen(buf);
+    PUB_LOG(g_amt_handle_log, "emmc_info_len: %d", static_cast<int>(length));
+    if (length > 0) {
+        buf[length - 1] = '\0';
+    }
+    return PUB_ERR_NONE;
+}
+
+int amt_read_cm_info(char *buf)
+{
+    buf[0] = '\0';
+    FILE *const stream = fopen(CARRIER_FILE, "r");
+    if (stream == nullptr) {
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        PUB_LOG(g_amt_handle_log, "open cm file %s fail", CARRIER_FILE);
+        return PUB_ERR_FAIL;
+    }
+    char line_a[AMT_AP_LINE_SIZE] = {};
+    bool is_found = false;
+    while (!is_found && fgets(line_a, AMT_AP_LINE_SIZE - 1, stream) != nullptr) {
+        is_found = strstr(line_a, CARRIER_KEY) != nullptr;
+    }
+    fclose(stream);
+    if (!is_found) {
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        return PUB_ERR_FAIL;
+    }
+    /* The path in this line is not the file's; log readers know it so. */
+    PUB_LOG(g_amt_handle_log, "line_a(%s). flag: %s.", BOARD_INFO_FILE, line_a);
+    sscanf(line_a, "%*[^=]=%49s", buf);
+    return PUB_ERR_NONE;
+}

@@ -1,0 +1,182 @@
+#include "amt/amt-handle/request/version.h"
+
+#include "amt/amt-command.h"
+#include "amt/amt-handle/channel/context.h"
+#include "amt/amt-handle/request/modem-version.h"
+#include "amt/amt-handle/request/request-frame.h"
+#include "amt/amt-packet.h"
+#include "pub/error.h"
+
+namespace {
+
+constexpr uint8_t ATOM_VERSION = 18;
+constexpr uint8_t ATOM_TYPE = 19;
+
+/* Stations compare all 64 bytes. */
+constexpr char g_fixed_version_a[] = "\rAndroid4.2,2013-01-21"
+                                     "\n\n\n\n\n\n\n\n\n\n\n\n\n\n\n\n\n\n\n\n\n"
+                                     "\n\n\n\n\n\n\n\n\n\n\n\n\n\n\n\n\n\n\n\n\n";
+constexpr uint16_t FIXED_VERSION_LENGTH = 64;
+static_assert(sizeof(g_fixed_version_a) == FIXED_VERSION_LENGTH + 1);
+
+/* Where the version of a module comes from. */
+enum class source_en : uint8_t
+{
+    NONE,     /* no such module */
+    FIXED,    /* the fixed text */
+    SOFTWARE, /* the application side's software text */
+    MODEM
+};
+
+struct module_st
+{
+    int32_t m_type;
+    const char *m_name_ptr;
+    source_en m_app_source;
+    source_en m_pc_source;
+};
+
+constexpr module_st g_module_a[] = {
+    {AMT_PRODUCT_MODULE, "AMT_PRODUCT_MODULE", source_en::FIXED, source_en::FIXED},
+    {AMT_SOFTWARE_MODULE, "AMT_SOFTWARE_MODULE", source_en::FIXED, source_en::SOFTWARE},
+    {AMT_L1_MODULE, "AMT_L1_MODULE", source_en::MODEM, source_en::MODEM},
+    {AMT_HLS_MODULE, "AMT_HLS_MODULE", source_en::MODEM, source_en::MODEM},
+    {AMT_PLATFORM_MODULE, "AMT_PLATFORM_MODULE", source_en::FIXED, source_en::FIXED},
+    {AMT_APP_MODULE, "AMT_APP_MODULE", source_en::FIXED, source_en::FIXED},
+    {AMT_HARDWARE_MODULE, "AMT_HARDWARE_MODULE", source_en::FIXED, source_en::FIXED},
+    {AMT_WHOLE_MODULE, "AMT_WHOLE_MODULE", source_en::FIXED, source_en::FIXED},
+};
+
+constexpr module_st g_unknown_module = {0, "(undefined)", source_en::NONE, source_en::NONE};
+
+const module_st &find_module(int32_t type)
+{
+    for (const module_st &module : g_module_a) {
+        if (module.m_type == type) {
+            return module;
+        }
+    }
+    return g_unknown_module;
+}
+
+/* Reads the wanted module from the request and logs it. */
+int32_t get_type(const amt_buf_st *req_ptr)
+{
+    const int32_t type = amt_packet_get_int(req_ptr->m_buf_a, ATOM_TYPE);
+    PUB_LOG(g_amt_handle_log, "version type: 0x%02x - %s", static_cast<unsigned int>(type),
+            find_module(type).m_name_ptr);
+    return type;
+}
+
+void start_version(amt_buf_st *rsp_ptr, int32_t type)
+{
+    amt_reply_start(rsp_ptr, AMT_VERSION_RSPCMD);
+    amt_packet_add_int(rsp_ptr->m_buf_a, ATOM_TYPE, type);
+}
+
+void add_version(amt_buf_st *rsp_ptr, const void *version, uint32_t length)
+{
+    amt_packet_add_bytes(rsp_ptr->m_buf_a, ATOM_VERSION, static_cast<const uint8_t *>(version),
+                         static_cast<uint16_t>(length));
+}
+
+void log_unknown_type(int line, const char *func, int32_t type)
+{
+    pub_log_error(g_amt_handle_log, line, func, PUB_ERR_FAIL);
+    PUB_LOG(g_amt_handle_log, "unknown version type: 0x%02x", static_cast<unsigned int>(type));
+}
+
+} // namespace
+
+const char *amt_version_module_name(int32_t type)
+{
+    return find_module(type).m_name_ptr;
+}
+
+int handle_amt_req_version(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
+{
+    if (const int status = AMT_BEGIN_MODEM_REQUEST(channel, req_ptr, rsp_ptr); status != PUB_ERR_NONE) {
+        return status;
+    }
+    const int32_t type = get_type(req_ptr);
+    const source_en source = find_module(type).m_app_source;
+    if (source == source_en::NONE) {
+        log_unknown_type(__LINE__, __func__, type);
+        return PUB_ERR_FAIL;
+    }
+    if (source == source_en::MODEM) {
+        return handle_amt_req_l1_hls_version(channel, type, req_ptr, rsp_ptr);
+    }
+    start_version(rsp_ptr, type);
+    add_version(rsp_ptr, g_fixed_version_a, FIXED_VERSION_LENGTH);
+    return amt_reply_finish_ok(channel, rsp_ptr);
+}
+
+int handle_amt_req_l1_hls_version(uint32_t channel, int32_t type, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
+{
+    PUB_LOG_ENTRY(g_amt_handle_log);
+    const bool is_none = channel == AMT_CHANNEL_NONE;
+    const bool is_type_bad = type != AMT_L1_MODULE && type != AMT_HLS_MODULE;
+    const bool is_req_empty = req_ptr != nullptr && req_ptr->m_buf_len == 0;
+    if (is_none || is_type_bad || req_ptr == nullptr || is_req_empty || rsp_ptr == nullptr) {
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
+        PUB_LOG(g_amt_handle_log, "%d, module_en:%d, %d, %d, %d", is_none, type, req_ptr == nullptr,
+                is_req_empty, rsp_ptr == nullptr);
+        return PUB_ERR_PARAM;
+    }
+    uint8_t version_a[AMT_MODEM_VERSION_SIZE];
+    uint32_t length = 0;
+    if (get_l1_hls_version(type, version_a, &length) != PUB_ERR_NONE) {
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        PUB_LOG(g_amt_handle_log, "get version failure for type: 0x%02x", static_cast<unsigned int>(type));
+        return PUB_ERR_FAIL;
+    }
+    PUB_LOG(g_amt_handle_log, "get version success.type:%d, version:[len:%u content:%s]", type, length,
+            reinterpret_cast<const char *>(version_a));
+    start_version(rsp_ptr, type);
+    add_version(rsp_ptr, version_a, length);
+    return amt_reply_finish_ok(channel, rsp_ptr);
+}
+
+int handle_amt_pc_req_version(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
+{
+    if (const int status = AMT_BEGIN_REQUEST(channel, req_ptr, rsp_ptr); status != PUB_ERR_NONE) {
+        return status;
+    }
+    const int32_t type = get_type(req_ptr);
+    const source_en source = find_module(type).m_pc_source;
+    if (source == source_en::MODEM) {
+        return PUB_ERR_NOT_FOUND;
+    }
+    if (source == source_en::NONE) {
+        log_unknown_type(__LINE__, __func__, type);
+        return PUB_ERR_FAIL;
+    }
+    /* An acknowledgement that cannot be sent does not keep the answer back. */
+    amt_handle_send_pre_rsp_for_pc(channel, rsp_ptr);
+    start_version(rsp_ptr, type);
+    if (source == source_en::FIXED) {
+        add_version(rsp_ptr, g_fixed_version_a, FIXED_VERSION_LENGTH);
+    } else if (const int status = set_ap_sw_version_rsp(rsp_ptr); status != PUB_ERR_NONE) {
+        return status;
+    }
+    return amt_reply_finish_ok(channel, rsp_ptr);
+}
+
+int set_ap_sw_version_rsp(amt_buf_st *rsp_ptr)
+{
+    PUB_LOG_ENTRY(g_amt_handle_log);
+    if (rsp_ptr == nullptr) {
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
+        return PUB_ERR_PARAM;
+    }
+    char version_a[AMT_AP_VERSION_SIZE] = {};
+    uint32_t length = 0;
+    if (const int status = get_ap_sw_version(version_a, &length); status != PUB_ERR_NONE) {
+        PUB_LOG_ERROR(g_amt_handle_log, status);
+        PUB_LOG(g_amt_handle_log, "failed to get ap's sw version");
+        return status;
+    }
+    add_version(rsp_ptr, version_a, length);
+    return PUB_ERR_NONE;
+}
