@@ -1,0 +1,177 @@
+#include "amt/amt-handle/request/mode-switch.h"
+
+#include <inttypes.h>
+#include <signal.h>
+#include <string.h>
+#include <unistd.h>
+
+#include "amt/amt-command.h"
+#include "amt/amt-device/test-hal.h"
+#include "amt/amt-handle/channel/at-exchange.h"
+#include "amt/amt-handle/channel/handshake.h"
+#include "amt/amt-handle/request/power-off.h"
+#include "amt/amt-handle/request/request-frame.h"
+#include "amt/amt-packet.h"
+#include "platform/include/cutils/properties.h"
+#include "pub/error.h"
+#include "pub/util/thread-end.h"
+
+namespace {
+
+constexpr uint8_t ATOM_HANDSHAKE = 192; /* operation in a request, flag in a response */
+constexpr uint8_t ATOM_WANTED_MODE = 201;
+constexpr uint8_t ATOM_BOOT_DOWNLOAD = 204;
+constexpr uint8_t RSP_POWER_OFF = 237;
+constexpr uint8_t RSP_BOOT_DOWNLOAD = 245;
+
+constexpr int HANDSHAKE_NOT_PERMITTED = 0;
+constexpr int32_t BOOT_DOWNLOAD_UNKNOWN = 2;
+
+constexpr const char *SWITCH_PROPERTY = "amt.normal.amt.switch_status";
+constexpr const char *USB_PROPERTY = "sys.usb.config";
+constexpr const char *USB_UNSET = "@#no_set_config#@"; /* holds no function that could be looked for */
+constexpr const char *STOP_PROPERTY = "ctl.stop";
+constexpr const char *SIBLING_SERVICE = "vx-kel-mla0";
+
+/* How long the app has for reading the answer before its line goes down. */
+constexpr uint32_t ANSWER_PAUSE_MS = 500;
+
+constexpr amt_at_exchange_st g_band_exchange = {"amt_change_band", amt_at_trace_en::TEXT, AMT_AT_OK, false,
+                                                nullptr};
+constexpr amt_at_exchange_st g_switch_exchange = {"amt_handle_normal_to_amt", amt_at_trace_en::TEXT,
+                                                  AMT_AT_OK, false, nullptr};
+
+int switch_modem(int32_t mode)
+{
+    if (const int status = amt_change_band(0); status != PUB_ERR_NONE) {
+        return status;
+    }
+    amt_at_set_command("AT^DSWAMT=%" PRId32 "\r", mode);
+    return amt_at_exchange(g_switch_exchange, nullptr);
+}
+
+void activate_usb_serial()
+{
+    char config_a[PROPERTY_VALUE_MAX] = {};
+    property_get(USB_PROPERTY, config_a, USB_UNSET);
+    PUB_LOG(g_amt_handle_log, "property-%s value: %s", USB_PROPERTY, config_a);
+    if (strstr(config_a, "serial") != nullptr) {
+        PUB_LOG(g_amt_handle_log, "already activate serial, do not reset. ");
+        return;
+    }
+    constexpr const char *usb_serial = "serial,adb";
+    PUB_LOG(g_amt_handle_log, "will set property(%s) to %s.", USB_PROPERTY, usb_serial);
+    property_set(USB_PROPERTY, usb_serial);
+}
+
+void end_program()
+{
+    PUB_LOG(g_amt_handle_log, "will exit program.");
+    pub_util_sleep_ms(ANSWER_PAUSE_MS);
+    const int stopped = property_set(STOP_PROPERTY, SIBLING_SERVICE);
+    PUB_LOG(g_amt_handle_log, "stop vx-kel-mla return: %d", stopped);
+    kill(getpid(), SIGTERM);
+}
+
+/* The check of the handlers that accept an empty request. */
+int check_presence(int line, const char *func, uint32_t channel, const amt_buf_st *req_ptr,
+                   const amt_buf_st *rsp_ptr)
+{
+    pub_log_entry(g_amt_handle_log, func);
+    if (channel != AMT_CHANNEL_NONE && req_ptr != nullptr && rsp_ptr != nullptr) {
+        return PUB_ERR_NONE;
+    }
+    pub_log_error(g_amt_handle_log, line, func, PUB_ERR_PARAM);
+    PUB_LOG_FLAGS(g_amt_handle_log, channel == AMT_CHANNEL_NONE, req_ptr == nullptr, rsp_ptr == nullptr);
+    return PUB_ERR_PARAM;
+}
+
+} // namespace
+
+int amt_change_band(int32_t band)
+{
+    PUB_LOG_ENTRY(g_amt_handle_log);
+    PUB_LOG(g_amt_handle_log, "amt_change_band band:%" PRId32, band);
+    amt_at_set_command("AT^DMPCHN=%" PRId32 "\r", band);
+    return amt_at_exchange(g_band_exchange, nullptr);
+}
+
+int amt_handle_normal_to_amt(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
+{
+    if (const int status = AMT_BEGIN_MODEM_REQUEST(channel, req_ptr, rsp_ptr); status != PUB_ERR_NONE) {
+        return status;
+    }
+    const int32_t mode = amt_packet_get_int(req_ptr->m_buf_a, ATOM_WANTED_MODE);
+    PUB_LOG(g_amt_handle_log, "amt_handle_normal_to_amt amt_mode:%" PRId32, mode);
+    if (switch_modem(mode) != PUB_ERR_NONE) {
+        return amt_reply_failed(channel, rsp_ptr, AMT_NORMAL_TO_AMT_RSPCMD);
+    }
+    constexpr const char *switched = "1";
+    property_set(SWITCH_PROPERTY, switched);
+    PUB_LOG(g_amt_handle_log, "set property(%s) to %s.", SWITCH_PROPERTY, switched);
+    amt_reply_start(rsp_ptr, AMT_NORMAL_TO_AMT_RSPCMD);
+    const int status = amt_reply_finish_ok(channel, rsp_ptr);
+    activate_usb_serial();
+    end_program();
+    return status;
+}
+
+int amt_handle_damt1_cmd(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
+{
+    if (const int status = AMT_BEGIN_MODEM_REQUEST(channel, req_ptr, rsp_ptr); status != PUB_ERR_NONE) {
+        return status;
+    }
+    const int32_t operation = amt_packet_get_int(req_ptr->m_buf_a, ATOM_HANDSHAKE);
+    PUB_LOG(g_amt_handle_log, "amt_handle_damt1_cmd op_type:%" PRId32, operation);
+    int flag = 0;
+    const int status = handle_amt_damt1_operation(operation, &flag);
+    PUB_LOG(g_amt_handle_log, "amt_handle_damt1_cmd op_type:%" PRId32 "; flag:%d; ret_val:%d.", operation,
+            flag, status);
+    if (status != PUB_ERR_NONE) {
+        return amt_reply_failed(channel, rsp_ptr, AMT_DAMT1_RSPCMD);
+    }
+    amt_reply_start(rsp_ptr, AMT_DAMT1_RSPCMD);
+    amt_packet_add_int(rsp_ptr->m_buf_a, ATOM_HANDSHAKE, flag);
+    return amt_reply_finish_ok(channel, rsp_ptr);
+}
+
+int amt_handle_not_permit_handshake(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
+{
+    if (check_presence(__LINE__, __func__, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+        return PUB_ERR_PARAM;
+    }
+    int flag = 0;
+    if (const int status = handle_amt_damt1_operation(HANDSHAKE_NOT_PERMITTED, &flag); status != PUB_ERR_NONE)
+    {
+        return status;
+    }
+    return amt_handle_send_rsp_ok(channel, rsp_ptr, AMT_DAMT1_RSPCMD);
+}
+
+int amt_handle_power_off(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
+{
+    if (check_presence(__LINE__, __func__, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+        return PUB_ERR_PARAM;
+    }
+    const int status = amt_handle_send_rsp_ok(channel, rsp_ptr, RSP_POWER_OFF);
+    amt_power_off_handset();
+    return status;
+}
+
+int amt_modem_boot_dl_fin_read(uint32_t channel, amt_buf_st *, amt_buf_st *rsp_ptr)
+{
+    PUB_LOG_ENTRY(g_amt_handle_log);
+    PUB_LOG(g_amt_handle_log, "amt_modem_boot_dl_fin_read.");
+    amt_reply_start(rsp_ptr, RSP_BOOT_DOWNLOAD);
+    int32_t flag = BOOT_DOWNLOAD_UNKNOWN;
+    const int status = amt_boot_dl_fin_read(&flag);
+    PUB_LOG(g_amt_handle_log, "amt_modem_boot_dl_fin_read finished. flag:%" PRId32 "; ret_val:%d.", flag,
+            status);
+    if (status != PUB_ERR_NONE) {
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        PUB_LOG(g_amt_handle_log, "read error");
+        return PUB_ERR_FAIL;
+    }
+    amt_packet_add_int(rsp_ptr->m_buf_a, ATOM_BOOT_DOWNLOAD, flag);
+    return amt_reply_finish_ok(channel, rsp_ptr);
+}

@@ -1,0 +1,45 @@
+#pragma once
+
+#include <stdint.h>
+
+#include "amt/amt-buf.h"
+
+/*
+ * Handlers (see amt_handle_func) of the requests that switch the handset between its normal and its
+ * factory-test mode, or off. Unless stated otherwise: -101 for a bad channel, request or response and -111
+ * without a modem, both without an answer; every other failure is answered with result 10, and the status of
+ * that send is returned.
+ */
+
+/*
+ * Id 195: addresses modem channel 0, sets the wanted mode in the modem, turns the serial function of the USB
+ * port on, stops the sibling service and ends the daemon with SIGTERM half a second after its answer. Returns
+ * the status of the answer if the signal has not ended the process by then.
+ */
+int amt_handle_normal_to_amt(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr);
+
+/* Addresses the modem channel of that number. Returns 0 or the failing status of the exchange; answers
+ * nothing. */
+int amt_change_band(int32_t band);
+
+/* Id 219 from the app: writes (0, 1) or reads (2) the permission to enter the test mode by handshake. */
+int amt_handle_damt1_cmd(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr);
+
+/*
+ * Id 219 from the PC: withdraws that permission. Needs no modem and accepts an empty request. Returns -101 or
+ * the failing status of the file operation without an answer.
+ */
+int amt_handle_not_permit_handshake(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr);
+
+/*
+ * Id 236 from the PC: answers, then powers the handset off. Needs no modem and accepts an empty request.
+ * Returns the status of the answer if the system refuses to power off.
+ */
+int amt_handle_power_off(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr);
+
+/*
+ * Id 244 from the PC: whether the boot download has finished, as the test library tells. Needs no modem.
+ * Returns -100 without an answer when the library cannot be asked. Requires req_ptr and rsp_ptr to be
+ * present.
+ */
+int amt_modem_boot_dl_fin_read(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr);

@@ -1,0 +1,27 @@
+#pragma once
+
+#include <stdint.h>
+
+#include "amt/amt-buf.h"
+
+/*
+ * Handlers (see amt_handle_func) that read one value of the modem or of the battery driver. The first three
+ * return -101 for a bad channel, request or response without an answer; every later failure is answered with
+ * result 10, and the status of that send is returned.
+ */
+
+/* Id 85: the board number, at most 38 characters. -111 without a modem, unanswered. */
+int amt_modem_handle_read_board(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr);
+
+/* Id 65: the out-date record, at most 14 characters. -111 without a modem, unanswered. */
+int amt_modem_handle_read_outdate(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr);
+
+/* Id 55: the battery temperature, in the driver's unit. Needs no modem. */
+int amt_modem_handle_temperature(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr);
+
+/*
+ * Selects the modem channel that later AT commands address: integer atom 159 of the request. Answers on
+ * success only (id 233). Returns the status of the send, -111 without a modem, -100 when the modem's single
+ * answer holds no "OK", or the failing status of the channel. Requires req_ptr and rsp_ptr to be present.
+ */
+int amt_channel_switch(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr);
