@@ -66,12 +66,14 @@ int32_t stand_in_replace_file(const char *path, const char *text, uint32_t lengt
 
 uint32_t stand_in_escape(char *text, uint32_t length, uint32_t capacity)
 {
+    /* Nearly every text has none, and the log asks for each record: memchr is several times faster than a
+     * loop. */
+    if (memchr(text, '\n', length) == nullptr && memchr(text, '\r', length) == nullptr) {
+        return length < capacity ? length : capacity;
+    }
     uint32_t breaks = 0;
     for (uint32_t i = 0; i < length; i++) {
         breaks += text[i] == '\n' || text[i] == '\r';
-    }
-    if (breaks == 0) {
-        return length < capacity ? length : capacity;
     }
     /* From the end backwards, so that nothing is overwritten before it was moved. */
     const uint32_t escaped_length = length + breaks;
