@@ -20,7 +20,7 @@ class AtCommand:
 
     text: str
     does: str
-    reply: str
+    reply: str = ""
     errors: str = ""
     refused: str = ""
     why: str = ""
@@ -40,8 +40,8 @@ AT_COMMANDS: tuple[AtCommand, ...] = (
               ERROR + ", for any other N and without N"),
     AtCommand("AT^DBTCTRL=N", "Bluetooth: N 0 off, 1 on", "", ERROR + " and for any other N"),
     AtCommand("AT^DGPSCTRL=FLAG[,INDEX]",
-              "GPS: FLAG 0 stop; 2 start and read the signal of satellite INDEX",
-              "^DGPSCTRL: SATELLITE,CNR (only for FLAG 2)",
+              "GPS: FLAG 0 stop, answered with OK alone; 2 start and read the signal of "
+              "satellite INDEX", "^DGPSCTRL: SATELLITE,CNR",
               ERROR + ", for any other FLAG, and for FLAG 2 without INDEX",
               r"AT\^DGPSCTRL=,*\r?$", "the flag is missing"),
     AtCommand("AT^DWLTSD=CTRL[,CHANNEL,RATE,POWER]",
@@ -56,8 +56,8 @@ AT_COMMANDS: tuple[AtCommand, ...] = (
     AtCommand("AT^DPCBACTRL=2,NUMBER", "write the PCBA serial number (1 to 29 characters)", "",
               ERROR + "; any operation but 1 and 2 answers ERROR too",
               r"AT\^DPCBACTRL=(?:,*|2,*)\r?$", "the operation or the number is missing"),
-    AtCommand("AT^DAMT1=N", "entry by USB insertion: N 0 deny, 1 allow, 2 query",
-              "^DAMT1: PERMISSION (only for N 2)", ERROR + " and for any other N",
+    AtCommand("AT^DAMT1=N", "entry by USB insertion: N 0 deny and 1 allow, answered with OK "
+              "alone; 2 query", "^DAMT1: PERMISSION", ERROR + " and for any other N",
               r"AT\^DAMT1=,*\r?$", "the operation is missing"),
     AtCommand("AT^DENTERIDLE", "put the handset into idle", "", ERROR),
     AtCommand("AT^DBOOTDLFIN", "read the boot-download-finished flag", "^DBOOTDLFIN: FLAG",

@@ -17,12 +17,12 @@ def _table_entry(index: int) -> int:
     return value
 
 
-_TABLE = tuple(_table_entry(index) for index in range(256))
+TABLE = tuple(_table_entry(index) for index in range(256))
 
 
 def checksum(data: bytes) -> int:
     """The 32-bit checksum of ``data``."""
-    table = _TABLE
+    table = TABLE
     crc = 0
     for byte in bytes(data) + b"\0\0\0\0":
         crc = ((crc << 8 | byte) & 0xFFFFFFFF) ^ table[crc >> 24]

@@ -155,7 +155,6 @@ class Request:
 
     id: int
     name: str
-    family: str
     summary: str
     fields: tuple[Field, ...] = ()
     answer_fields: tuple[Field, ...] = (RESULT,)

@@ -5,7 +5,6 @@ from __future__ import annotations
 from station.requests import RESULT, Channel, Field, Operation, Refusal, Request, Service
 from station.table.common import BOOL, INT, STRING, on_pc
 
-FAMILY = "identity"
 
 _PC = (Channel.PC,)
 _UNKNOWN = Refusal("the operation is none of the listed")
@@ -21,7 +20,7 @@ _WIFI_REFUSALS = (
 
 REQUESTS: tuple[Request, ...] = (
     Request(
-        193, "pcba", FAMILY, "PCBA serial number in /amt/sn-2.txt",
+        193, "pcba", "PCBA serial number in /amt/sn-2.txt",
         fields=(Field(190, BOOL, "operation", "1 read, 2 write; the first byte of the atom "
                       "counts, whatever its type", choices={"read": 1, "write": 2},
                       absent="0 (refused)"),
@@ -40,7 +39,7 @@ REQUESTS: tuple[Request, ...] = (
             Operation(("pcba", "write"), "write the PCBA serial number", {"operation": 2},
                       ("serial",), channels=_PC))),
     Request(
-        191, "adb-serial", FAMILY, "USB (adb) serial number in /amt/usb_serial",
+        191, "adb-serial", "USB (adb) serial number in /amt/usb_serial",
         fields=(Field(160, INT, "operation", "0 read, 1 write",
                       choices={"read": 0, "write": 1}, absent="0 (read)"),
                 Field(162, INT, "length", "bytes of the number to write", unit="bytes", low=1,
@@ -59,7 +58,7 @@ REQUESTS: tuple[Request, ...] = (
             Operation(("adb-serial", "write"), "write the adb serial number", {"operation": 1},
                       ("serial",), channels=_PC))),
     Request(
-        172, "bt-address", FAMILY, "Bluetooth address, and the Bluetooth hardware check",
+        172, "bt-address", "Bluetooth address, and the Bluetooth hardware check",
         fields=(Field(110, INT, "operation", "1 read, 2 write, 3 hardware check",
                       choices={"read": 1, "write": 2, "check": 3}, absent="0 (refused)"),
                 Field(111, STRING, "address", "address to write, at most 59 characters",
@@ -76,7 +75,7 @@ REQUESTS: tuple[Request, ...] = (
             Operation(("bluetooth", "check"), "check the Bluetooth hardware",
                       {"operation": 3}))),
     Request(
-        185, "wifi-address", FAMILY, "Wi-Fi address, and the Wi-Fi connectivity check",
+        185, "wifi-address", "Wi-Fi address, and the Wi-Fi connectivity check",
         fields=(Field(152, INT, "operation", "0 read, 1 write, 2 connectivity check",
                       choices={"read": 0, "write": 1, "check": 2}, absent="0 (read)"),
                 Field(153, STRING, "address", "address to write, at most 59 characters",

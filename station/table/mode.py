@@ -5,7 +5,6 @@ from __future__ import annotations
 from station.requests import RESULT, Channel, Field, Operation, Refusal, Request, Service
 from station.table.common import (INT, MODEM_ERROR, NO_MODEM, TEST_HAL, asks_modem, on_pc)
 
-FAMILY = "mode"
 
 PERMISSIONS = {"deny": 0, "allow": 1}
 _OPERATIONS = {**PERMISSIONS, "query": 2}
@@ -13,7 +12,7 @@ _PC, _APP = (Channel.PC,), (Channel.APP,)
 
 REQUESTS: tuple[Request, ...] = (
     Request(
-        195, "mode-enter", FAMILY, "leave normal mode for the factory-test mode",
+        195, "mode-enter", "leave normal mode for the factory-test mode",
         fields=(Field(201, INT, "mode", "mode value handed to the modem", absent="0"),),
         app=asks_modem("sets modem channel 0 (AT^DMPCHN), then the mode (AT^DSWAMT), answers, "
                        "sets the USB port to serial and ends the service, which starts again on "
@@ -21,14 +20,14 @@ REQUESTS: tuple[Request, ...] = (
         operations=(Operation(("mode", "enter"), "enter the factory-test mode", takes=("mode",),
                               channels=_APP),)),
     Request(
-        197, "mode-support", FAMILY, "whether the modem supports the factory-test mode",
+        197, "mode-support", "whether the modem supports the factory-test mode",
         answer_fields=(Field(202, INT, "standby0-rat", "the modem's standby0_rat value"), RESULT),
         app=asks_modem("asks the modem (AT^DMCC?)", MODEM_ERROR,
                        Refusal("the answer has fewer than four fields", 10)),
         operations=(Operation(("mode", "support"), "ask the modem for its support",
                               channels=_APP),)),
     Request(
-        219, "damt1", FAMILY, "whether a USB-inserted start may enter the test mode",
+        219, "damt1", "whether a USB-inserted start may enter the test mode",
         fields=(Field(192, INT, "operation", "0 deny, 1 allow, 2 query; app channel only",
                       choices=_OPERATIONS, low=0, high=2, absent="0 (deny)"),),
         answer_fields=(Field(192, INT, "permission", "0 denied, 1 allowed; meant for the query, "
@@ -47,19 +46,19 @@ REQUESTS: tuple[Request, ...] = (
             Operation(("damt1", "query"), "ask for the permission", {"operation": 2},
                       channels=_APP))),
     Request(
-        236, "power-off", FAMILY, "power the handset off",
+        236, "power-off", "power the handset off",
         pc=on_pc("answers, waits 2 s and powers off"),
         at_twin="AT^DAMTOFF",
         operations=(Operation(("power-off",), "power the handset off", channels=_PC),)),
     Request(
-        240, "idle", FAMILY, "put the handset into idle",
+        240, "idle", "put the handset into idle",
         pc=on_pc("calls the platform's test library", TEST_HAL),
         app=Service("handset", False, "calls the platform's test library", (TEST_HAL,)),
         notes=("A library that reports -104 makes the PC line pass the request on to the modem.",),
         at_twin="AT^DENTERIDLE",
         operations=(Operation(("idle",), "put the handset into idle"),)),
     Request(
-        244, "boot-download", FAMILY, "the boot-download-finished flag",
+        244, "boot-download", "the boot-download-finished flag",
         answer_fields=(Field(204, INT, "flag", "verdict of the platform's sanity check, passed "
                              "through"), RESULT),
         pc=on_pc("calls the platform's test library",

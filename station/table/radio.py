@@ -5,7 +5,6 @@ from __future__ import annotations
 from station.requests import RESULT, Field, Operation, Refusal, Request
 from station.table.common import BYTES, INT, TEST_LIBRARY, on_app, on_pc
 
-FAMILY = "radio"
 
 _WIFI_STEPS = {"start": 1, "stop": 2, "tx-start": 3, "tx-stop": 4, "rx-start": 5, "rx-stop": 6}
 _WIFI_HOW = "runs the step in the test library; a repeated start or stop does nothing"
@@ -29,13 +28,13 @@ _ANSWER_ONLY = "answers only, without touching the hardware"
 
 REQUESTS: tuple[Request, ...] = (
     Request(
-        170, "bluetooth", FAMILY, "switch the Bluetooth chip on for testing",
+        170, "bluetooth", "switch the Bluetooth chip on for testing",
         pc=on_pc(_BT_HOW, *_BT_REFUSALS), app=on_app(_BT_HOW, *_BT_REFUSALS),
         answers=2, timeout=60.0, at_twin="AT^DBTCTRL=1",
         operations=(Operation(("bluetooth", "start"), "switch the Bluetooth chip on and wait "
                               "until it is"),)),
     Request(
-        187, "wifi", FAMILY, "Wi-Fi radio test",
+        187, "wifi", "Wi-Fi radio test",
         fields=(Field(154, BYTES, "step", "what to do; the first byte of the atom counts, "
                       "whatever its type", choices=_WIFI_STEPS, width=1, absent="0 (refused)"),
                 Field(155, BYTES, "channel", "Wi-Fi channel", width=1, low=0, high=255,
@@ -67,7 +66,7 @@ REQUESTS: tuple[Request, ...] = (
             Operation(("wifi", "rx", "stop"), "stop reception and read the packets received",
                       {"step": 6}, before=_WIFI_ON))),
     Request(
-        174, "gps-control", FAMILY, "GPS start, stop and connectivity check",
+        174, "gps-control", "GPS start, stop and connectivity check",
         fields=(Field(140, INT, "operation", "0 stop, 1 start, 2 connectivity check; any other "
                       "starts", choices={"stop": 0, "start": 1, "check": 2},
                       absent="0 (stop)"),),
@@ -77,13 +76,13 @@ REQUESTS: tuple[Request, ...] = (
                     Operation(("gps", "stop"), "stop the GPS", {"operation": 0}),
                     Operation(("gps", "check"), "check the GPS chip", {"operation": 2}))),
     Request(
-        176, "gps-test", FAMILY, "GPS test, only acknowledged",
+        176, "gps-test", "GPS test, only acknowledged",
         pc=on_pc(_ANSWER_ONLY), app=on_app(_ANSWER_ONLY), answer=175,
         notes=("Answered with 175, the answer id of GPS control; 177 comes only as an error "
                "packet.",),
         operations=(Operation(("gps", "test"), "GPS test (answered only)"),)),
     Request(
-        178, "gps-read", FAMILY, "signal of one satellite",
+        178, "gps-read", "signal of one satellite",
         fields=(Field(141, INT, "index", "satellite index", absent="0"),),
         answer_fields=(Field(144, INT, "cnr", "carrier-to-noise value",
                              unit="the test library's, usually dB-Hz"),

@@ -5,7 +5,6 @@ from __future__ import annotations
 from station.requests import RESULT, Channel, Field, Operation, Refusal, Request, Service
 from station.table.common import INT, MODEM_ERROR, STRING, VERDICTS, asks_modem, on_app
 
-FAMILY = "test result"
 
 _VERDICT = Field(36, INT, "verdict", "1 pass, 2 fail, anything else unknown", choices=VERDICTS,
                  low=0, high=2, flags=True, absent="0 (unknown)")
@@ -14,7 +13,7 @@ _DESCRIPTION_OUT = Field(37, STRING, "description", "test description, at most 1
 
 REQUESTS: tuple[Request, ...] = (
     Request(
-        91, "test-result-write", FAMILY, "store a station's verdict",
+        91, "test-result-write", "store a station's verdict",
         fields=(Field(39, INT, "station", "station number; 0 to 19 are mirrored in "
                       "/amt/amt_result.txt", low=0, absent="0"),
                 _VERDICT,
@@ -27,7 +26,7 @@ REQUESTS: tuple[Request, ...] = (
         operations=(Operation(("test-result", "write"), "store a station's verdict",
                               takes=("station", "verdict"), may_take=("description",)),)),
     Request(
-        89, "test-result-read", FAMILY, "read a station's verdict from the modem",
+        89, "test-result-read", "read a station's verdict from the modem",
         fields=(Field(39, INT, "station", "station number", low=0, absent="0"),),
         answer_fields=(_STATION_OUT, _VERDICT, _DESCRIPTION_OUT, RESULT),
         app=asks_modem("asks the modem (AT^DATOMR) and writes the verdict to "
@@ -37,7 +36,7 @@ REQUESTS: tuple[Request, ...] = (
         operations=(Operation(("test-result", "read"), "read a station's verdict",
                               takes=("station",)),)),
     Request(
-        228, "item-result-read", FAMILY, "read an item of /amt/product.txt",
+        228, "item-result-read", "read an item of /amt/product.txt",
         fields=(Field(39, INT, "station", "item index, counted from 0", low=0, high=35,
                       absent="0"),),
         answer_fields=(_STATION_OUT, _VERDICT, RESULT),
@@ -48,7 +47,7 @@ REQUESTS: tuple[Request, ...] = (
         operations=(Operation(("item-result", "read"), "read an item (counted from 0)",
                               takes=("station",), channels=(Channel.APP,)),)),
     Request(
-        230, "item-result-write", FAMILY, "store an item in /amt/product.txt",
+        230, "item-result-write", "store an item in /amt/product.txt",
         fields=(Field(39, INT, "station", "item number, counted from 1", low=1, high=36,
                       absent="0 (writes the first item)"), _VERDICT),
         app=on_app("writes the item; a missing file is made first, with every item unknown",

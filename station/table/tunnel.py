@@ -12,15 +12,13 @@ from station.catalogue import command_name
 from station.requests import RESULT, Field, Refusal, Request
 from station.table.common import BOOL, BYTES, INT, asks_modem
 
-FAMILY = "tunnel"
 
 _SERVICE = asks_modem(
     "the atoms' values are sent in order in one AT^DTTEST block, and the block of the modem's "
-    "answer becomes the answer packet",
+    "answer becomes the answer packet; OK without a block leaves the request unanswered",
     Refusal("an atom is malformed, or the block is longer than 2041 bytes"),
     Refusal("the modem answers ERROR, +CME ERROR or +CMS ERROR, its line fails, or its block "
             "cannot be converted"))
-_SILENT_OK = "A modem that answers OK without a block leaves the request unanswered."
 
 _IDS = (1, 3, *range(11, 28, 2), 39, 41, 42, 43, 47, 49, 51, 53, 59, 61, 63, *range(67, 84, 2),
         93, 95, 97, 101, 103, *range(105, 136, 2), 149, 151, 153, 155, 201, 204, 205, 207, 209,
@@ -55,9 +53,9 @@ _NOTES: Mapping[int, tuple[str, ...]] = {
 def _row(command: int) -> Request:
     name = command_name(command)
     plain = name.removeprefix("AMT_").removesuffix("_CMD").lower().replace("_", "-")
-    return Request(command, plain, FAMILY, name, app=_SERVICE, answer=_ANSWER_IDS.get(command),
+    return Request(command, plain, name, app=_SERVICE, answer=_ANSWER_IDS.get(command),
                    answer_fields=_ANSWER_FIELDS.get(command, (RESULT,)),
-                   notes=(*_NOTES.get(command, ()), _SILENT_OK))
+                   notes=_NOTES.get(command, ()))
 
 
 REQUESTS: tuple[Request, ...] = tuple(_row(command) for command in _IDS)
