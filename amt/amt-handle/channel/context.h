@@ -11,8 +11,8 @@
 constexpr uint32_t AMT_HANDLE_FUNC_COUNT = 255;
 
 /*
- * The one hub record: threads, descriptors, buffers and handler tables. Zeroed at start-up before any thread exists.
- * A descriptor of 0 or less is closed. Each buffer belongs to the one reader thread that fills it.
+ * The one hub record: threads, descriptors, buffers and handler tables. Zeroed at start-up before any thread
+ * exists. A descriptor of 0 or less is closed. Each buffer belongs to the one reader thread that fills it.
  */
 struct handle_context_st
 {
@@ -20,21 +20,26 @@ struct handle_context_st
     amt_worker_st m_pc_reader;
     amt_worker_st m_modem_reader;
     amt_worker_st m_usb_monitor;
-    pub_pty_st m_pty;             /* the app's pseudo-terminal */
-    std::atomic<int> m_fd_pc;     /* PC serial port */
-    std::atomic<int> m_fd_at;     /* AT-mux tty of the modem: the AT command channel */
-    std::atomic<int> m_fd_modem;  /* modem data tty */
-    amt_buf_st m_req;             /* what the PC or the app has sent; the two paths never run together */
-    uint8_t m_req_end;            /* always 0: text searches in m_req stop here */
-    amt_buf_st m_rsp_pc;          /* responses to the PC */
-    amt_buf_st m_rsp_app;         /* responses to the app */
-    amt_buf_st m_modem;           /* what the modem has sent and the PC has not got yet */
-    uint8_t m_modem_end;          /* always 0: text searches in m_modem stop here */
-    amt_buf_st m_pc;              /* the PC request without its envelope */
+    pub_pty_st m_pty;            /* the app's pseudo-terminal */
+    std::atomic<int> m_fd_pc;    /* PC serial port */
+    std::atomic<int> m_fd_at;    /* AT-mux tty of the modem: the AT command channel */
+    std::atomic<int> m_fd_modem; /* modem data tty */
+    amt_buf_st m_req;            /* what the PC or the app has sent; the two paths never run together */
+    amt_buf_st m_rsp_pc;         /* responses to the PC */
+    amt_buf_st m_rsp_app;        /* responses to the app */
+    amt_buf_st m_modem;          /* what the modem has sent and the PC has not got yet */
+    amt_buf_st m_pc;             /* the PC request without its envelope */
     amt_handle_func m_handle_pc_func_a[AMT_HANDLE_FUNC_COUNT];
     amt_handle_func m_handle_app_func_a[AMT_HANDLE_FUNC_COUNT];
 };
 extern handle_context_st g_handle_context;
+
+/* What one read may hold at most: the byte behind it stays 0, so that text searches end inside the buffer. */
+constexpr uint32_t AMT_HELD_SIZE = AMT_PACKET_SIZE - 1;
+
+/* 1 when the daemon was started with -u: a USB-inserted start. Set before any thread exists, read-only
+ * afterwards. */
+extern int32_t g_usb_activate;
 
 /* The manufacturing-test modes the hub can be in. */
 constexpr int AMT_MODE_1 = 1; /* PC path, packets seen */
@@ -63,5 +68,6 @@ void amt_handle_clear_context();
 /* Zeroes a whole buffer. */
 void amt_handle_clear_buf(amt_buf_st *buf_ptr);
 
-/* Closes the descriptor if it is open (above 0) and marks it closed. Safe against two threads doing it at once. */
+/* Closes the descriptor if it is open (above 0) and marks it closed. Safe against two threads doing it at
+ * once. */
 void amt_handle_close_fd(std::atomic<int> *fd_ptr);

@@ -1,0 +1,258 @@
+#include "amt/amt-handle/channel/at-io.h"
+
+#include <errno.h>
+#include <string.h>
+#include <time.h>
+#include <unistd.h>
+
+#include "amt/amt-handle/channel/context.h"
+#include "amt/amt-handle/channel/tty.h"
+#include "amt/amt-handle/channel/wait.h"
+#include "amt/amt-log.h"
+#include "pub/error.h"
+#include "pub/log/print.h"
+#include "pub/util/thread-end.h"
+
+namespace {
+
+constexpr char PROGRAM[] = "vx-kel-amt";
+
+/* The line number that write_at's progress text has always shown. */
+constexpr int WRITE_AT_LINE = 912;
+
+constexpr char UNSOLICITED_OFF[] = "AT^DLKS=0\r";
+constexpr int WAIT_SECONDS = 5;
+constexpr uint32_t ANSWER_SIZE = 20;
+constexpr uint32_t ANSWER_ROOM = 18;
+
+/* How long to wait before a lost tty is asked again, in milliseconds: the routine must not spin on it. */
+constexpr uint32_t LOST_TTY_PAUSE_MS = 100;
+
+/* What a failed transfer on the AT tty means: -118 when the tty is lost and may be reopened. */
+int get_transfer_error(bool is_write)
+{
+    if (is_write && g_handle_state.m_is_no_modem != 0) {
+        return PUB_ERR_FAIL;
+    }
+    return errno == EIO ? PUB_ERR_FILE : PUB_ERR_FAIL;
+}
+
+int reopen()
+{
+    const int status = amt_tty_open_at();
+    if (status == PUB_ERR_NONE) {
+        disable_unsolicited_code(g_handle_context.m_fd_at);
+    }
+    return status;
+}
+
+/* One write of the whole text, with errno set on failure. Descriptor 0 is never the modem's. */
+ssize_t write_once(const char *text, uint32_t length)
+{
+    const int fd = g_handle_context.m_fd_at;
+    if (fd <= 0) {
+        errno = EBADF;
+        return -1;
+    }
+    return write(fd, text, length);
+}
+
+/* One read. The end of data means the same as EIO: the line was hung up, and only a reopen brings it back. */
+ssize_t read_once(char *buf, uint32_t length)
+{
+    const int fd = g_handle_context.m_fd_at;
+    if (fd <= 0) {
+        errno = EBADF;
+        return -1;
+    }
+    return amt_wait_read(fd, buf, length);
+}
+
+int rewrite_after_reopen(const char *text, uint32_t length)
+{
+    const int status = reopen();
+    if (status != PUB_ERR_NONE) {
+        return status;
+    }
+    return write_once(text, length) == static_cast<ssize_t>(length) ? PUB_ERR_NONE : PUB_ERR_FAIL;
+}
+
+int reread_after_reopen(char *buf, uint32_t length, ssize_t *count_ptr)
+{
+    const int status = reopen();
+    if (status != PUB_ERR_NONE) {
+        return status;
+    }
+    *count_ptr = read_once(buf, length);
+    return *count_ptr > 0 ? PUB_ERR_NONE : PUB_ERR_FAIL;
+}
+
+/* The error line of the switch-off, which always names the public operation. */
+int fail_switch_off(int line, int error_code)
+{
+    pub_log_error(g_amt_handle_log, line, "disable_unsolicited_code", error_code);
+    return error_code;
+}
+
+int send_switch_off(int fd)
+{
+    const int ready = amt_wait_writable(fd, WAIT_SECONDS * 1000);
+    if (ready == 0) {
+        const int status = fail_switch_off(__LINE__, PUB_ERR_TIMEOUT);
+        PUB_LOG(g_amt_handle_log, "wait %d seconds to write time out", WAIT_SECONDS);
+        return status;
+    }
+    if (ready < 0) {
+        PUB_LOG_SYS_CALL(g_amt_handle_log, "select");
+        return fail_switch_off(__LINE__, PUB_ERR_FILE);
+    }
+    const ssize_t written = write(fd, UNSOLICITED_OFF, sizeof(UNSOLICITED_OFF) - 1);
+    if (written < 0) {
+        PUB_LOG_SYS_CALL(g_amt_handle_log, "write");
+        return fail_switch_off(__LINE__, PUB_ERR_FILE);
+    }
+    if (written != static_cast<ssize_t>(sizeof(UNSOLICITED_OFF) - 1)) {
+        PUB_LOG(g_amt_handle_log, "WARNING !");
+        PUB_LOG(g_amt_handle_log, "write not completed: to write(%zu) != written(%zd)",
+                sizeof(UNSOLICITED_OFF) - 1, written);
+        return fail_switch_off(__LINE__, PUB_ERR_INCOMPLETE);
+    }
+    return PUB_ERR_NONE;
+}
+
+int read_answer_piece(int fd, char *answer)
+{
+    const ssize_t count = amt_wait_read(fd, answer, ANSWER_ROOM);
+    if (count < 0) {
+        PUB_LOG_SYS_CALL(g_amt_handle_log, "read");
+        fail_switch_off(__LINE__, PUB_ERR_FILE);
+    }
+    if (count <= 0) {
+        pub_util_sleep_ms(LOST_TTY_PAUSE_MS);
+    }
+    return count < 0 ? PUB_ERR_FILE : PUB_ERR_NONE;
+}
+
+int report_time_out(const timespec &start)
+{
+    timespec end = {};
+    clock_gettime(CLOCK_REALTIME, &end);
+    if (end.tv_sec <= start.tv_sec) {
+        return PUB_ERR_NONE;
+    }
+    PUB_LOG(g_amt_handle_log, "read time out: %ld:%ld -> %ld:%ld", static_cast<long>(start.tv_sec),
+            start.tv_nsec, static_cast<long>(end.tv_sec), end.tv_nsec);
+    return fail_switch_off(__LINE__, PUB_ERR_FILE);
+}
+
+/* Waits for one piece of the answer. Each piece replaces the one before it. */
+int wait_for_answer_piece(int fd, char *answer)
+{
+    timespec start = {};
+    clock_gettime(CLOCK_REALTIME, &start);
+    const int ready = amt_wait_readable(fd, WAIT_SECONDS * 1000);
+    if (ready > 0) {
+        return read_answer_piece(fd, answer);
+    }
+    if (ready == 0) {
+        return report_time_out(start);
+    }
+    PUB_LOG_SYS_CALL(g_amt_handle_log, "select");
+    const int status = fail_switch_off(__LINE__, PUB_ERR_FILE);
+    pub_util_sleep_ms(LOST_TTY_PAUSE_MS);
+    return status;
+}
+
+bool holds_error_result(const char *answer)
+{
+    static constexpr const char *error_a[] = {"\r\nERROR\r\n", "\r\n+CME ERROR: ", "\r\n+CMS ERROR: "};
+    for (const char *const error : error_a) {
+        if (strstr(answer, error) != nullptr) {
+            return true;
+        }
+    }
+    return false;
+}
+
+} // namespace
+
+int write_at(const char *text, uint32_t length)
+{
+    if (text == nullptr || length == 0) {
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
+        PUB_LOG_FLAGS(g_amt_handle_log, text == nullptr, length == 0);
+        return PUB_ERR_PARAM;
+    }
+    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_print("[%s:L%d]write_at: %s\n", PROGRAM, WRITE_AT_LINE, text);
+    const ssize_t written = write_once(text, length);
+    int status = written < 0 ? get_transfer_error(true) : PUB_ERR_NONE;
+    pub_print("[%s]write_at return:%d\n", PROGRAM, static_cast<int>(written));
+    PUB_LOG(g_amt_handle_log, "write_at write_len[%d]", static_cast<int>(written));
+    PUB_LOG(g_amt_handle_log, "write_at ret_val[%d]", status);
+    if (status == PUB_ERR_FILE) {
+        status = rewrite_after_reopen(text, length);
+    }
+    if (status != PUB_ERR_NONE) {
+        PUB_LOG_ERROR(g_amt_handle_log, status);
+        return status;
+    }
+    PUB_LOG(g_amt_handle_log, "send ==> %.1023s", text);
+    return PUB_ERR_NONE;
+}
+
+int read_at(char *buf, uint32_t length, int32_t *count_ptr)
+{
+    if (buf == nullptr || length == 0 || count_ptr == nullptr) {
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
+        PUB_LOG_FLAGS(g_amt_handle_log, buf == nullptr, length == 0, count_ptr == nullptr);
+        return PUB_ERR_PARAM;
+    }
+    pub_print("[%s]read_at\n", PROGRAM);
+    ssize_t count = read_once(buf, length);
+    if (count == 0) {
+        errno = EIO;
+    }
+    int status = count <= 0 ? get_transfer_error(false) : PUB_ERR_NONE;
+    buf[count > 0 ? count : 0] = '\0';
+    *count_ptr = static_cast<int32_t>(count);
+    pub_print("[%s]read_at return:%s\n", PROGRAM, buf);
+    PUB_LOG(g_amt_handle_log, "read_at read_len_ptr[%d] buf_ptr[%s]", *count_ptr, buf);
+    if (status != PUB_ERR_NONE) {
+        PUB_LOG(g_amt_handle_log, "read_at ret_val[%d]", status);
+    }
+    if (status == PUB_ERR_FILE) {
+        status = reread_after_reopen(buf, length, &count);
+        buf[count > 0 ? count : 0] = '\0';
+        *count_ptr = static_cast<int32_t>(count);
+    }
+    if (status != PUB_ERR_NONE) {
+        PUB_LOG_ERROR(g_amt_handle_log, status);
+        return status;
+    }
+    PUB_LOG(g_amt_handle_log, "receive <== %.1023s", buf);
+    return PUB_ERR_NONE;
+}
+
+int disable_unsolicited_code(int fd)
+{
+    if (fd <= 0) {
+        return fail_switch_off(__LINE__, PUB_ERR_PARAM);
+    }
+    int status = send_switch_off(fd);
+    if (status != PUB_ERR_NONE) {
+        return status;
+    }
+    /* A silent modem is waited for without limit: without its answer nothing that follows could be told
+     * apart. */
+    for (;;) {
+        char answer_a[ANSWER_SIZE] = {};
+        status = wait_for_answer_piece(fd, answer_a);
+        if (strstr(answer_a, "\r\nOK\r\n") != nullptr) {
+            return status;
+        }
+        if (holds_error_result(answer_a)) {
+            return fail_switch_off(__LINE__, PUB_ERR_FAIL);
+        }
+    }
+}

@@ -1,0 +1,154 @@
+#include "amt/amt-handle/channel/response.h"
+
+#include <string.h>
+#include <unistd.h>
+
+#include "amt/amt-convert.h"
+#include "amt/amt-handle/channel/context.h"
+#include "amt/amt-packet.h"
+#include "pub/error.h"
+
+namespace {
+
+/*
+ * The ready-made frame that tells the station its request has arrived: an envelope without a packet. Stations
+ * compare it byte by byte, so it is never computed.
+ */
+constexpr uint8_t g_pre_rsp_a[] = {0xAA, 0xBB, 0xCC, 0xDD, 0x08, 0x00, 0x00, 0x00,
+                                   0x02, 0x02, 0x00, 0x00, 0x76, 0x4A, 0xEE, 0x1D};
+
+bool is_no_channel(uint32_t channel)
+{
+    const uint32_t low_byte = channel & 0xFF;
+    return low_byte == 0 || low_byte == AMT_CHANNEL_NONE;
+}
+
+int get_fd(uint32_t channel)
+{
+    return channel == AMT_CHANNEL_PC ? g_handle_context.m_fd_pc.load() : g_handle_context.m_pty.m_ptm_fd;
+}
+
+/* The faults the senders look for before anything else. */
+int check_sender(int line, const char *func, uint32_t channel, const amt_buf_st *rsp_ptr)
+{
+    if (!is_no_channel(channel) && rsp_ptr != nullptr) {
+        return PUB_ERR_NONE;
+    }
+    pub_log_error(g_amt_handle_log, line, func, PUB_ERR_PARAM);
+    PUB_LOG_FLAGS(g_amt_handle_log, is_no_channel(channel), rsp_ptr == nullptr);
+    return PUB_ERR_PARAM;
+}
+
+int send_result(uint32_t channel, amt_buf_st *rsp_ptr, uint8_t rsp_id, int32_t code)
+{
+    amt_handle_clear_buf(rsp_ptr);
+    amt_packet_init(rsp_ptr->m_buf_a, rsp_id);
+    amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_RESULT, code);
+    return amt_handle_finish_rsp(channel, rsp_ptr);
+}
+
+int write_rsp(int fd, const amt_buf_st *rsp_ptr)
+{
+    const ssize_t written = write(fd, rsp_ptr->m_buf_a, rsp_ptr->m_buf_len);
+    if (written < 0) {
+        PUB_LOG_SYS_CALL(g_amt_handle_log, "write");
+        pub_log_error(g_amt_handle_log, __LINE__, "amt_handle_send_rsp", PUB_ERR_FILE);
+        return PUB_ERR_FILE;
+    }
+    if (written != static_cast<ssize_t>(rsp_ptr->m_buf_len)) {
+        PUB_LOG(g_amt_handle_log, "WARNING !");
+        PUB_LOG(g_amt_handle_log, "write not completed: to write(%u) != written(%zd)", rsp_ptr->m_buf_len,
+                written);
+        return PUB_ERR_INCOMPLETE;
+    }
+    return PUB_ERR_NONE;
+}
+
+} // namespace
+
+int amt_handle_send_rsp(uint32_t channel, amt_buf_st *rsp_ptr)
+{
+    if (check_sender(__LINE__, __func__, channel, rsp_ptr) != PUB_ERR_NONE) {
+        return PUB_ERR_PARAM;
+    }
+    if (rsp_ptr->m_buf_len == 0) {
+        rsp_ptr->m_buf_len = amt_packet_get_length(rsp_ptr->m_buf_a);
+    }
+    if (rsp_ptr->m_buf_len == 0 || rsp_ptr->m_buf_len > sizeof(rsp_ptr->m_buf_a)) {
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
+        return PUB_ERR_PARAM;
+    }
+    const int fd = get_fd(channel);
+    if (fd <= 0) {
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        PUB_LOG(g_amt_handle_log, "invalid fd");
+        return PUB_ERR_FAIL;
+    }
+    const int status = write_rsp(fd, rsp_ptr);
+    if (status != PUB_ERR_NONE) {
+        return status;
+    }
+    pub_log_dump(g_amt_handle_log,
+                 channel == AMT_CHANNEL_PC ? "send PC rsp data: " : "send APP rsp data: ", rsp_ptr->m_buf_a,
+                 rsp_ptr->m_buf_len);
+    amt_handle_clear_buf(rsp_ptr);
+    return PUB_ERR_NONE;
+}
+
+int amt_handle_send_rsp_ok(uint32_t channel, amt_buf_st *rsp_ptr, uint8_t rsp_id)
+{
+    if (check_sender(__LINE__, __func__, channel, rsp_ptr) != PUB_ERR_NONE) {
+        return PUB_ERR_PARAM;
+    }
+    return send_result(channel, rsp_ptr, rsp_id, 0);
+}
+
+int amt_handle_send_rsp_err(uint32_t channel, amt_buf_st *rsp_ptr, uint8_t rsp_id, int32_t code)
+{
+    if (check_sender(__LINE__, __func__, channel, rsp_ptr) != PUB_ERR_NONE) {
+        return PUB_ERR_PARAM;
+    }
+    return send_result(channel, rsp_ptr, rsp_id, code);
+}
+
+int amt_handle_send_pre_rsp_for_pc(uint32_t channel, amt_buf_st *rsp_ptr)
+{
+    if (channel != AMT_CHANNEL_PC || rsp_ptr == nullptr) {
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
+        PUB_LOG_FLAGS(g_amt_handle_log, channel != AMT_CHANNEL_PC, rsp_ptr == nullptr);
+        return PUB_ERR_PARAM;
+    }
+    amt_handle_clear_buf(rsp_ptr);
+    memcpy(rsp_ptr->m_buf_a, g_pre_rsp_a, sizeof(g_pre_rsp_a));
+    rsp_ptr->m_buf_len = sizeof(g_pre_rsp_a);
+    return amt_handle_send_rsp(channel, rsp_ptr);
+}
+
+int amt_handle_finish_rsp(uint32_t channel, amt_buf_st *rsp_ptr)
+{
+    const int status = channel == AMT_CHANNEL_PC ? amt_convert_app_2_pc(rsp_ptr) : PUB_ERR_NONE;
+    return status == PUB_ERR_NONE ? amt_handle_send_rsp(channel, rsp_ptr) : status;
+}
+
+int amt_handle_check_request(const pub_log_source_st &source, int line, const char *func, uint32_t channel,
+                             const amt_buf_st *req_ptr, const amt_buf_st *rsp_ptr)
+{
+    const bool is_channel_none = channel == AMT_CHANNEL_NONE;
+    const bool is_req_empty = req_ptr != nullptr && req_ptr->m_buf_len == 0;
+    if (!is_channel_none && req_ptr != nullptr && !is_req_empty && rsp_ptr != nullptr) {
+        return PUB_ERR_NONE;
+    }
+    pub_log_error(source, line, func, PUB_ERR_PARAM);
+    PUB_LOG_FLAGS(source, is_channel_none, req_ptr == nullptr, is_req_empty, rsp_ptr == nullptr);
+    return PUB_ERR_PARAM;
+}
+
+int amt_handle_check_modem()
+{
+    if (g_handle_state.m_is_no_modem == 0) {
+        return PUB_ERR_NONE;
+    }
+    PUB_LOG(g_amt_handle_log, "WARNING !");
+    PUB_LOG(g_amt_handle_log, "no CP.");
+    return PUB_ERR_NO_MODEM;
+}
