@@ -1,0 +1,184 @@
+#include "amt/amt-handle/reader/at-factory.h"
+
+#include <errno.h>
+#include <stdint.h>
+#include <stdio.h>
+#include <stdlib.h>
+#include <string.h>
+
+#include "amt/amt-handle/channel/handshake.h"
+#include "amt/amt-handle/reader/at-operand.h"
+#include "amt/amt-handle/reader/at-reply.h"
+#include "amt/amt-handle/request/factory-file.h"
+#include "amt/amt-handle/request/identity-store.h"
+#include "amt/amt-log.h"
+#include "pub/error.h"
+
+namespace {
+
+/* Where the Bluetooth address goes when no handset file holds one yet. */
+constexpr char BT_ADDRESS_FILE[] = "/amt/BT/BT_Address.txt";
+constexpr char PCBA_FILE[] = "/amt/sn-2.txt";
+
+constexpr uint32_t ADDRESS_SIZE = 20; /* 19 characters */
+constexpr uint32_t LINE_SIZE = 100;
+constexpr uint32_t PCBA_SIZE = 30; /* 29 characters */
+
+constexpr int PCBA_READ = 1;
+constexpr int PCBA_WRITE = 2;
+constexpr int PERMISSION_READ = 2;
+
+int fail_param(const char *func, int line, const char *text)
+{
+    pub_log_error(g_amt_handle_log, line, func, PUB_ERR_PARAM);
+    PUB_LOG(g_amt_handle_log, "%s", text);
+    return PUB_ERR_PARAM;
+}
+
+/* Reads one word of the Bluetooth address file into word (LINE_SIZE bytes). */
+int read_bt_address(char *word)
+{
+    const char *const path = get_bt_addr_file();
+    if (path == nullptr) {
+        return PUB_ERR_FILE;
+    }
+    FILE *const file = fopen(path, "r");
+    if (file == nullptr) {
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FILE);
+        PUB_LOG(g_amt_handle_log, "open(\"%s\") fail: %d - %s", path, errno, strerror(errno));
+        return PUB_ERR_FILE;
+    }
+    const bool is_read = fscanf(file, "%99s", word) == 1;
+    fclose(file);
+    if (!is_read) {
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        PUB_LOG(g_amt_handle_log, "read not completed");
+        return PUB_ERR_FAIL;
+    }
+    return PUB_ERR_NONE;
+}
+
+int write_bt_address(const char *address)
+{
+    const char *const known_path = get_bt_addr_file();
+    const char *const path = known_path != nullptr ? known_path : BT_ADDRESS_FILE;
+    char line_a[ADDRESS_SIZE + 1];
+    snprintf(line_a, sizeof(line_a), "%s\n", address);
+    const amt_factory_step_en step = amt_factory_file_write(path, line_a);
+    if (step == amt_factory_step_en::DONE) {
+        PUB_LOG(g_amt_handle_log, "write BT address: %s", address);
+        return PUB_ERR_NONE;
+    }
+    PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FILE);
+    if (step == amt_factory_step_en::OPEN_FAILED) {
+        PUB_LOG(g_amt_handle_log, "open(\"%s\") fail: %d - %s", path, errno, strerror(errno));
+    } else {
+        PUB_LOG(g_amt_handle_log, "fputs() fail");
+    }
+    return PUB_ERR_FILE;
+}
+
+int reply_pcba_sn()
+{
+    char sn_a[PCBA_SIZE] = {};
+    if (amt_read_pcba_sn(sn_a) != PUB_ERR_NONE) {
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        PUB_LOG(g_amt_handle_log, "read error.");
+        return amt_at_reply_error();
+    }
+    return amt_at_reply("\r\n^DPCBACTRL: %s\r\n\r\nOK\r\n", sn_a);
+}
+
+int write_pcba_sn(const char *sn)
+{
+    if (sn == nullptr) {
+        return fail_param("amt_at_control_pcba", __LINE__, "pcba-sn is null!!!");
+    }
+    char sn_a[PCBA_SIZE];
+    snprintf(sn_a, sizeof(sn_a), "%s", sn);
+    if (amt_write_pcba_sn(sn_a, PCBA_FILE) != PUB_ERR_NONE) {
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        PUB_LOG(g_amt_handle_log, "write error.");
+        return amt_at_reply_error();
+    }
+    return amt_at_reply_ok();
+}
+
+} // namespace
+
+int amt_at_read_bt_address(const char *)
+{
+    char word_a[LINE_SIZE] = {};
+    if (read_bt_address(word_a) != PUB_ERR_NONE) {
+        return amt_at_reply_cme();
+    }
+    return amt_at_reply("\r\n^DBTADDR: \"%s\"\r\n\r\nOK\r\n", word_a);
+}
+
+int amt_at_write_bt_address(const char *operands)
+{
+    char address_a[ADDRESS_SIZE];
+    amt_at_copy_quoted(operands, address_a, sizeof(address_a));
+    if (address_a[0] == '\0') {
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
+        return PUB_ERR_PARAM;
+    }
+    return write_bt_address(address_a) == PUB_ERR_NONE ? amt_at_reply_ok() : amt_at_reply_cme();
+}
+
+int amt_at_read_wifi_address(const char *)
+{
+    char line_a[LINE_SIZE] = {};
+    if (amt_read_wifi_address(line_a) != PUB_ERR_NONE) {
+        return amt_at_reply_cme();
+    }
+    return amt_at_reply("\r\n^DWIFIADDR: \"%s\"\r\n\r\nOK\r\n", line_a);
+}
+
+int amt_at_write_wifi_address(const char *operands)
+{
+    char address_a[ADDRESS_SIZE];
+    amt_at_copy_quoted(operands, address_a, sizeof(address_a));
+    return amt_write_wifi_address(address_a) == PUB_ERR_NONE ? amt_at_reply_ok() : amt_at_reply_cme();
+}
+
+int amt_at_control_pcba(const char *operands)
+{
+    amt_at_operands_st list;
+    amt_at_operands_init(&list, operands);
+    const char *const type_ptr = amt_at_operands_next(&list);
+    if (type_ptr == nullptr) {
+        return fail_param(__func__, __LINE__, "type is null!!!");
+    }
+    const int type = atoi(type_ptr);
+    if (type == PCBA_READ) {
+        return reply_pcba_sn();
+    }
+    if (type == PCBA_WRITE) {
+        return write_pcba_sn(amt_at_operands_next(&list));
+    }
+    PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
+    PUB_LOG(g_amt_handle_log, "unknown operation type: %u", static_cast<unsigned>(type));
+    return amt_at_reply_error();
+}
+
+int amt_at_control_permission(const char *operands)
+{
+    amt_at_operands_st list;
+    amt_at_operands_init(&list, operands);
+    const char *const type_ptr = amt_at_operands_next(&list);
+    if (type_ptr == nullptr) {
+        return fail_param(__func__, __LINE__, "type is null!!!");
+    }
+    const int type = atoi(type_ptr);
+    int flag = 0;
+    if (handle_amt_damt1_operation(type, &flag) != PUB_ERR_NONE) {
+        return amt_at_reply_error();
+    }
+    return type == PERMISSION_READ ? amt_at_reply("\r\n^DAMT1: %d\r\n\r\nOK\r\n", flag) : amt_at_reply_ok();
+}
+
+int amt_at_test_only(const char *)
+{
+    return amt_at_reply_ok();
+}

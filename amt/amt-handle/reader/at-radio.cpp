@@ -1,0 +1,195 @@
+#include "amt/amt-handle/reader/at-radio.h"
+
+#include <stdint.h>
+#include <stdlib.h>
+
+#include "amt/amt-handle/reader/at-operand.h"
+#include "amt/amt-handle/reader/at-reply.h"
+#include "amt/amt-log.h"
+#include "platform/include/ldt.h"
+#include "pub/error.h"
+
+namespace {
+
+constexpr int GPS_STOP = 0;
+constexpr int GPS_START = 1;
+constexpr int GPS_READ = 2;
+constexpr int GPS_FLAG_READ = 2;
+constexpr int RADIO_STOP = 0;
+constexpr int RADIO_START = 1;
+
+/* The channel of the last reception that was started here: its stop names it. */
+uint8_t g_rx_channel = 0;
+
+int reply_result(int32_t result)
+{
+    return result == 0 ? amt_at_reply_ok() : amt_at_reply_error();
+}
+
+/* Whether the request has a parameter behind prefix; its number goes to *number_ptr. */
+bool get_number(const char *prefix, int *number_ptr)
+{
+    char text_a[AMT_AT_PARA_SIZE + 1] = {};
+    uint32_t length = 0;
+    if (handle_amt_get_at_para(prefix, text_a, &length) != PUB_ERR_NONE || length == 0) {
+        return false;
+    }
+    *number_ptr = atoi(text_a);
+    return true;
+}
+
+/* Takes the next operand as a number. A missing one is logged under its name. */
+bool take_number(amt_at_operands_st *list_ptr, const char *name, const char *func, int *number_ptr)
+{
+    const char *const text = amt_at_operands_next(list_ptr);
+    if (text == nullptr) {
+        pub_log_error(g_amt_handle_log, __LINE__, func, PUB_ERR_PARAM);
+        PUB_LOG(g_amt_handle_log, "%s is null!!!", name);
+        return false;
+    }
+    *number_ptr = atoi(text);
+    return true;
+}
+
+int read_gps_signal(amt_at_operands_st *list_ptr)
+{
+    int index = 0;
+    if (ldt_gpsCtrl(GPS_START, 0, nullptr, nullptr) != 0 ||
+        !take_number(list_ptr, "index", "amt_at_control_gps", &index))
+    {
+        return amt_at_reply_error();
+    }
+    int32_t svid = 0;
+    int32_t cnr = 0;
+    if (ldt_gpsCtrl(GPS_READ, index, &svid, &cnr) != 0) {
+        return amt_at_reply_error();
+    }
+    return amt_at_reply("\r\n^DGPSCTRL: %d,%d\r\n\r\nOK\r\n", svid, cnr);
+}
+
+int32_t stop_tx()
+{
+    PUB_LOG(g_amt_handle_log, "WIFI-TX-stop start. ");
+    const int32_t test_result = ldt_TxTest(0, 0, 0, 0);
+    PUB_LOG(g_amt_handle_log, "WIFI-TX-stop end. return:%d.", test_result);
+    const int32_t switch_result = ldt_wifiCtrl(RADIO_STOP);
+    return test_result != 0 ? test_result : switch_result;
+}
+
+int32_t start_tx(amt_at_operands_st *list_ptr)
+{
+    static constexpr char func[] = "handle_amt_device_wifi_tx_ctrl";
+    int channel = 0;
+    int rate = 0;
+    int power = 0;
+    if (ldt_wifiCtrl(RADIO_START) != 0 || !take_number(list_ptr, "channel", func, &channel) ||
+        !take_number(list_ptr, "rate", func, &rate) || !take_number(list_ptr, "power", func, &power))
+    {
+        return PUB_ERR_FAIL;
+    }
+    const auto power_16 = static_cast<int16_t>(power);
+    const auto rate_16 = static_cast<uint16_t>(rate);
+    const auto channel_8 = static_cast<uint8_t>(channel);
+    PUB_LOG(g_amt_handle_log, "WIFI-TX-start start. channel:%d; power:%d; rate:%d(will multi 100)", channel_8,
+            power_16, rate_16);
+    const int32_t result = ldt_TxTest(1, power_16, rate_16, channel_8);
+    PUB_LOG(g_amt_handle_log, "WIFI-TX-start end. return:%d.", result);
+    return result;
+}
+
+int32_t stop_rx()
+{
+    int32_t count = 0;
+    PUB_LOG(g_amt_handle_log, "WIFI-RX-stop start. channel:%d", g_rx_channel);
+    const int32_t test_result = ldt_RxTest(0, g_rx_channel, 0, &count);
+    PUB_LOG(g_amt_handle_log, "WIFI-RX-stop end. return:%d; cnt:%d.", test_result, count);
+    const int32_t switch_result = ldt_wifiCtrl(RADIO_STOP);
+    return test_result != 0 ? test_result : switch_result;
+}
+
+int32_t start_rx(amt_at_operands_st *list_ptr)
+{
+    static constexpr char func[] = "handle_amt_device_wifi_rx_ctrl";
+    int channel = 0;
+    int rate = 0;
+    if (ldt_wifiCtrl(RADIO_START) != 0 || !take_number(list_ptr, "channel", func, &channel) ||
+        !take_number(list_ptr, "rate", func, &rate))
+    {
+        return PUB_ERR_FAIL;
+    }
+    const auto channel_8 = static_cast<uint8_t>(channel);
+    const auto rate_16 = static_cast<uint16_t>(rate);
+    PUB_LOG(g_amt_handle_log, "WIFI-RX-start start. channel:%d; rate:%d(will multi 100)", channel_8, rate_16);
+    const int32_t result = ldt_RxTest(1, channel_8, rate_16, nullptr);
+    PUB_LOG(g_amt_handle_log, "WIFI-RX-start end. return:%d.", result);
+    if (result == 0) {
+        g_rx_channel = channel_8;
+    }
+    return result;
+}
+
+/* Both Wi-Fi tests: the first operand stops or starts, the rest is the start's. */
+int control_wifi_test(const char *operands, const char *func, int32_t (*stop)(),
+                      int32_t (*start)(amt_at_operands_st *))
+{
+    amt_at_operands_st list;
+    amt_at_operands_init(&list, operands);
+    int control = 0;
+    if (!take_number(&list, "control", func, &control)) {
+        return PUB_ERR_PARAM;
+    }
+    if (control == RADIO_STOP) {
+        return reply_result(stop());
+    }
+    return reply_result(control == RADIO_START ? start(&list) : PUB_ERR_FAIL);
+}
+
+} // namespace
+
+int amt_at_check_device(const char *)
+{
+    int device = -1;
+    get_number("AT^DDEVCONNCHK=", &device);
+    switch (device) {
+    case 0:
+        return reply_result(ldt_wifiCheck());
+    case 1:
+        return reply_result(ldt_gpsCheck());
+    case 3:
+        return reply_result(ldt_btCheck());
+    default:
+        return amt_at_reply_error();
+    }
+}
+
+int amt_at_control_bt(const char *)
+{
+    int on = -1;
+    get_number("AT^DBTCTRL=", &on);
+    const bool is_known = on == RADIO_STOP || on == RADIO_START;
+    return is_known ? reply_result(ldt_btCtrl(on)) : amt_at_reply_error();
+}
+
+int amt_at_control_gps(const char *operands)
+{
+    amt_at_operands_st list;
+    amt_at_operands_init(&list, operands);
+    int flag = 0;
+    if (!take_number(&list, "flag", __func__, &flag)) {
+        return PUB_ERR_PARAM;
+    }
+    if (flag == GPS_STOP) {
+        return reply_result(ldt_gpsCtrl(GPS_STOP, 0, nullptr, nullptr));
+    }
+    return flag == GPS_FLAG_READ ? read_gps_signal(&list) : amt_at_reply_error();
+}
+
+int handle_amt_device_wifi_tx_ctrl(const char *operands)
+{
+    return control_wifi_test(operands, __func__, stop_tx, start_tx);
+}
+
+int handle_amt_device_wifi_rx_ctrl(const char *operands)
+{
+    return control_wifi_test(operands, __func__, stop_rx, start_rx);
+}
