@@ -1,0 +1,256 @@
+#include "amt/amt-handle/startup.h"
+
+#include <atomic>
+#include <errno.h>
+#include <stdio.h>
+#include <string.h>
+#include <termios.h>
+
+#include "amt/amt-cfg.h"
+#include "amt/amt-handle/channel/at-io.h"
+#include "amt/amt-handle/channel/context.h"
+#include "amt/amt-handle/channel/handshake.h"
+#include "amt/amt-handle/channel/identity-slots.h"
+#include "amt/amt-handle/channel/service-process.h"
+#include "amt/amt-handle/channel/tty.h"
+#include "amt/amt-handle/reader/app-reader.h"
+#include "amt/amt-handle/reader/modem-reader.h"
+#include "amt/amt-handle/reader/pc-reader.h"
+#include "amt/amt-handle/reader/registry.h"
+#include "amt/amt-handle/reader/usb-monitor.h"
+#include "amt/amt-handle/request/identity-store.h"
+#include "amt/amt-log.h"
+#include "platform/include/cutils/properties.h"
+#include "pub/error.h"
+#include "pub/util/thread-end.h"
+#include "pub/util/util.h"
+
+namespace {
+
+constexpr char SWITCH_PROPERTY[] = "amt.normal.amt.switch_status";
+
+/* Can never be taken for "1". */
+constexpr char SWITCH_DEFAULT[] = "@##@";
+
+constexpr char BT_FOLDER[] = "/amt/BT";
+constexpr char WIFI_FOLDER[] = "/amt/WIFI";
+
+/* The station's port needs this long after it was opened. */
+constexpr uint32_t PC_TTY_PAUSE_MS = 1000;
+
+std::atomic<int> g_is_deinit_done;
+
+int check_handshake()
+{
+    PUB_LOG(g_amt_handle_log, "will treat handshake.");
+    g_handshake_state.m_is_done = 0;
+    g_handshake_state.m_is_ready = 0;
+    g_handshake_state.m_usb_enum_timer.m_id = -1;
+    g_handshake_state.m_handshake_timer.m_id = -1;
+    return amt_handshake_check_permission();
+}
+
+void prepare_factory_data()
+{
+    amt_identity_reset();
+    if (amt_make_folder(BT_FOLDER) == PUB_ERR_NONE) {
+        amt_make_folder(WIFI_FOLDER);
+    }
+    amt_write_wifi_to_nvram_file();
+}
+
+void prepare_context()
+{
+    amt_handle_clear_context();
+    snprintf(g_handle_context.m_pty.m_pts_mapping_name_a, sizeof(g_handle_context.m_pty.m_pts_mapping_name_a),
+             "%s", g_amt_cfg.m_tty_app_a);
+    amt_handle_register_all();
+    g_handle_state.m_is_no_modem = 0;
+}
+
+/* Whether the last switch to factory test asks a normal start to serve the PC. */
+bool is_switched_to_amt()
+{
+    char value_a[PROPERTY_VALUE_MAX] = {};
+    if (property_get(SWITCH_PROPERTY, value_a, SWITCH_DEFAULT) <= 0 || strcmp(value_a, "1") != 0) {
+        return false;
+    }
+    PUB_LOG(g_amt_handle_log, "property-%s value: %s", SWITCH_PROPERTY, value_a);
+    PUB_LOG(g_amt_handle_log, "will create amt1/4 thread. ");
+    return true;
+}
+
+/* The station's port, not the modem's: its local flags stay as whoever set the port up left them. */
+int set_serial_dev_attr(int fd)
+{
+    termios attr = {};
+    if (tcgetattr(fd, &attr) != 0) {
+        PUB_LOG_SYS_CALL(g_amt_handle_log, "tcgetattr");
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_SYS_CALL);
+        return PUB_ERR_SYS_CALL;
+    }
+    attr.c_cflag &= ~static_cast<tcflag_t>(CBAUD | CBAUDEX);
+    attr.c_cflag |= B115200;
+    attr.c_iflag &= ~static_cast<tcflag_t>(INLCR | ICRNL | IXON);
+    attr.c_oflag &= ~static_cast<tcflag_t>(OPOST);
+    if (tcsetattr(fd, TCSANOW, &attr) != 0) {
+        PUB_LOG_SYS_CALL(g_amt_handle_log, "tcsetattr");
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_SYS_CALL);
+        return PUB_ERR_SYS_CALL;
+    }
+    return PUB_ERR_NONE;
+}
+
+int open_pc_tty()
+{
+    const int status = amt_tty_open(&g_handle_context.m_fd_pc, g_amt_cfg.m_tty_pc_a, AMT_TTY_ATTEMPTS);
+    if (status != PUB_ERR_NONE) {
+        return status;
+    }
+    pub_util_sleep_ms(PC_TTY_PAUSE_MS);
+    return set_serial_dev_attr(g_handle_context.m_fd_pc);
+}
+
+int start_pc_worker(amt_worker_st *worker_ptr, void (*loop)())
+{
+    const int error = amt_worker_start(worker_ptr, loop);
+    if (error == 0) {
+        return PUB_ERR_NONE;
+    }
+    errno = error;
+    PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FILE);
+    PUB_LOG(g_amt_handle_log, "pthread_create(): %d - %s", error, strerror(error));
+    return PUB_ERR_FILE;
+}
+
+int open_pc_path()
+{
+    int status = open_pc_tty();
+    if (status != PUB_ERR_NONE) {
+        return status;
+    }
+    status = amt_tty_open_modem();
+    if (status != PUB_ERR_NONE) {
+        return status;
+    }
+    status = start_pc_worker(&g_handle_context.m_pc_reader, amt_handle_read_pc_loop);
+    if (status != PUB_ERR_NONE) {
+        return status;
+    }
+    status = start_pc_worker(&g_handle_context.m_modem_reader, amt_handle_read_modem_loop);
+    if (status != PUB_ERR_NONE) {
+        return status;
+    }
+    g_handle_state.m_usb_state = AMT_USB_UNKNOWN;
+    return start_pc_worker(&g_handle_context.m_usb_monitor, amt_handle_monitor_usb_loop);
+}
+
+int init_for_amt_1_4()
+{
+    PUB_LOG_ENTRY(g_amt_handle_log);
+    if (g_usb_activate != 0) {
+        amt_handshake_start_usb_enum_timer();
+    }
+    const int status = open_pc_path();
+    if (status == PUB_ERR_NONE) {
+        return PUB_ERR_NONE;
+    }
+    amt_worker_stop(&g_handle_context.m_modem_reader);
+    amt_worker_stop(&g_handle_context.m_pc_reader);
+    amt_worker_stop(&g_handle_context.m_usb_monitor);
+    amt_handle_close_fd(&g_handle_context.m_fd_modem);
+    amt_handle_close_fd(&g_handle_context.m_fd_pc);
+    return status;
+}
+
+void open_at_mux()
+{
+    if (amt_tty_open_at() == PUB_ERR_NONE) {
+        disable_unsolicited_code(g_handle_context.m_fd_at);
+        return;
+    }
+    g_handle_state.m_is_no_modem = 1;
+    PUB_LOG(g_amt_handle_log, "WARNING !");
+    PUB_LOG(g_amt_handle_log, "The AT device is not opened with modem.");
+}
+
+int open_packet_path()
+{
+    const int status = pub_pty_open(&g_handle_context.m_pty);
+    if (status != PUB_ERR_NONE) {
+        return status;
+    }
+    open_at_mux();
+    const int error = amt_worker_start(&g_handle_context.m_app_reader, amt_handle_read_app_loop);
+    if (error != 0) {
+        errno = error;
+        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FILE);
+        PUB_LOG(g_amt_handle_log, "pthread_create() fail: %d", error);
+        return PUB_ERR_FILE;
+    }
+    return PUB_ERR_NONE;
+}
+
+void close_pty()
+{
+    if (g_handle_context.m_pty.m_ptm_fd > 0) {
+        pub_pty_close(&g_handle_context.m_pty);
+    }
+}
+
+int init_for_amt_2_3()
+{
+    PUB_LOG_ENTRY(g_amt_handle_log);
+    const int status = open_packet_path();
+    if (status != PUB_ERR_NONE) {
+        amt_worker_stop(&g_handle_context.m_app_reader);
+        amt_handle_close_fd(&g_handle_context.m_fd_at);
+        close_pty();
+    }
+    g_handle_state.m_amt_mode = AMT_MODE_3;
+    return status;
+}
+
+} // namespace
+
+int amt_handle_init(int normal_mode)
+{
+    PUB_LOG_ENTRY(g_amt_handle_log);
+    amt_service_process_mark();
+    g_handle_state.m_amt_mode = AMT_MODE_1;
+    g_handshake_state.m_is_property_set = 0;
+    g_handshake_state.m_is_ac_power = 0;
+    if (g_usb_activate != 0 && check_handshake() != PUB_ERR_NONE) {
+        return PUB_ERR_FAIL;
+    }
+    prepare_factory_data();
+    prepare_context();
+    const bool is_packet_path = normal_mode != 0 && !is_switched_to_amt();
+    const int status = is_packet_path ? init_for_amt_2_3() : init_for_amt_1_4();
+    if (status == PUB_ERR_NONE) {
+        g_handle_state.m_is_normal_mode = normal_mode;
+    }
+    return status;
+}
+
+int amt_handle_deinit()
+{
+    if (g_is_deinit_done.exchange(1) != 0) {
+        return PUB_ERR_NONE;
+    }
+    PUB_LOG_ENTRY(g_amt_handle_log);
+    amt_worker_stop(&g_handle_context.m_modem_reader);
+    amt_worker_stop(&g_handle_context.m_pc_reader);
+    amt_worker_stop(&g_handle_context.m_usb_monitor);
+    amt_worker_stop(&g_handle_context.m_app_reader);
+    close_pty();
+    amt_handle_close_fd(&g_handle_context.m_fd_pc);
+    amt_handle_close_fd(&g_handle_context.m_fd_at);
+    amt_handle_close_fd(&g_handle_context.m_fd_modem);
+    amt_timer_delete(&g_handshake_state.m_usb_enum_timer);
+    amt_timer_delete(&g_handshake_state.m_handshake_timer);
+    if (g_usb_activate != 0 && g_handshake_state.m_is_property_set.exchange(1) == 0) {
+        amt_set_handshake_property();
+    }
+    return PUB_ERR_NONE;
+}

@@ -1,0 +1,214 @@
+#include <errno.h>
+#include <pthread.h>
+#include <signal.h>
+#include <stdint.h>
+#include <stdio.h>
+#include <string.h>
+#include <unistd.h>
+
+#include "amt/amt-cfg.h"
+#include "amt/amt-handle/channel/context.h"
+#include "amt/amt-handle/channel/process-end.h"
+#include "amt/amt-handle/channel/service-process.h"
+#include "amt/amt-handle/startup.h"
+#include "amt/amt-log.h"
+#include "pub/error.h"
+#include "pub/log/print.h"
+#include "pub/util/thread-end.h"
+#include "pub/util/util.h"
+
+namespace {
+
+constexpr char PROGRAM[] = "vx-kel-amt";
+constexpr char VERSION[] = "001.001";
+constexpr char NORMAL_MODE_TEXT[] = "normal mode(with KEL platform)";
+constexpr char SIMPLIFIED_MODE_TEXT[] = "simplified mode(only with kernel)";
+
+/* Line numbers that the texts of main have always shown. */
+constexpr int USAGE_LINE = 238;
+constexpr int FATAL_LINE = 429;
+
+constexpr int MODE_NORMAL = 1;
+constexpr int MODE_SIMPLIFIED = 0;
+
+/* Seconds of one sleep of the main thread, which sleeps for ever. */
+constexpr unsigned SLEEP_SECONDS = 0xFFFFFFF;
+
+constexpr uint32_t PATH_SIZE = 60;
+constexpr uint32_t PROCESS_PATH_SIZE = 256;
+
+struct run_mode_st
+{
+    int m_mode;
+    const char *m_text_ptr;
+};
+
+pthread_t g_main_thread;
+char g_cfg_path_a[PATH_SIZE];
+char g_pid_path_a[PATH_SIZE];
+
+/* Prints the usage and returns the exit status. */
+int prompt_usage(const char *own_name)
+{
+    if (own_name == nullptr) {
+        pub_print("%s(L%d)invalid parameter\n", __func__, USAGE_LINE);
+        return PUB_ERR_SYS_CALL;
+    }
+    pub_print("\nUsage: %s [OPTION]\n"
+              "  -h                     Display this help and exit.\n"
+              "  -u                     For usb-insert-enter-amt.\n\n",
+              own_name);
+    return PUB_ERR_NONE;
+}
+
+/* Whether the start goes on; otherwise *exit_status_ptr is set. */
+bool parse_options(int argc, char **argv, int *exit_status_ptr)
+{
+    if (argc <= 1) {
+        return true;
+    }
+    for (int option = getopt(argc, argv, "h:u"); option != -1; option = getopt(argc, argv, "h:u")) {
+        if (option != 'u') {
+            *exit_status_ptr = prompt_usage(argv[0]);
+            return false;
+        }
+        g_usb_activate = 1;
+    }
+    return true;
+}
+
+void set_paths(const char *cfg_folder, const char *pid_folder)
+{
+    memset(g_cfg_path_a, 0, sizeof(g_cfg_path_a));
+    memset(g_pid_path_a, 0, sizeof(g_pid_path_a));
+    snprintf(g_cfg_path_a, sizeof(g_cfg_path_a), "%s/%s.cfg", cfg_folder, PROGRAM);
+    snprintf(g_pid_path_a, sizeof(g_pid_path_a), "%s/%s.pid", pid_folder, PROGRAM);
+}
+
+run_mode_st choose_mode_and_paths()
+{
+    if (g_usb_activate != 0) {
+        set_paths("/system/etc", "/tmp");
+        return {MODE_SIMPLIFIED, SIMPLIFIED_MODE_TEXT};
+    }
+    char process_path_a[PROCESS_PATH_SIZE] = {};
+    pub_util_get_process_path(process_path_a, sizeof(process_path_a));
+    pub_print("[%s]command path is \"%s\"\n", PROGRAM, process_path_a);
+    const bool is_normal = strstr(process_path_a, "/system/bin") != nullptr;
+    const char *const text = is_normal ? NORMAL_MODE_TEXT : SIMPLIFIED_MODE_TEXT;
+    pub_print("[%s]run under %s \n", PROGRAM, text);
+    set_paths(is_normal ? "/system/etc" : process_path_a, is_normal ? "/tmp" : process_path_a);
+    return {is_normal ? MODE_NORMAL : MODE_SIMPLIFIED, text};
+}
+
+bool is_already_running()
+{
+    int32_t is_running = 0;
+    int32_t pid = 0;
+    pub_util_get_pid_and_check_run(g_pid_path_a, PROGRAM, &is_running, &pid);
+    return is_running != 0;
+}
+
+void log_banner()
+{
+    PUB_LOG(g_amt_main_log, "%s", "");
+    PUB_LOG(g_amt_main_log, "    %s, version %s", PROGRAM, VERSION);
+    PUB_LOG(g_amt_main_log, "    Build time: %s %s", __DATE__, __TIME__);
+}
+
+void amt_deinit_resource()
+{
+    PUB_LOG_ENTRY(g_amt_main_log);
+    amt_handle_deinit();
+}
+
+bool is_fault(int signal_number)
+{
+    return signal_number == SIGSEGV || signal_number == SIGBUS;
+}
+
+/*
+ * A fault is treated on the thread it happened on. Any other signal is the main thread's business, which
+ * sleeps and holds no lock: a worker hit by one hands it over and goes on until it is stopped.
+ */
+void signal_treatment(int signal_number)
+{
+    if (!amt_service_process_is_own()) {
+        _exit(0);
+    }
+    if (!is_fault(signal_number) && pthread_equal(pthread_self(), g_main_thread) == 0) {
+        const int saved_errno = errno;
+        pthread_kill(g_main_thread, signal_number);
+        errno = saved_errno;
+        return;
+    }
+    PUB_LOG_ENTRY(g_amt_main_log);
+    PUB_LOG(g_amt_main_log, "receive signal: %d - %s", signal_number,
+            pub_util_get_signal_name(signal_number));
+    amt_process_end_begin(0);
+    amt_deinit_resource();
+    amt_process_end_finish();
+}
+
+/* 12 is SIGUSR2 here; the number is what counts. */
+void install_signal_treatment()
+{
+    for (const int signal_number : {SIGINT, SIGTERM, SIGSEGV, SIGBUS, 12}) {
+        signal(signal_number, signal_treatment);
+    }
+}
+
+int start(int mode)
+{
+    const int cfg_status = amt_cfg_init(g_cfg_path_a);
+    pub_print("[%s]config over result=%d\n", PROGRAM, cfg_status);
+    if (cfg_status != PUB_ERR_NONE) {
+        return cfg_status;
+    }
+    const int init_status = amt_handle_init(mode);
+    pub_print("[%s]init over result=%d\"\n", PROGRAM, init_status);
+    return init_status;
+}
+
+[[noreturn]] void end_by_fatal_error(int error_code)
+{
+    PUB_LOG(g_amt_main_log, "FATAL ERROR!!!");
+    pub_log_error(g_amt_main_log, FATAL_LINE, "main", error_code);
+    amt_process_end_begin(error_code);
+    amt_deinit_resource();
+    amt_process_end_finish();
+}
+
+} // namespace
+
+int main(int argc, char **argv)
+{
+    g_main_thread = pthread_self();
+    pub_util_forbid_thread_end();
+    g_usb_activate = 0;
+    int exit_status = 0;
+    if (!parse_options(argc, argv, &exit_status)) {
+        return exit_status;
+    }
+    pub_print("g_usb_activate:%d.\n", g_usb_activate);
+    const run_mode_st mode = choose_mode_and_paths();
+    pub_print("[%s]config file is \"%s\"\n            pid file is \"%s\"\n", PROGRAM, g_cfg_path_a,
+              g_pid_path_a);
+    if (is_already_running()) {
+        pub_print("%s already run.\n", PROGRAM);
+        return 0;
+    }
+    log_banner();
+    pub_util_create_pid_file(PROGRAM);
+    PUB_LOG(g_amt_main_log, "run under %s", mode.m_text_ptr);
+    PUB_LOG(g_amt_main_log, "config file[%s], pid file[%s]", g_cfg_path_a, g_pid_path_a);
+    install_signal_treatment();
+    pub_util_raise_process_priority();
+    const int status = start(mode.m_mode);
+    if (status != PUB_ERR_NONE) {
+        end_by_fatal_error(status);
+    }
+    for (;;) {
+        sleep(SLEEP_SECONDS);
+    }
+}
