@@ -1,0 +1,35 @@
+#include "amt/amt-device/command.h"
+
+#include <errno.h>
+#include <stdlib.h>
+#include <string.h>
+
+#include "amt/amt-device/device-fail.h"
+#include "pub/error.h"
+
+namespace {
+
+constexpr int ATTEMPT_COUNT = 5;
+
+} // namespace
+
+int amt_device_do_command(const char *command)
+{
+    for (int attempt = 1; attempt <= ATTEMPT_COUNT; attempt++) {
+        /* system() leaves errno alone when the command itself fails; an older errno would mislead. */
+        errno = 0;
+        if (system(command) == 0) {
+            PUB_LOG(g_amt_device_log, "system(%s) OK", command);
+            return PUB_ERR_NONE;
+        }
+        AMT_DEVICE_FAIL(__func__, PUB_ERR_FILE, "system(%s) FAIL[count = %d]: %d - %s", command, attempt,
+                        errno, strerror(errno));
+    }
+    return PUB_ERR_FAIL;
+}
+
+void amt_device_run(const char *command)
+{
+    const int ignored = system(command);
+    static_cast<void>(ignored);
+}
