@@ -1,0 +1,68 @@
+#include "amt/amt-device/backlight.h"
+
+#include "amt/amt-command.h"
+#include "amt/amt-device/device-atom.h"
+#include "amt/amt-device/device-file.h"
+#include "amt/amt-handle/channel/response.h"
+#include "amt/amt-packet.h"
+#include "pub/error.h"
+
+namespace {
+
+constexpr char LCD_FILE[] = "/sys/class/leds/lcd-backlight/brightness";
+constexpr char BUTTON_FILE[] = "/sys/class/leds/button-backlight/brightness";
+constexpr uint8_t ATOM_LEVEL = 26;
+constexpr uint32_t LEVEL_MAX = 255;
+constexpr int32_t LEVEL_UNKNOWN = -1;
+constexpr int32_t LEVEL_DEFAULT = 200;
+
+/* The LCD level found before the first request. Only the reader thread that serves requests uses it. */
+int32_t src_lcd_brightness = LEVEL_UNKNOWN;
+
+/* Compared as unsigned on purpose: every negative level is out of range, the unknown one included. */
+bool is_level(int32_t level)
+{
+    return static_cast<uint32_t>(level) <= LEVEL_MAX;
+}
+
+int32_t level_to_write(int32_t requested)
+{
+    if (is_level(requested)) {
+        return requested;
+    }
+    return is_level(src_lcd_brightness) ? src_lcd_brightness : LEVEL_DEFAULT;
+}
+
+} // namespace
+
+int amt_device_lcd_brightness(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
+{
+    PUB_LOG_ENTRY(g_amt_device_log);
+    if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+        return PUB_ERR_PARAM;
+    }
+    if (src_lcd_brightness < 0) {
+        AMT_DEVICE_READ_INT(LCD_FILE, &src_lcd_brightness);
+    }
+    const int32_t requested = amt_packet_get_int(req_ptr->m_buf_a, ATOM_LEVEL);
+    PUB_LOG(g_amt_device_log, "amt_device_lcd_brightness lcd_brightness: %d", requested);
+    PUB_LOG(g_amt_device_log, "amt_device_lcd_brightness src_lcd_brightness: %d", src_lcd_brightness);
+    if (AMT_DEVICE_WRITE_INT(LCD_FILE, level_to_write(requested)) == PUB_ERR_NONE) {
+        amt_handle_send_rsp_ok(channel, rsp_ptr, AMT_LCDLIGHT_RSPCMD);
+    }
+    return PUB_ERR_NONE;
+}
+
+int amt_device_button_backlight(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
+{
+    PUB_LOG_ENTRY(g_amt_device_log);
+    if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+        return PUB_ERR_PARAM;
+    }
+    const int32_t flag = amt_packet_get_bool(req_ptr->m_buf_a, AMT_ATOM_SWITCH);
+    if (AMT_DEVICE_WRITE_INT(BUTTON_FILE, flag) != PUB_ERR_NONE) {
+        return PUB_ERR_FILE;
+    }
+    PUB_LOG(g_amt_device_log, "%s button backlight", flag == 1 ? "open" : "close");
+    return amt_handle_send_rsp_ok(channel, rsp_ptr, AMT_BACKLIGHT_RSPCMD);
+}

@@ -1,0 +1,59 @@
+#include "amt/amt-device/battery-adc.h"
+
+#include <errno.h>
+#include <stdio.h>
+
+#include "amt/amt-device/command.h"
+#include "amt/amt-device/device-fail.h"
+#include "amt/amt-device/number-scan.h"
+#include "amt/amt-handle/request/factory-file.h"
+#include "pub/error.h"
+#include "pub/util/thread-end.h"
+
+namespace {
+
+constexpr char MEASURE_COMMAND[] = "echo \"amt_get_vbatt\" > " AMT_BATTERY_DRIVER_FILE;
+constexpr char CALIBRATION_FILE[] = "/amt/vbatt";
+constexpr uint32_t MEASURE_MS = 20;
+
+/* Four numbers of 11 characters, their frame and the terminating zero. */
+constexpr uint32_t CALIBRATION_SIZE = 80;
+
+} // namespace
+
+int amt_read_adc(uint32_t *value_ptr)
+{
+    if (value_ptr == nullptr) {
+        return AMT_DEVICE_FAIL(__func__, PUB_ERR_FAIL, "Null pointer.");
+    }
+    if (amt_device_do_command(MEASURE_COMMAND) != PUB_ERR_NONE) {
+        /* On purpose: a driver that cannot measure gives a value of 0, not an error. */
+        return PUB_ERR_NONE;
+    }
+    pub_util_sleep_ms(MEASURE_MS);
+    FILE *stream = fopen(AMT_BATTERY_DRIVER_FILE, "re");
+    if (stream == nullptr) {
+        return AMT_DEVICE_FAIL_CALL(__func__, "fopen");
+    }
+    errno = 0;
+    const bool is_read = amt_number_scan_unsigned(stream, value_ptr) == 1;
+    if (is_read) {
+        PUB_LOG(g_amt_device_log, "ADC value: %u", *value_ptr);
+    } else {
+        AMT_DEVICE_FAIL_CALL(__func__, "fscanf");
+    }
+    fclose(stream);
+    return is_read ? PUB_ERR_NONE : PUB_ERR_FAIL;
+}
+
+int amt_write_adc_diff_value(int32_t a, int32_t b, int32_t c, int32_t d)
+{
+    char text_a[CALIBRATION_SIZE];
+    snprintf(text_a, sizeof(text_a), "amt_set_vbatt[%d] [%d] [%d] [%d]", a, b, c, d);
+    const amt_factory_step_en step = amt_factory_file_write(CALIBRATION_FILE, text_a);
+    if (step == amt_factory_step_en::OPEN_FAILED) {
+        return AMT_DEVICE_FAIL_CALL(__func__, "fopen");
+    }
+    PUB_LOG(g_amt_device_log, "SAVA ADC value: %d %d %d %d", a, b, c, d);
+    return step == amt_factory_step_en::DONE ? PUB_ERR_NONE : AMT_DEVICE_FAIL_CALL(__func__, "fprintf");
+}

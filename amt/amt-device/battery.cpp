@@ -1,0 +1,114 @@
+#include "amt/amt-device/battery.h"
+
+#include <stdio.h>
+#include <stdlib.h>
+
+#include "amt/amt-command.h"
+#include "amt/amt-device/battery-adc.h"
+#include "amt/amt-device/device-fail.h"
+#include "amt/amt-device/device-file.h"
+#include "amt/amt-handle/channel/response.h"
+#include "amt/amt-handle/request/request-frame.h"
+#include "amt/amt-packet.h"
+#include "pub/error.h"
+
+namespace {
+
+constexpr char VOLTAGE_FILE[] = "/sys/class/power_supply/battery/voltage_now";
+constexpr uint8_t ATOM_VOLTAGE = 5;
+constexpr uint8_t ATOM_ADC = 151;
+constexpr uint8_t ATOM_CALIBRATION_A = 146;
+constexpr uint8_t ATOM_CALIBRATION_B = 147;
+constexpr uint8_t ATOM_CALIBRATION_C = 148;
+constexpr uint8_t ATOM_CALIBRATION_D = 149;
+
+/* The two ADC requests have no names in the catalogue. */
+constexpr uint8_t READ_ADC_ID = 224;
+constexpr uint8_t CALIBRATE_ID = 226;
+
+constexpr uint32_t COMMAND_SIZE = 100;
+constexpr char CHECK_HANDLER[] = "amt_device_battery_voltage_check";
+
+int build_adc_rsp(amt_buf_st *rsp_ptr)
+{
+    amt_reply_start(rsp_ptr, READ_ADC_ID + 1);
+    uint32_t value = 0;
+    const int result = amt_read_adc(&value);
+    if (result != PUB_ERR_NONE) {
+        return result;
+    }
+    amt_packet_add_int(rsp_ptr->m_buf_a, ATOM_ADC, static_cast<int32_t>(value));
+    amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_RESULT, 0);
+    return PUB_ERR_NONE;
+}
+
+/* The driver takes the values at once; whether it did does not change the answer. */
+void hand_to_driver(int32_t a, int32_t b, int32_t c, int32_t d)
+{
+    char command_a[COMMAND_SIZE];
+    snprintf(command_a, sizeof(command_a),
+             "echo \"amt_set_vbatt[%d] [%d] [%d] [%d]\" > " AMT_BATTERY_DRIVER_FILE, a, b, c, d);
+    const int result = system(command_a);
+    PUB_LOG(g_amt_device_log, "%s", command_a);
+    if (result < 0) {
+        PUB_LOG_SYS_CALL(g_amt_device_log, "system");
+        pub_log_error(g_amt_device_log, __LINE__, CHECK_HANDLER, PUB_ERR_SYS_CALL);
+    }
+}
+
+int build_calibration_rsp(const amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
+{
+    amt_reply_start(rsp_ptr, CALIBRATE_ID + 1);
+    const int32_t a = amt_packet_get_int(req_ptr->m_buf_a, ATOM_CALIBRATION_A);
+    const int32_t b = amt_packet_get_int(req_ptr->m_buf_a, ATOM_CALIBRATION_B);
+    const int32_t c = amt_packet_get_int(req_ptr->m_buf_a, ATOM_CALIBRATION_C);
+    const int32_t d = amt_packet_get_int(req_ptr->m_buf_a, ATOM_CALIBRATION_D);
+    const int result = amt_write_adc_diff_value(a, b, c, d);
+    if (result != PUB_ERR_NONE) {
+        return result;
+    }
+    amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_RESULT, 0);
+    hand_to_driver(a, b, c, d);
+    return PUB_ERR_NONE;
+}
+
+int build_check_rsp(const amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
+{
+    const uint8_t command_id = amt_packet_get_cmd(req_ptr->m_buf_a);
+    if (command_id == READ_ADC_ID) {
+        return build_adc_rsp(rsp_ptr);
+    }
+    if (command_id == CALIBRATE_ID) {
+        return build_calibration_rsp(req_ptr, rsp_ptr);
+    }
+    return AMT_DEVICE_FAIL(CHECK_HANDLER, PUB_ERR_FAIL, "Invalid command id[%d]", command_id);
+}
+
+} // namespace
+
+int amt_device_battery_voltage(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
+{
+    PUB_LOG_ENTRY(g_amt_device_log);
+    if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+        return PUB_ERR_PARAM;
+    }
+    int32_t voltage = 0;
+    if (AMT_DEVICE_READ_INT(VOLTAGE_FILE, &voltage) != PUB_ERR_NONE) {
+        return PUB_ERR_FILE;
+    }
+    PUB_LOG(g_amt_device_log, "battery_voltage: %d", voltage);
+    amt_reply_start(rsp_ptr, AMT_READ_BATTERY_RSPCMD);
+    amt_packet_add_int(rsp_ptr->m_buf_a, ATOM_VOLTAGE, voltage);
+    amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_RESULT, 0);
+    return amt_handle_send_rsp(channel, rsp_ptr);
+}
+
+int amt_device_battery_voltage_check(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
+{
+    PUB_LOG_ENTRY(g_amt_device_log);
+    if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+        return PUB_ERR_PARAM;
+    }
+    const int result = build_check_rsp(req_ptr, rsp_ptr);
+    return result == PUB_ERR_NONE ? amt_handle_finish_rsp(channel, rsp_ptr) : result;
+}

@@ -1,0 +1,134 @@
+#include "amt/amt-device/test-hal.h"
+
+#include "amt/amt-command.h"
+#include "amt/amt-device/device-fail.h"
+#include "amt/amt-device/hal-library.h"
+#include "amt/amt-handle/channel/response.h"
+#include "amt/amt-handle/request/request-frame.h"
+#include "amt/amt-handle/request/version.h"
+#include "amt/amt-packet.h"
+#include "platform/include/amt-misc-hal.h"
+#include "pub/error.h"
+
+namespace {
+
+constexpr uint8_t ATOM_DEVICE_INFO = 200;
+constexpr uint8_t ATOM_EMMC_INFO = 205;
+
+/* The text fills a packet but for its frame. */
+constexpr int32_t DEVICE_INFO_CAPACITY = 4055;
+constexpr uint32_t EMMC_INFO_SIZE = 100;
+
+/* It has no name in the catalogue. */
+constexpr uint8_t EMMC_INFO_ID = 246;
+
+/*
+ * Loads the HAL for this one call: logs, calls the entry and stores its answer. Returns 0 when the call was
+ * made, or -118 with *answer_ptr left alone.
+ */
+template <typename func_t, typename... arg_t>
+int call_hal(int line, const char *func, const char *name, int32_t *answer_ptr, arg_t... args)
+{
+    amt_hal_entry_st entry = {};
+    if (amt_hal_load(line, func, AMT_MISC_HAL_LIBRARY, name, &entry) != PUB_ERR_NONE) {
+        return PUB_ERR_FILE;
+    }
+    PUB_LOG(g_amt_device_log, "will call %s.", name);
+    *answer_ptr = reinterpret_cast<func_t>(entry.m_entry_ptr)(args...);
+    PUB_LOG(g_amt_device_log, "stop call %s. return value:%d.", name, *answer_ptr);
+    amt_hal_unload(&entry);
+    return PUB_ERR_NONE;
+}
+
+} // namespace
+
+int amt_make_ue_enter_idle()
+{
+    PUB_LOG_ENTRY(g_amt_device_log);
+    int32_t answer = 0;
+    const int result =
+        call_hal<amt_misc_hal_enter_idle_func>(__LINE__, __func__, AMT_MISC_HAL_ENTER_IDLE, &answer);
+    if (result != PUB_ERR_NONE) {
+        return result;
+    }
+    if (answer == 0) {
+        PUB_LOG(g_amt_device_log, "enter_idle return OK.");
+    }
+    return answer;
+}
+
+int amt_usb_charge_ctrl(int32_t mode)
+{
+    PUB_LOG(g_amt_device_log, "will call amt_usb_charger_enable , type:%d.", mode);
+    if (mode < 0) {
+        return AMT_DEVICE_FAIL(__func__, PUB_ERR_PARAM, "parameter type(%d) is not valid.", mode);
+    }
+    int32_t answer = 0;
+    const int result = call_hal<amt_misc_hal_usb_charger_enable_func>(
+        __LINE__, __func__, AMT_MISC_HAL_USB_CHARGER_ENABLE, &answer, mode);
+    if (result != PUB_ERR_NONE) {
+        return result;
+    }
+    if (answer == 0) {
+        PUB_LOG(g_amt_device_log, "amt_usb_charger_enable return OK.");
+    }
+    return answer;
+}
+
+int amt_boot_dl_fin_read(int32_t *verdict_ptr)
+{
+    PUB_LOG(g_amt_device_log, "amt_boot_dl_fin_read start.");
+    *verdict_ptr = 0;
+    return call_hal<amt_misc_hal_check_sanity_func>(__LINE__, __func__, AMT_MISC_HAL_CHECK_SANITY,
+                                                    verdict_ptr);
+}
+
+int amt_read_dev_info(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
+{
+    PUB_LOG_ENTRY(g_amt_device_log);
+    if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+        return PUB_ERR_PARAM;
+    }
+    amt_reply_start(rsp_ptr, AMT_READ_DEV_INFO_RSPCMD);
+    char text_a[DEVICE_INFO_CAPACITY + 1] = {};
+    int32_t answer = 0;
+    const int result = call_hal<amt_misc_hal_create_devinfo_func>(
+        __LINE__, __func__, AMT_MISC_HAL_CREATE_DEVINFO, &answer, text_a, DEVICE_INFO_CAPACITY);
+    if (result != PUB_ERR_NONE || answer != 0) {
+        return result != PUB_ERR_NONE ? result : answer;
+    }
+    PUB_LOG(g_amt_device_log, "create_devinfo return OK. %s", text_a);
+    amt_packet_add_string(rsp_ptr->m_buf_a, ATOM_DEVICE_INFO, text_a);
+    amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_RESULT, 0);
+    return amt_handle_send_rsp(channel, rsp_ptr);
+}
+
+int amt_enter_idle(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
+{
+    PUB_LOG_ENTRY(g_amt_device_log);
+    if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+        return PUB_ERR_PARAM;
+    }
+    const int result = amt_make_ue_enter_idle();
+    if (result != PUB_ERR_NONE) {
+        return result;
+    }
+    PUB_LOG(g_amt_device_log, "enter_idle return OK.");
+    return amt_handle_send_rsp_ok(channel, rsp_ptr, AMT_ENTER_IDLE_RSPCMD);
+}
+
+int amt_device_emmc_info(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
+{
+    PUB_LOG_ENTRY(g_amt_device_log);
+    if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+        return PUB_ERR_PARAM;
+    }
+    amt_reply_start(rsp_ptr, EMMC_INFO_ID + 1);
+    char text_a[EMMC_INFO_SIZE] = {};
+    if (amt_read_emmc_info(text_a) != PUB_ERR_NONE) {
+        return AMT_DEVICE_FAIL(__func__, PUB_ERR_FAIL, "read error");
+    }
+    PUB_LOG(g_amt_device_log, "read emmc_info: %s", text_a);
+    amt_packet_add_string(rsp_ptr->m_buf_a, ATOM_EMMC_INFO, text_a);
+    return amt_reply_finish_ok(channel, rsp_ptr);
+}
