@@ -1,0 +1,199 @@
+#include <stdio.h>
+
+#include "amt/amt-command.h"
+#include "amt/amt-device/command.h"
+#include "amt/amt-device/device-fail.h"
+#include "amt/amt-device/radio-step.h"
+#include "amt/amt-device/wifi.h"
+#include "amt/amt-handle/channel/response.h"
+#include "amt/amt-handle/request/request-frame.h"
+#include "amt/amt-packet.h"
+#include "platform/include/ldt.h"
+#include "pub/error.h"
+
+namespace {
+
+#define TRACE_FILE "/data/local/wifi/wifi_dbg_file.txt"
+
+constexpr char HANDLER[] = "amt_device_wifi_rtx_test";
+constexpr uint32_t COMMAND_SIZE = 100;
+
+constexpr uint8_t ATOM_SUB_COMMAND = 154;
+constexpr uint8_t ATOM_CHANNEL = 155;
+constexpr uint8_t ATOM_RATE = 156;
+constexpr uint8_t ATOM_POWER = 157;
+constexpr uint8_t ATOM_PACKET_COUNT = 158;
+
+constexpr amt_radio_step_st START_STEP = {&g_amt_device_log, "WIFI-start", "ldt_wifiCtrl"};
+constexpr amt_radio_step_st STOP_STEP = {&g_amt_device_log, "WIFI-stop", "ldt_wifiCtrl"};
+constexpr amt_radio_step_st TX_START_STEP = {&g_amt_device_log, "WIFI-TX-start", "ldt_TxTest"};
+constexpr amt_radio_step_st TX_STOP_STEP = {&g_amt_device_log, "WIFI-TX-stop", "ldt_TxTest"};
+constexpr amt_radio_step_st RX_START_STEP = {&g_amt_device_log, "WIFI-RX-start", "ldt_RxTest"};
+constexpr amt_radio_step_st RX_STOP_STEP = {&g_amt_device_log, "WIFI-RX-stop", "ldt_RxTest"};
+
+/* The script is linked into the image through this, though nothing follows it. */
+[[gnu::used]] const char *const g_script_ptr = g_wifi_radio_test_script_a;
+
+/* What outlasts a request; only the reader thread that serves requests uses it. */
+bool wifi_running = false;
+uint8_t wifi_rx_channel = 0;
+
+/* A number of the request, little-endian, of 1 or 2 bytes. Returns whether it is there. */
+bool get_number(const amt_buf_st *req_ptr, uint8_t atom_id, uint32_t size, uint16_t *value_ptr)
+{
+    uint8_t byte_a[2] = {};
+    if (amt_packet_get_bytes(req_ptr->m_buf_a, atom_id, byte_a, size) == 0) {
+        return false;
+    }
+    *value_ptr = static_cast<uint16_t>(byte_a[0] | byte_a[1] << 8);
+    return true;
+}
+
+bool get_channel(const amt_buf_st *req_ptr, uint16_t *value_ptr)
+{
+    return get_number(req_ptr, ATOM_CHANNEL, 1, value_ptr);
+}
+
+bool get_rate(const amt_buf_st *req_ptr, uint16_t *value_ptr)
+{
+    return get_number(req_ptr, ATOM_RATE, 2, value_ptr);
+}
+
+int fail(const char *text)
+{
+    return AMT_DEVICE_FAIL(HANDLER, PUB_ERR_FAIL, "%s", text);
+}
+
+int start_wifi(const amt_buf_st *, amt_buf_st *)
+{
+    if (wifi_running) {
+        return PUB_ERR_NONE;
+    }
+    amt_radio_step_start(START_STEP);
+    const int result = AMT_RADIO_STEP_END(HANDLER, START_STEP, ldt_wifiCtrl(1));
+    wifi_running = result == PUB_ERR_NONE;
+    return result;
+}
+
+int stop_wifi(const amt_buf_st *, amt_buf_st *)
+{
+    if (!wifi_running) {
+        return PUB_ERR_NONE;
+    }
+    amt_radio_step_start(STOP_STEP);
+    const int result = AMT_RADIO_STEP_END(HANDLER, STOP_STEP, ldt_wifiCtrl(0));
+    wifi_running = result != PUB_ERR_NONE;
+    return result;
+}
+
+int start_tx(const amt_buf_st *req_ptr, amt_buf_st *)
+{
+    uint16_t channel = 0;
+    uint16_t rate = 0;
+    uint16_t power = 0;
+    if (!get_channel(req_ptr, &channel)) {
+        return fail("Tx get channel error");
+    }
+    if (!get_rate(req_ptr, &rate)) {
+        return fail("Tx get rate error");
+    }
+    if (!get_number(req_ptr, ATOM_POWER, 2, &power)) {
+        return fail("Tx get power error");
+    }
+    PUB_LOG(g_amt_device_log, "WIFI-TX-start start. channel:%d; power:%d; rate:%d", channel, power, rate);
+    return AMT_RADIO_STEP_END(HANDLER, TX_START_STEP, ldt_TxTest(1, power, rate, channel));
+}
+
+int stop_tx(const amt_buf_st *, amt_buf_st *)
+{
+    PUB_LOG(g_amt_device_log, "WIFI-TX-stop start. ");
+    return AMT_RADIO_STEP_END(HANDLER, TX_STOP_STEP, ldt_TxTest(0, 0, 0, 0));
+}
+
+int start_rx(const amt_buf_st *req_ptr, amt_buf_st *)
+{
+    uint16_t channel = 0;
+    uint16_t rate = 0;
+    if (!get_channel(req_ptr, &channel)) {
+        return fail("Rx get channel error");
+    }
+    if (!get_rate(req_ptr, &rate)) {
+        return fail("Rx get rate error");
+    }
+    PUB_LOG(g_amt_device_log, "WIFI-RX-start start. channel:%d; rate:%d", channel, rate);
+    const int result = AMT_RADIO_STEP_END(HANDLER, RX_START_STEP, ldt_RxTest(1, channel, rate, nullptr));
+    if (result == PUB_ERR_NONE) {
+        wifi_rx_channel = static_cast<uint8_t>(channel);
+    }
+    return result;
+}
+
+/* Stops on the channel of the last start, whatever the request says. */
+int stop_rx(const amt_buf_st *, amt_buf_st *rsp_ptr)
+{
+    int32_t count = 0;
+    PUB_LOG(g_amt_device_log, "WIFI-RX-stop start. channel:%d", wifi_rx_channel);
+    const int32_t stopped = ldt_RxTest(0, wifi_rx_channel, 0, &count);
+    PUB_LOG(g_amt_device_log, "WIFI-RX-stop end. return:%d; cnt:%d.", stopped, count);
+    const int result = AMT_RADIO_STEP_CHECK(HANDLER, RX_STOP_STEP, stopped);
+    if (result == PUB_ERR_NONE) {
+        amt_packet_add_int(rsp_ptr->m_buf_a, ATOM_PACKET_COUNT, count);
+    }
+    return result;
+}
+
+struct sub_command_st
+{
+    bool m_needs_wifi;
+    int (*m_func)(const amt_buf_st *req_ptr, amt_buf_st *rsp_ptr);
+};
+
+/* Sub-command 1 is the first row. */
+constexpr sub_command_st SUB_COMMAND_A[] = {
+    {false, start_wifi}, {false, stop_wifi}, {true, start_tx},
+    {true, stop_tx},     {true, start_rx},   {true, stop_rx},
+};
+constexpr uint8_t SUB_COMMAND_MAX = sizeof(SUB_COMMAND_A) / sizeof(SUB_COMMAND_A[0]);
+
+int operate(uint8_t sub_command, const amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
+{
+    if (sub_command == 0 || sub_command > SUB_COMMAND_MAX) {
+        AMT_DEVICE_FAIL(HANDLER, PUB_ERR_PARAM, "unknown operation: %u", sub_command);
+        amt_device_run("echo the subcmd is invalid >> " TRACE_FILE);
+        return PUB_ERR_PARAM;
+    }
+    const sub_command_st &row = SUB_COMMAND_A[sub_command - 1];
+    if (row.m_needs_wifi && !wifi_running) {
+        return fail("WIFI is not running");
+    }
+    return row.m_func(req_ptr, rsp_ptr);
+}
+
+/* The command text begins with a blank. */
+void trace_sub_command(uint8_t sub_command)
+{
+    char command_a[COMMAND_SIZE];
+    snprintf(command_a, sizeof(command_a), " echo the cmd value received from pc is : %u >> " TRACE_FILE,
+             sub_command);
+    amt_device_run(command_a);
+}
+
+} // namespace
+
+int amt_device_wifi_rtx_test(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
+{
+    PUB_LOG_ENTRY(g_amt_device_log);
+    if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+        return PUB_ERR_PARAM;
+    }
+    amt_reply_start(rsp_ptr, AMT_WIFI_RTX_TEST_RSPCMD);
+    uint8_t sub_command = 0;
+    amt_packet_get_bytes(req_ptr->m_buf_a, ATOM_SUB_COMMAND, &sub_command, sizeof(sub_command));
+    trace_sub_command(sub_command);
+    amt_packet_add_bytes(rsp_ptr->m_buf_a, ATOM_SUB_COMMAND, &sub_command, sizeof(sub_command));
+    const int result = operate(sub_command, req_ptr, rsp_ptr);
+    if (result != PUB_ERR_NONE) {
+        return result;
+    }
+    return amt_reply_finish_ok(channel, rsp_ptr);
+}
