@@ -4,7 +4,7 @@ import json
 import os
 import socket
 from pathlib import Path
-from typing import Any
+from typing import Any, Sequence
 
 from .errors import HandsetError
 from .waiting import scaled
@@ -37,17 +37,22 @@ class Client:
             raise HandsetError(f"{operation} handed out {len(fds)} descriptors")
         return fds[0], answer
 
+    def give_fd(self, operation: str, fd: int, **request: Any) -> dict[str, Any]:
+        """Have an operation done that takes a descriptor along; FD stays the caller's too."""
+        return self._exchange(operation, request, ANSWER_SECONDS, (fd,))[0]
+
     def ask_slowly(self, operation: str, timeout: float, **request: Any) -> dict[str, Any]:
         """Have an operation done that answers when something has ended."""
         return self._exchange(operation, request, timeout)[0]
 
     def _exchange(self, operation: str, request: dict[str, Any],
-                  timeout: float) -> tuple[dict[str, Any], list[int]]:
+                  timeout: float, given: Sequence[int] = ()) -> tuple[dict[str, Any], list[int]]:
         with socket.socket(socket.AF_UNIX, socket.SOCK_SEQPACKET) as connection:
             connection.settimeout(scaled(timeout))
             try:
                 connection.connect(str(self.path))
-                connection.send(json.dumps({"op": operation, **request}).encode())
+                message = json.dumps({"op": operation, **request}).encode()
+                socket.send_fds(connection, [message], given)
                 data, fds, _, _ = socket.recv_fds(connection, MESSAGE_SIZE, 1,
                                                   socket.MSG_CMSG_CLOEXEC)
             except socket.timeout:

@@ -36,6 +36,11 @@ class Program:
     sanitizer: str = ""
 
     @property
+    def no_randomize(self) -> bool:
+        """Whether it runs only at fixed addresses: the shadow of that sanitizer has its place."""
+        return self.sanitizer == "tsan"
+
+    @property
     def has_preload(self) -> bool:
         """Whether the build has the library that answers device requests."""
         return self.build is not None and (self.build / "lib" / PRELOAD).exists()

@@ -3,10 +3,9 @@
 import os
 import shutil
 from pathlib import Path
-from typing import Mapping, Union
+from typing import Mapping, Sequence, Union
 
 from .errors import HandsetError
-from .kinds import AUDIO_FILE
 
 # A file to place: its content, content and mode, a file of the PC to copy, or None for no file.
 Content = Union[str, bytes, Path, tuple[Union[str, bytes], int], None]
@@ -39,9 +38,11 @@ FILES: dict[str, str | bytes] = {
     "/system/etc/wifi/nvram.txt":
         "# calibration of the radio\nmanfid=0x2d0\nprodid=0x492\nvendid=0x14e4\ndevid=0x4343\n"
         "boardtype=0x0598\nboardrev=0x1307\nmacaddr=00:90:4c:c5:12:38\nccode=ALL\nregrev=0\n",
-    AUDIO_FILE: b"RIFF\x24\0\0\0WAVEfmt \x10\0\0\0\1\0\1\0\x44\xac\0\0\x88\x58\1\0\2\0\x10\0"
-                b"data\0\0\0\0",
 }
+
+# A sound file without a sound.
+SILENCE = (b"RIFF\x24\0\0\0WAVEfmt \x10\0\0\0\1\0\1\0\x44\xac\0\0\x88\x58\1\0\2\0\x10\0"
+           b"data\0\0\0\0")
 
 PROPERTIES = {
     "ro.build.customer": "KELCO",
@@ -135,7 +136,7 @@ def write_properties(directory: Path, properties: Mapping[str, str | None]) -> N
         place(directory, f"/handset/properties/{name}", value)
 
 
-def write_answers(directory: Path, answers: Mapping[str, "str | list[str] | None"]) -> None:
+def write_answers(directory: Path, answers: Mapping[str, "str | Sequence[str] | None"]) -> None:
     """Script what stand-in functions answer: a line, or a list of lines, for a function."""
     for function, lines in answers.items():
         if not function.replace("_", "").isalnum():

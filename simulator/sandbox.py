@@ -8,6 +8,7 @@ import socket
 import subprocess
 import time
 from pathlib import Path
+from typing import Mapping
 
 from .errors import HandsetError
 from .program import DAEMON_COPY, INSIDE, MODULE_DIRECTORY
@@ -30,7 +31,7 @@ NO_NAMESPACES = ("this system does not let {who} make user namespaces, which the
                  "with the right to make them")
 
 
-def command(directory: Path, program: str, shared: dict[str, Path], control: int,
+def command(directory: Path, program: str, shared: Mapping[str, Path], control: int,
             ready: int) -> list[str]:
     """The command line that enters the handset in DIRECTORY, the daemon at PROGRAM."""
     words = [
@@ -61,7 +62,7 @@ def command(directory: Path, program: str, shared: dict[str, Path], control: int
 class Sandbox:
     """One handset's sandbox, from its start to its end."""
 
-    def __init__(self, directory: Path, program: str, shared: dict[str, Path]) -> None:
+    def __init__(self, directory: Path, program: str, shared: Mapping[str, Path]) -> None:
         if shutil.which("bwrap") is None:
             raise HandsetError(NO_BUBBLEWRAP)
         self._messages = directory / "sandbox.txt"

@@ -71,11 +71,12 @@ class ControlServer:
 
     def _serve(self, client: socket.socket) -> None:
         try:
-            message = client.recv(MESSAGE_SIZE)
+            message, fds, _, _ = socket.recv_fds(client, MESSAGE_SIZE, 1,
+                                                 socket.MSG_CMSG_CLOEXEC)
         except BlockingIOError:
             return
         except OSError:
-            message = b""
+            message, fds = b"", []
         if not message:
             self._loop.watch(client.fileno(), None)
             del self._clients[client.fileno()]
@@ -84,6 +85,7 @@ class ControlServer:
         reply = Reply(client)
         try:
             request = json.loads(message)
+            request.update({"fd": fd for fd in fds})
             operation = self._operations.get(request.get("op", ""))
             if operation is None:
                 raise Refused(f"no such operation: {request.get('op')}")

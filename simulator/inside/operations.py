@@ -6,11 +6,12 @@ import ctypes
 import os
 
 from . import mounts, procinfo, uevent
+from .attendance import Attendance
 from .control import Operation, Refused, Reply, Request
 from .lines import AppLine, Line, NoLine
 from .loop import Loop
-from .modem_lines import ModemLines
 from .processes import Launch, Process, Processes, Service
+from .relay import AppRelay, PortRelay
 
 TGKILL = {"x86_64": 234, "aarch64": 131, "armv7l": 268}
 
@@ -26,13 +27,15 @@ class Operations:
     """One method an operation; the method's name behind `_op_` is the operation's."""
 
     def __init__(self, loop: Loop, processes: Processes, service: Service,
-                 lines: dict[str, Line], modem: ModemLines, app: AppLine) -> None:
+                 lines: dict[str, Line], attendance: Attendance, app: AppLine,
+                 start_on_plug: bool) -> None:
         self._loop = loop
         self._processes = processes
         self._service = service
         self._lines = lines
-        self._modem = modem
+        self._attendance = attendance
         self._app = app
+        self._start_on_plug = start_on_plug
         self._runs = 0
 
     def table(self) -> dict[str, Operation]:
@@ -47,20 +50,26 @@ class Operations:
 
     # lines
 
+    def _op_relay(self, request: Request, reply: Reply) -> None:
+        if request["line"] == "app":
+            AppRelay(self._loop, request["fd"], self._app)
+        else:
+            line = self._line(request)
+            self._attendance.relay(line.name, PortRelay(self._loop, request["fd"]))
+        reply()
+
     def _op_take(self, request: Request, reply: Reply) -> None:
         line = self._line(request)
         try:
             master = line.master()
         except NoLine as error:
             raise Refused(str(error)) from None
-        if self._modem.owns(line.name):
-            self._modem.attend(line.name, "held")
+        self._attendance.leave(line.name)
         reply({"tty": os.readlink(line.path)}, master)
 
     def _op_give_back(self, request: Request, reply: Reply) -> None:
         line = self._line(request)
-        if self._modem.owns(line.name):
-            self._modem.attend(line.name)
+        self._attendance.attend(line.name)
         reply()
 
     def _op_hang_up(self, request: Request, reply: Reply) -> None:
@@ -70,8 +79,10 @@ class Operations:
     def _op_come_back(self, request: Request, reply: Reply) -> None:
         line = self._line(request)
         line.connect()
-        if self._modem.owns(line.name) and not request.get("held"):
-            self._modem.attend(line.name)
+        if request.get("held"):
+            self._attendance.leave(line.name)
+        else:
+            self._attendance.attend(line.name)
         reply()
 
     def _op_say(self, request: Request, reply: Reply) -> None:
@@ -98,11 +109,11 @@ class Operations:
     # modem
 
     def _op_modem_mode(self, request: Request, reply: Reply) -> None:
-        self._modem.set_mode(request["mode"])
+        self._attendance.set_modem_mode(request["mode"])
         reply()
 
     def _op_modem_answer(self, request: Request, reply: Reply) -> None:
-        self._modem.modem.set_answer(request["command"], request["answer"])
+        self._attendance.modem.set_answer(request["command"], request["answer"])
         reply()
 
     # processes
@@ -160,6 +171,8 @@ class Operations:
 
     def _op_usb(self, request: Request, reply: Reply) -> None:
         uevent.set_usb_state(request["state"])
+        if request["state"] == "CONNECTED" and self._start_on_plug:
+            self._service.start()
         reply()
 
     def _op_uevent_listeners(self, _request: Request, reply: Reply) -> None:

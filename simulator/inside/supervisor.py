@@ -7,11 +7,11 @@ import sys
 from typing import Any
 
 from . import mounts
+from .attendance import MODEM_LINES, Attendance
 from .control import ControlServer
 from .lines import AppLine, Line
 from .loop import Loop
 from .modem import Modem
-from .modem_lines import MODEM_LINES, ModemLines
 from .operations import Operations
 from .processes import Launch, Processes, Service
 
@@ -43,8 +43,8 @@ def main() -> None:
     mounts.protect_devices()
     loop = Loop()
     lines = _make_lines(loop, specification["lines"])
-    modem = ModemLines(Modem(specification["modem_answers"]), lines)
-    modem.set_mode(specification["modem"])
+    attendance = Attendance(Modem(specification["modem_answers"]), lines)
+    attendance.set_modem_mode(specification["modem"])
     if specification["card"] is not None:
         mounts.insert_card(specification["card"])
 
@@ -55,8 +55,9 @@ def main() -> None:
     processes = Processes(loop)
     service = Service(loop, processes, _launch(specification["daemon"]),
                       specification["restart"], specification["restart_pause"], forget_input)
-    operations = Operations(loop, processes, service, lines, modem,
-                            AppLine(specification["lines"]["app"]))
+    operations = Operations(loop, processes, service, lines, attendance,
+                            AppLine(specification["lines"]["app"]),
+                            specification["start_on_plug"])
     # The loop holds the server through its callbacks, and runs until the sandbox ends.
     ControlServer(loop, control_fd, operations.table())
     if specification["start"]:

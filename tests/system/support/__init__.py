@@ -1,0 +1,1 @@
+"""Helpers that the system tests share."""
