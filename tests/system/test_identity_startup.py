@@ -51,13 +51,26 @@ def lines(count: int) -> str:
 # folders
 
 
+def recorder(name: str) -> Content:
+    """A program that notes its call among those of the stand-ins and then does its work.
+
+    In the handset's own PATH it comes before the system's program of that name.
+    """
+    return (f'#!/bin/sh\necho "{name} $*" >> /handset/calls.txt\nexec /usr/bin/{name} "$@"\n',
+            0o755)
+
+
+RECORDERS = {f"/system/bin/{name}": recorder(name) for name in ("chgrp", "chmod")}
+
+
 def test_the_folders_are_made(start: Start) -> None:
-    handset, trace = start()
+    handset, trace = start(RECORDERS)
     for folder in (BT_FOLDER, WIFI_FOLDER):
         assert handset.path(folder).is_dir()
         assert mode(handset, folder) == 0o766
-        listed = handset.run(["/usr/bin/stat", "-c", "%G", folder])
-        assert listed.stdout == b"radio\n", listed
+    assert trace.calls() == [
+        f"chgrp -R radio {BT_FOLDER}", f"chmod 766 {BT_FOLDER}",
+        f"chgrp -R radio {WIFI_FOLDER}", f"chmod 766 {WIFI_FOLDER}", "sync() = 0", "sync() = 0"]
     trace.expect("amt_make_folder()", f"amt_make_folder: {BT_FOLDER} does not exist.\\r\\n",
                  f"amt_make_folder mkdir({BT_FOLDER}) successfully", "amt_make_folder()",
                  f"amt_make_folder: {WIFI_FOLDER} does not exist.\\r\\n",
@@ -65,8 +78,8 @@ def test_the_folders_are_made(start: Start) -> None:
 
 
 def test_folders_that_exist_are_left_alone(start: Start) -> None:
-    handset, trace = start({"/amt/BT/BT_Address.txt": "1\n", ADDRESS_FILE: MAC})
-    # The folders were made as the files were placed: not by the daemon.
+    handset, trace = start({**RECORDERS, "/amt/BT/BT_Address.txt": "1\n", ADDRESS_FILE: MAC})
+    assert trace.calls() == ["sync() = 0", "sync() = 0"]
     for folder in (BT_FOLDER, WIFI_FOLDER):
         assert mode(handset, folder) != 0o766
         trace.expect(f"amt_make_folder: {folder} exist.\\r\\n")
