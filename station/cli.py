@@ -12,7 +12,7 @@ from station import console
 from station.cli_options import Settings, common_options
 from station.cli_raw import at, commands, recover, send
 from station.cli_typed import add_typed_commands
-from station.errors import EXIT_INTERRUPTED, EXIT_USAGE, Refused, StationError
+from station.errors import EXIT_INTERRUPTED, EXIT_PASS, EXIT_USAGE, Refused, StationError
 
 _EPILOG = ("Exit status: 0 pass, 1 the handset said no, 2 usage, 3 no port, 4 port busy, "
            "5 no answer, 6 bad frame, 130 interrupted.")
@@ -51,13 +51,15 @@ def run(arguments: Sequence[str]) -> int:
     """Carry out one command line and return its exit status."""
     settings = Settings(json="--json" in arguments)
     try:
-        status = cli.main(list(arguments), prog_name="amt-station", standalone_mode=False,
-                          obj=settings)
+        with cli.make_context("amt-station", list(arguments), obj=settings) as context:
+            cli.invoke(context)
         sys.stdout.flush()
-        return status if isinstance(status, int) else 0
+        return EXIT_PASS
+    except click.exceptions.Exit as end:
+        return end.exit_code
     except StationError as error:
         return _fail(settings, error)
-    except click.Abort:
+    except (KeyboardInterrupt, click.Abort):
         return _fail_plainly(settings, "interrupted", "interrupted", EXIT_INTERRUPTED)
     except click.ClickException as error:
         message = " ".join(error.format_message().split())

@@ -1,0 +1,53 @@
+"""Fixtures: handsets on pseudo-terminals, links to them, and the station in its own process."""
+
+from __future__ import annotations
+
+import subprocess
+from typing import Iterator
+
+import pytest
+from station_peer import ROOT, Peer, Run, station_command, station_environment
+
+from station.decoder import BareDecoder, EnvelopeDecoder
+from station.link import Link
+from station.port import FdPort
+from station.requests import Channel
+
+
+@pytest.fixture
+def peer() -> Iterator[Peer]:
+    """A handset on the PC line."""
+    handset = Peer(EnvelopeDecoder())
+    yield handset
+    handset.close()
+
+
+@pytest.fixture
+def app_peer() -> Iterator[Peer]:
+    """A handset on the app channel."""
+    handset = Peer(BareDecoder())
+    yield handset
+    handset.close()
+
+
+@pytest.fixture
+def link(peer: Peer) -> Iterator[Link]:
+    """A link to the handset on the PC line, given little time."""
+    with Link(FdPort(peer.slave), timeout=2.0) as line:
+        yield line
+
+
+@pytest.fixture
+def app_link(app_peer: Peer) -> Iterator[Link]:
+    """A link to the handset on the app channel."""
+    with Link(FdPort(app_peer.slave), Channel.APP, timeout=2.0) as line:
+        yield line
+
+
+@pytest.fixture
+def run_station() -> Run:
+    """Run ``amt-station`` in a process of its own, without the settings of whoever tests."""
+    def run(*arguments: str, **environment: str) -> subprocess.CompletedProcess[str]:
+        return subprocess.run(station_command(*arguments), env=station_environment(**environment),
+                              cwd=ROOT, capture_output=True, text=True, timeout=60, check=False)
+    return run

@@ -1,0 +1,334 @@
+"""The link against a scripted handset: what it waits for, and what it makes of what comes."""
+
+from __future__ import annotations
+
+import os
+
+import pytest
+from station_peer import Peer, answering, error_packet, replying, sequence
+
+from station.decoder import Frame, Skipped, Text
+from station.envelope import ACKNOWLEDGEMENT, LARGEST_REQUEST, encode_envelope
+from station.errors import BadFrame, Held, NoAnswer, NoPort, PortBusy, Refused, UsageProblem
+from station.link import Link
+from station.packet import Atom, Packet
+from station.port import FdPort, SerialPort
+from station.requests import Channel
+
+VERSION = Packet(45, (Atom.integer(19, 16),))
+OK = "\r\nOK\r\n"
+FLUSH = b"AT^DBTADDR=?\r"
+SHORT = 0.4
+
+
+def ok(command: int, *atoms: Atom) -> bytes:
+    return encode_envelope(Packet(command, (*atoms, Atom.integer(1, 0))))
+
+
+def test_a_request_with_its_acknowledgement_and_answer(peer: Peer, link: Link) -> None:
+    peer.script = answering(Atom.raw(18, b"1.2"))
+    exchange = link.request(VERSION)
+    assert peer.raw == exchange.sent == encode_envelope(VERSION)
+    assert exchange.acknowledged
+    assert exchange.answer == Packet(46, (Atom.raw(18, b"1.2"), Atom.integer(1, 0)))
+    assert exchange.stray == []
+
+
+def test_an_answer_byte_by_byte(peer: Peer, link: Link) -> None:
+    stream = ACKNOWLEDGEMENT + ok(46)
+    peer.script = sequence([stream[at:at + 1] for at in range(len(stream))])
+    assert link.request(VERSION).answer.result == 0
+
+
+def test_an_answer_without_acknowledgement_counts(peer: Peer, link: Link) -> None:
+    peer.script = answering(acknowledged=False)
+    exchange = link.request(Packet(85))
+    assert exchange.answer.command == 86 and not exchange.acknowledged
+
+
+def test_the_gps_test_is_answered_with_another_id(peer: Peer, link: Link) -> None:
+    peer.script = answering(answer=175)
+    assert link.request(Packet(176)).answer.command == 175
+
+
+def test_what_belongs_to_something_else_is_kept_apart(peer: Peer, link: Link) -> None:
+    other = Packet(221, (Atom.integer(1, 0), Atom.raw(62, b"x")))
+    peer.script = sequence([ACKNOWLEDGEMENT, b"\r\n^DLKS: 1\r\n", encode_envelope(other), ok(46)])
+    exchange = link.request(VERSION)
+    assert exchange.answer.command == 46
+    assert exchange.stray == [Text(b"\r\n^DLKS: 1\r\n"), Frame(other, encode_envelope(other))]
+
+
+def test_what_came_before_the_request_is_no_answer(peer: Peer, link: Link) -> None:
+    peer.say(error_packet(46))
+    peer.script = answering()
+    assert link.request(VERSION).answer.result == 0
+
+
+def test_a_refused_packet_is_held(peer: Peer, link: Link) -> None:
+    peer.script = answering(code=1)
+    with pytest.raises(Refused) as caught:
+        link.request(Packet(193))
+    refusal = caught.value
+    assert (refusal.code, refusal.response, refusal.held) == (1, 194, Held.PACKET)
+    assert "unplug" in refusal.advice
+    assert refusal.details()["held"] == "packet"
+
+
+def test_code_10_leaves_nothing_behind(peer: Peer, link: Link) -> None:
+    peer.script = answering(code=10)
+    with pytest.raises(Refused) as caught:
+        link.request(Packet(193))
+    assert (caught.value.code, caught.value.held, caught.value.advice) == (10, Held.NOTHING, "")
+
+
+def test_code_1_of_a_request_for_the_modem_may_be_the_modems(peer: Peer, link: Link) -> None:
+    peer.script = answering(code=1, acknowledged=False)
+    with pytest.raises(Refused) as caught:
+        link.request(Packet(5, (Atom.string(21, "1"),)))
+    assert caught.value.held is Held.UNKNOWN
+    assert "recover" in caught.value.advice
+
+
+def test_a_refusal_with_data_is_the_modems(peer: Peer, link: Link) -> None:
+    peer.script = answering(Atom.raw(21, b"x"), code=1)
+    with pytest.raises(Refused) as caught:
+        link.request(Packet(7))
+    assert caught.value.held is Held.NOTHING
+
+
+def test_an_older_request_that_is_still_held(peer: Peer, link: Link) -> None:
+    peer.script = sequence([ACKNOWLEDGEMENT, error_packet(194)])
+    with pytest.raises(Refused, match="still holds the request AMT_BOARD_PCBA_CTRL_CMD") as caught:
+        link.request(VERSION)
+    assert caught.value.held is Held.PACKET
+
+
+def test_an_older_text_that_is_still_held(peer: Peer, link: Link) -> None:
+    peer.script = sequence([error_packet(0)])
+    with pytest.raises(Refused, match="still holds an AT text") as caught:
+        link.request(VERSION)
+    assert caught.value.held is Held.TEXT
+    assert "recover" in caught.value.advice
+
+
+def test_bluetooth_answers_twice(peer: Peer, link: Link) -> None:
+    peer.script = sequence([ACKNOWLEDGEMENT, ok(171), ok(171)])
+    assert len(link.request(Packet(170)).answers) == 2
+
+
+def test_bluetooth_fails_at_the_second_answer(peer: Peer, link: Link) -> None:
+    peer.script = sequence([ACKNOWLEDGEMENT, ok(171), error_packet(171)])
+    with pytest.raises(Refused) as caught:
+        link.request(Packet(170))
+    assert caught.value.held is Held.NOTHING, "the first answer has completed the request"
+
+
+def test_bluetooth_refused_at_once(peer: Peer, link: Link) -> None:
+    peer.script = sequence([ACKNOWLEDGEMENT, error_packet(171)])
+    with pytest.raises(Refused) as caught:
+        link.request(Packet(170), SHORT)
+    assert caught.value.held is Held.PACKET
+
+
+def test_bluetooth_whose_outcome_stays_away(peer: Peer, link: Link) -> None:
+    peer.script = sequence([ACKNOWLEDGEMENT, ok(171)])
+    with pytest.raises(NoAnswer, match="outcome"):
+        link.request(Packet(170), SHORT)
+
+
+def test_a_modem_that_answers_a_packet_with_an_at_error(peer: Peer, link: Link) -> None:
+    peer.script = sequence([b"\r\nERR", b"OR\r\n"])
+    with pytest.raises(Refused, match="the modem answered AMT_READIMEI_CMD with ERROR"):
+        link.request(Packet(7))
+
+
+def test_an_at_error_beside_a_request_of_the_handset_is_only_stray(peer: Peer,
+                                                                   link: Link) -> None:
+    peer.script = sequence([b"\r\nERROR\r\n", ACKNOWLEDGEMENT, ok(194)])
+    assert link.request(Packet(193)).stray == [Text(b"\r\nERROR\r\n")]
+
+
+def test_no_answer(peer: Peer, link: Link) -> None:
+    with pytest.raises(NoAnswer, match=r"no answer to AMT_VERSION_CMD within 0\.4 s"):
+        link.request(VERSION, SHORT)
+
+
+def test_acknowledged_but_not_answered(peer: Peer, link: Link) -> None:
+    peer.script = sequence([ACKNOWLEDGEMENT])
+    with pytest.raises(NoAnswer, match="acknowledged, but not answered"):
+        link.request(VERSION, SHORT)
+
+
+def test_an_answer_with_a_wrong_checksum(peer: Peer, link: Link) -> None:
+    frame = bytearray(ok(46))
+    frame[-1] ^= 1
+    peer.script = sequence([ACKNOWLEDGEMENT, bytes(frame)])
+    with pytest.raises(BadFrame, match="checksum"):
+        link.request(VERSION, SHORT)
+
+
+def test_a_truncated_answer(peer: Peer, link: Link) -> None:
+    peer.script = sequence([ok(46)[:-3]])
+    with pytest.raises(BadFrame, match="not completed"):
+        link.request(VERSION, 1.0)
+
+
+def test_a_good_answer_behind_a_truncated_one(peer: Peer, link: Link) -> None:
+    peer.script = sequence([ok(46)[:18] + ok(46)])
+    exchange = link.request(VERSION)
+    assert exchange.answer.result == 0
+    assert isinstance(exchange.stray[0], Skipped)
+
+
+def test_a_request_that_is_too_large_is_not_sent(peer: Peer, link: Link) -> None:
+    with pytest.raises(UsageProblem, match="4095"):
+        link.request(Packet(1, (Atom.raw(1, bytes(4069)),)))
+    with pytest.raises(UsageProblem, match="4095"):
+        link.at("A" * LARGEST_REQUEST)
+    peer.script = answering()
+    link.request(VERSION)
+    assert peer.raw == encode_envelope(VERSION)
+
+
+def test_an_at_reply(peer: Peer, link: Link) -> None:
+    peer.script = sequence([b'\r\n^DBTADDR: "00:1', b'1"\r\n\r\nO', b"K\r\n"])
+    reply = link.at("AT^DBTADDR?")
+    assert peer.raw == b"AT^DBTADDR?\r"
+    assert (reply.ok, reply.final, reply.lines) == (True, "OK", ['^DBTADDR: "00:11"'])
+
+
+@pytest.mark.parametrize("final", ["ERROR", "+CME ERROR: 100", "+CMS ERROR: 5"])
+def test_final_results_that_say_no(peer: Peer, link: Link, final: str) -> None:
+    peer.script = replying(f"\r\n{final}\r\n")
+    reply = link.at("AT^DSVER\r")
+    assert peer.raw == b"AT^DSVER\r"
+    assert (reply.ok, reply.final) == (False, final)
+
+
+def test_a_reply_with_an_echo_and_unasked_lines(peer: Peer, link: Link) -> None:
+    peer.script = replying("AT+X\r\r\n^DLKS: 1\r\n\r\nOK?\r\n\r\nOK\r\n")
+    assert link.at("AT+X").lines == ["^DLKS: 1", "OK?"]
+
+
+def test_a_reply_is_not_over_before_its_last_line_end(peer: Peer, link: Link) -> None:
+    peer.script = replying("\r\nOK")
+    with pytest.raises(NoAnswer, match="no final result for AT within"):
+        link.at("AT", SHORT)
+
+
+def test_a_refused_text_is_held(peer: Peer, link: Link) -> None:
+    peer.script = sequence([error_packet(0)])
+    with pytest.raises(Refused) as caught:
+        link.at('AT^DBTADDR=""')
+    assert (caught.value.code, caught.value.held) == (1, Held.TEXT)
+    assert "AT^DBTADDR=?" in caught.value.advice
+
+
+def test_a_text_behind_a_held_packet(peer: Peer, link: Link) -> None:
+    peer.script = sequence([ACKNOWLEDGEMENT, error_packet(194)])
+    with pytest.raises(Refused, match="still holds") as caught:
+        link.at("AT^DSVER")
+    assert caught.value.held is Held.PACKET
+
+
+def test_a_reply_that_cannot_be_read(peer: Peer, link: Link) -> None:
+    peer.script = sequence([b"\x01\x02\x03"])
+    with pytest.raises(BadFrame):
+        link.at("AT", SHORT)
+
+
+def test_recover_flushes_a_text(peer: Peer, link: Link) -> None:
+    peer.script = replying(OK)
+    recovery = link.recover()
+    assert peer.raw == FLUSH
+    assert (recovery.attempts, recovery.late_answers) == (1, ())
+
+
+def test_recover_behind_a_held_packet(peer: Peer, link: Link) -> None:
+    peer.script = sequence([ACKNOWLEDGEMENT, error_packet(194)])
+    with pytest.raises(Refused) as caught:
+        link.recover()
+    assert caught.value.held is Held.PACKET
+
+
+def test_recover_behind_a_packet_that_succeeds_now(peer: Peer, link: Link) -> None:
+    peer.script = sequence([ACKNOWLEDGEMENT, ok(194)], [OK.encode()])
+    recovery = link.recover(SHORT)
+    assert peer.raw == FLUSH * 2
+    assert recovery.attempts == 2
+    assert [packet.command for packet in recovery.late_answers] == [194]
+
+
+def test_recover_without_an_answer(peer: Peer, link: Link) -> None:
+    with pytest.raises(NoAnswer):
+        link.recover(SHORT)
+    assert isinstance(peer.next(), Text)
+    assert peer.raw == FLUSH, "nothing came, so nothing is repeated"
+
+
+def test_recover_answered_with_an_error(peer: Peer, link: Link) -> None:
+    peer.script = replying("\r\nERROR\r\n")
+    with pytest.raises(Refused, match="ERROR"):
+        link.recover()
+
+
+def test_the_app_channel_has_no_envelope(app_peer: Peer, app_link: Link) -> None:
+    answer = Packet(36, (Atom.integer(1, 0),))
+    app_peer.script = lambda item: (answer.encode(),)
+    exchange = app_link.request(Packet(35, (Atom.boolean(15, 1),)))
+    assert app_peer.raw == Packet(35, (Atom.boolean(15, 1),)).encode()
+    assert exchange.answer == answer and not exchange.acknowledged
+
+
+def test_the_app_channel_holds_nothing(app_peer: Peer, app_link: Link) -> None:
+    app_peer.script = lambda item: (Packet(201, (Atom.integer(1, 1),)).encode(),)
+    with pytest.raises(Refused) as caught:
+        app_link.request(Packet(200))
+    assert (caught.value.code, caught.value.held) == (1, Held.NOTHING)
+
+
+def test_the_app_channel_takes_no_text(app_peer: Peer, app_link: Link) -> None:
+    with pytest.raises(UsageProblem, match="PC line only"):
+        app_link.at("AT")
+    assert app_peer.raw == b""
+
+
+def test_a_port_that_goes_away(peer: Peer) -> None:
+    with Link(SerialPort(peer.path), timeout=2.0) as link:
+        peer.hang_up()
+        with pytest.raises(NoPort, match="went away"):
+            link.request(VERSION)
+
+
+def test_a_descriptor_that_goes_away() -> None:
+    reading, writing = os.pipe()
+    os.close(writing)
+    port = FdPort(reading, "the line", owned=True)
+    with pytest.raises(NoPort, match="the line went away"):
+        port.read(0.1)
+    port.close()
+    port.close()
+    with pytest.raises(OSError):
+        os.fstat(reading)
+
+
+def test_one_port_one_station(peer: Peer) -> None:
+    with Link.open(peer.path):
+        with pytest.raises(PortBusy, match="busy"):
+            Link.open(peer.path)
+    Link.open(peer.path).close()
+
+
+@pytest.mark.parametrize("url", ["/dev/no-such-port", "nonsense://x", "/dev/null"])
+def test_no_port(url: str) -> None:
+    with pytest.raises(NoPort, match=url.split(":", maxsplit=1)[0]):
+        Link.open(url)
+
+
+def test_a_port_without_a_descriptor() -> None:
+    with Link.open("loop://", Channel.PC, timeout=SHORT) as link:
+        # The loop sends the request back: a packet, but not an answer to it.
+        with pytest.raises(NoAnswer) as caught:
+            link.request(VERSION)
+        assert [item.packet for item in caught.value.arrived] == [VERSION]
