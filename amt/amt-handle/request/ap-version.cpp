@@ -30,8 +30,10 @@ struct version_text_st
     uint32_t m_len;
     char m_text_a[512];
 };
-static_assert(sizeof("ORLA ") + 2 * (PROPERTY_VALUE_MAX + 2) + BOARD_INFO_SIZE + 2 +
-                  2 * (AMT_AP_LINE_SIZE + 2) <
+constexpr size_t BRACKETS = 2;
+static_assert(sizeof("ORLA ") + PROPERTY_VALUE_MAX + (PROPERTY_VALUE_MAX + BRACKETS) +
+                  (PROPERTY_VALUE_MAX + BRACKETS) + (BOARD_INFO_SIZE + BRACKETS) +
+                  (AMT_AP_LINE_SIZE + BRACKETS) + (AMT_AP_LINE_SIZE + BRACKETS) <
               sizeof(version_text_st::m_text_a));
 
 void append(version_text_st *version_ptr, const char *before, const char *text, const char *after)
