@@ -10,9 +10,10 @@ import click
 
 from station import console
 from station.cli_options import Settings, common_options
+from station.cli_plan import plan
 from station.cli_raw import at, commands, recover, send
 from station.cli_typed import add_typed_commands
-from station.errors import EXIT_INTERRUPTED, EXIT_PASS, EXIT_USAGE, Refused, StationError
+from station.errors import EXIT_PASS, Interrupted, Refused, StationError, UsageProblem
 
 _EPILOG = ("Exit status: 0 pass, 1 the handset said no, 2 usage, 3 no port, 4 port busy, "
            "5 no answer, 6 bad frame, 130 interrupted.")
@@ -27,7 +28,7 @@ def cli() -> None:
     """
 
 
-for _command in (send, at, commands, recover):
+for _command in (send, at, commands, plan, recover):
     cli.add_command(_command)
 add_typed_commands(cli)
 
@@ -38,13 +39,6 @@ def _fail(settings: Settings, error: StationError) -> int:
     if settings.json and not error.reported:
         console.data_json({"ok": False, "error": error.details()})
     return error.exit_status
-
-
-def _fail_plainly(settings: Settings, kind: str, message: str, status: int) -> int:
-    console.complain(message)
-    if settings.json:
-        console.data_json({"ok": False, "error": {"kind": kind, "message": message}})
-    return status
 
 
 def run(arguments: Sequence[str]) -> int:
@@ -60,10 +54,10 @@ def run(arguments: Sequence[str]) -> int:
     except StationError as error:
         return _fail(settings, error)
     except (KeyboardInterrupt, click.Abort):
-        return _fail_plainly(settings, "interrupted", "interrupted", EXIT_INTERRUPTED)
+        return _fail(settings, Interrupted())
     except click.ClickException as error:
         message = " ".join(error.format_message().split())
-        return _fail_plainly(settings, "usage", f"{message} (see --help)", EXIT_USAGE)
+        return _fail(settings, UsageProblem(f"{message} (see --help)"))
     except BrokenPipeError:
         # Whoever read the output went away; there is nobody left to tell.
         os.dup2(os.open(os.devnull, os.O_WRONLY), sys.stdout.fileno())

@@ -6,49 +6,14 @@ import click
 
 from station import console, judge
 from station.at_commands import AT_COMMANDS, WATCHED, known_refusal
+from station.atom_text import parse_atom
 from station.cli_options import Settings, common_options
-from station.errors import Refused, UsageProblem, WireError
+from station.errors import Refused, UsageProblem
 from station.exchange import Exchange
-from station.packet import Atom, AtomType, Packet
+from station.packet import Packet
 from station.render import at_json, columns, exchange_json, item_line, packet_json, packet_lines
 from station.requests import Request, Service
 from station.table import REQUESTS, display_name, find_command, operations, requests_by_id
-
-_TYPES = {kind.label: kind for kind in AtomType}
-
-
-def parse_atom(row: Request | None, text: str) -> Atom:
-    """An atom from ``ATOM=TYPE:VALUE``; a named one may leave its type out."""
-    key, equals, value = text.partition("=")
-    if not equals:
-        raise UsageProblem(f"{text!r} is not ATOM=TYPE:VALUE")
-    field = next((field for field in (row.fields if row else ()) if field.name == key), None)
-    label, colon, content = value.partition(":")
-    if colon and label in _TYPES:
-        return _typed_atom(field.atom if field else _atom_id(key), _TYPES[label], content)
-    if field is None:
-        raise UsageProblem(f"{text!r} needs a type: one of {', '.join(_TYPES)}, then a colon")
-    return field.encode(value)
-
-
-def _atom_id(text: str) -> int:
-    try:
-        return int(text, 0)
-    except ValueError:
-        raise UsageProblem(f"no atom {text!r} in this request") from None
-
-
-def _typed_atom(atom_id: int, kind: AtomType, content: str) -> Atom:
-    try:
-        if kind is AtomType.INT:
-            return Atom.integer(atom_id, int(content, 0))
-        if kind is AtomType.BOOL:
-            return Atom.boolean(atom_id, int(content, 0))
-        if kind is AtomType.BYTES:
-            return Atom.raw(atom_id, bytes.fromhex(content))
-        return Atom.string(atom_id, content)
-    except (ValueError, WireError) as error:
-        raise UsageProblem(f"atom {atom_id}: {error}") from error
 
 
 @click.command()

@@ -109,6 +109,16 @@ class BadFrame(StationError):
         self.cause = cause
 
 
+class Interrupted(StationError):
+    """The person at the keyboard ended it."""
+
+    exit_status = EXIT_INTERRUPTED
+    kind = "interrupted"
+
+    def __init__(self) -> None:
+        super().__init__("interrupted")
+
+
 class Held(str, Enum):
     """What a refusal leaves in the handset's request buffer."""
 

@@ -61,13 +61,14 @@ def check_channel(row: Request, operation: Operation, channel: Channel) -> None:
 
 
 def run_operation(link: Link, path: tuple[str, ...],
-                  values: Mapping[str, Value] | None = None) -> list[Exchange]:
+                  values: Mapping[str, Value] | None = None,
+                  timeout: float | None = None) -> list[Exchange]:
     """Carry out a typed command and what it needs before; the last exchange is its own."""
     row, operation = find_operation(path)
     check_channel(row, operation, link.channel)
     packet = operation_packet(row, operation, values)
-    before = run_operation(link, operation.before) if operation.before else []
-    return [*before, link.request(packet)]
+    before = run_operation(link, operation.before, None, timeout) if operation.before else []
+    return [*before, link.request(packet, timeout)]
 
 
 def read_answer(command: int, answer: Packet) -> list[NamedValue]:

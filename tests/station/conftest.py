@@ -2,16 +2,23 @@
 
 from __future__ import annotations
 
+import os
 import subprocess
 from typing import Iterator
 
 import pytest
+from hypothesis import settings
 from station_peer import ROOT, Peer, Run, station_command, station_environment
 
 from station.decoder import BareDecoder, EnvelopeDecoder
 from station.link import Link
 from station.port import FdPort
 from station.requests import Channel
+
+# New examples at a desk; the same ones every time where a machine judges a change.
+settings.register_profile("station", deadline=None, database=None, print_blob=True,
+                          derandomize=bool(os.environ.get("CI")))
+settings.load_profile("station")
 
 
 @pytest.fixture
