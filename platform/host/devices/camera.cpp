@@ -21,12 +21,17 @@ const device_request_st g_request_a[] = {
     {SARVOCAM_IOCTL_SELF_TEST, "SARVOCAM_IOCTL_SELF_TEST", DEVICE_ARGUMENT_INT, SELF_TEST, 1, nullptr},
 };
 
+device_st g_device = {DEVICE_CAMERA_PATH,
+                      "video0",
+                      "camera",
+                      g_value_a,
+                      sizeof(g_value_a) / sizeof(g_value_a[0]),
+                      g_request_a,
+                      sizeof(g_request_a) / sizeof(g_request_a[0])};
+
 } // namespace
 
-device_st g_device_camera = {DEVICE_CAMERA_PATH,
-                             "video0",
-                             "camera",
-                             g_value_a,
-                             sizeof(g_value_a) / sizeof(g_value_a[0]),
-                             g_request_a,
-                             sizeof(g_request_a) / sizeof(g_request_a[0])};
+device_st *device_camera()
+{
+    return &g_device;
+}

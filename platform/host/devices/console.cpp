@@ -10,6 +10,11 @@ const device_request_st g_request_a[] = {
     {KDSETMODE, "KDSETMODE", DEVICE_ARGUMENT_VALUE, 0, KD_GRAPHICS, nullptr},
 };
 
+device_st g_device = {DEVICE_CONSOLE_PATH, "tty0", "console", g_value_a, 1, g_request_a, 1};
+
 } // namespace
 
-device_st g_device_console = {DEVICE_CONSOLE_PATH, "tty0", "console", g_value_a, 1, g_request_a, 1};
+device_st *device_console()
+{
+    return &g_device;
+}

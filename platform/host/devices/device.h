@@ -44,6 +44,6 @@ struct device_st
     uint32_t m_request_count;
 };
 
-extern device_st g_device_framebuffer;
-extern device_st g_device_console;
-extern device_st g_device_camera;
+device_st *device_framebuffer();
+device_st *device_console();
+device_st *device_camera();

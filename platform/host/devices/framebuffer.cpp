@@ -106,12 +106,17 @@ const device_request_st g_request_a[] = {
      LAYER_FORMAT, FORMAT_LIMIT, nullptr},
 };
 
+device_st g_device = {DEVICE_FRAMEBUFFER_PATH,
+                      "fb0",
+                      "framebuffer",
+                      g_value_a,
+                      sizeof(g_value_a) / sizeof(g_value_a[0]),
+                      g_request_a,
+                      sizeof(g_request_a) / sizeof(g_request_a[0])};
+
 } // namespace
 
-device_st g_device_framebuffer = {DEVICE_FRAMEBUFFER_PATH,
-                                  "fb0",
-                                  "framebuffer",
-                                  g_value_a,
-                                  sizeof(g_value_a) / sizeof(g_value_a[0]),
-                                  g_request_a,
-                                  sizeof(g_request_a) / sizeof(g_request_a[0])};
+device_st *device_framebuffer()
+{
+    return &g_device;
+}

@@ -20,8 +20,6 @@ namespace {
 
 typedef int (*ioctl_func)(int fd, unsigned long request, ...);
 
-device_st *const g_device_a[] = {&g_device_framebuffer, &g_device_console, &g_device_camera};
-
 ioctl_func next_ioctl()
 {
     static const ioctl_func next = reinterpret_cast<ioctl_func>(dlsym(RTLD_NEXT, "ioctl"));
@@ -131,7 +129,8 @@ STAND_IN_INTERFACE int ioctl(int fd, unsigned long number, ...) noexcept
     va_start(args, number);
     void *argument = va_arg(args, void *);
     va_end(args);
-    for (device_st *device : g_device_a) {
+    device_st *const device_a[] = {device_framebuffer(), device_console(), device_camera()};
+    for (device_st *device : device_a) {
         const device_request_st *request = find_request(device, number);
         if (request == nullptr) {
             continue;

@@ -20,7 +20,7 @@ namespace {
 constexpr char PID_FILE[] = "/tmp/amt-audio.pid";
 constexpr int PARAMETER_COUNT = 5;
 constexpr int USAGE_STATUS = 2;
-constexpr long LOOK_PAUSE_NS = 100 * 1000 * 1000;
+constexpr long LOOK_PAUSE_NS = 100'000'000;
 
 /* The process id in the pid file; 0 without one. */
 long recorded_pid()

@@ -10,7 +10,7 @@ protected:
         if (!has_sandbox()) {
             GTEST_SKIP() << "bubblewrap cannot make a sandbox here";
         }
-        write("fb0", std::string(480 * 800 * 4 * 2, '\0'));
+        write("fb0", std::string(size_t{480} * 800 * 4 * 2, '\0'));
         write("video0", "");
         write("tty0", "");
         write("sarvo_battery", "");

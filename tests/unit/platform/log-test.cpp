@@ -71,7 +71,7 @@ TEST_F(log_test, time_is_the_present_in_utc)
 
 TEST_F(log_test, every_day_of_the_calendar_is_right)
 {
-    for (int64_t days = 0; days < 366 * 200; days++) {
+    for (int64_t days = 0; days < int64_t{366} * 200; days++) {
         const time_t seconds = days * 86400;
         struct tm expected;
         gmtime_r(&seconds, &expected);
@@ -210,6 +210,7 @@ TEST_F(log_test, processes_and_threads_keep_their_lines_whole)
         const pid_t pid = fork();
         if (pid == 0) {
             std::vector<std::thread> workers;
+            workers.reserve(threads);
             for (int j = 0; j < threads; j++) {
                 workers.emplace_back([i, j] {
                     const std::string text(600, static_cast<char>('a' + i * threads + j));

@@ -34,6 +34,7 @@ int run(const std::vector<std::string> &words, std::string *output)
         dup2(pipe_a[1], STDOUT_FILENO);
         dup2(pipe_a[1], STDERR_FILENO);
         std::vector<char *> arguments;
+        arguments.reserve(words.size() + 1);
         for (const std::string &word : words) {
             arguments.push_back(const_cast<char *>(word.c_str()));
         }
