@@ -8,6 +8,10 @@
 
 void stand_in_record(const char *format, ...)
 {
+    const char *path = stand_in_setting(STAND_IN_CALLS);
+    if (path == nullptr) {
+        return;
+    }
     const int saved_errno = errno;
     char line_a[1024];
     constexpr uint32_t room = sizeof(line_a) - 1;
@@ -16,11 +20,6 @@ void stand_in_record(const char *format, ...)
     const int wanted = vsnprintf(line_a, room, format, args);
     va_end(args);
 
-    const char *path = stand_in_setting(STAND_IN_CALLS);
-    if (path == nullptr) {
-        errno = saved_errno;
-        return;
-    }
     uint32_t length = wanted < 0 ? 0 : static_cast<uint32_t>(wanted);
     length = stand_in_escape(line_a, length < room ? length : room - 1, room);
     line_a[length++] = '\n';
