@@ -38,7 +38,7 @@ def send(settings: Settings, command: str, atoms: tuple[str, ...]) -> None:
         console.data_json({"ok": refusal is None, **exchange_json(exchange), **_outcome(refusal)})
     else:
         for answer in exchange.answers:
-            for line in packet_lines(answer):
+            for line in packet_lines(answer, number):
                 console.data(line)
         show_exchange(exchange)
     _raise_reported(refusal)

@@ -8,7 +8,7 @@ from station.decoder import Acknowledgement, Frame, Item, Skipped, Text
 from station.exchange import AtReply, Exchange
 from station.operations import NamedValue, read_answer
 from station.packet import Atom, Packet
-from station.requests import Field
+from station.requests import RESULT, Field
 from station.table import display_name, requests_by_id
 
 Json = dict[str, Any]
@@ -30,13 +30,15 @@ def plain(text: str) -> str:
     return text.encode("utf-8", "surrogateescape").decode("utf-8", "backslashreplace")
 
 
-def _fields(command: int) -> dict[int, Field]:
-    """Atom id to field, for a request's id or for an answer's."""
-    row = requests_by_id().get(command)
-    if row is not None:
-        return {field.atom: field for field in row.fields}
-    answered = requests_by_id().get(command - 1)
-    return {field.atom: field for field in answered.answer_fields} if answered else {}
+def _fields(packet: Packet, request: int | None) -> dict[int, Field]:
+    """Atom id to field of an answer to ``request``, or else of whatever the packet's id says."""
+    row = requests_by_id().get(packet.command)
+    answered = requests_by_id().get(packet.command - 1 if request is None else request)
+    if request is None and row is not None:
+        fields = row.fields
+    else:
+        fields = answered.answer_fields if answered else (RESULT,)
+    return {field.atom: field for field in fields}
 
 
 def atom_json(atom: Atom, field: Field | None) -> Json:
@@ -50,9 +52,9 @@ def atom_json(atom: Atom, field: Field | None) -> Json:
     return shown
 
 
-def packet_json(packet: Packet) -> Json:
-    """A packet with its names."""
-    fields = _fields(packet.command)
+def packet_json(packet: Packet, request: int | None = None) -> Json:
+    """A packet with its names; ``request`` is the id of the request that it answers."""
+    fields = _fields(packet, request)
     return {"id": packet.command, "name": display_name(packet.command),
             "atoms": [atom_json(atom, fields.get(atom.id)) for atom in packet.atoms]}
 
@@ -76,11 +78,11 @@ def values_json(values: Iterable[NamedValue]) -> Json:
 
 def exchange_json(exchange: Exchange) -> Json:
     """A request and everything that came back."""
-    answers = exchange.answers
-    values = read_answer(exchange.request.command, answers[-1]) if answers else []
+    answers, command = exchange.answers, exchange.request.command
+    values = read_answer(command, answers[-1]) if answers else []
     return {"channel": exchange.channel.value, "request": packet_json(exchange.request),
             "acknowledged": exchange.acknowledged,
-            "answers": [packet_json(answer) for answer in answers],
+            "answers": [packet_json(answer, command) for answer in answers],
             "result": answers[-1].result if answers else None,
             "values": values_json(values),
             "stray": [item_json(item) for item in exchange.stray],
@@ -95,16 +97,16 @@ def at_json(reply: AtReply) -> Json:
 
 
 def value_line(value: NamedValue) -> str:
-    """``name: value (word) unit``."""
+    """``name: value (word) unit``; a unit that takes more than a word is left to the documents."""
     text = printable(value.value.strip()) if isinstance(value.value, str) else str(value.value)
     word = f" ({value.word})" if value.word else ""
-    unit = f" {value.unit}" if value.unit else ""
+    unit = f" {value.unit}" if value.unit and " " not in value.unit else ""
     return f"{value.name}: {text}{word}{unit}"
 
 
-def packet_lines(packet: Packet) -> list[str]:
-    """A packet: its name, then an atom a line."""
-    fields = _fields(packet.command)
+def packet_lines(packet: Packet, request: int | None = None) -> list[str]:
+    """A packet: its name, then an atom a line; ``request`` as for ``packet_json``."""
+    fields = _fields(packet, request)
     rows = [(str(atom.id), fields[atom.id].name if atom.id in fields else "", atom.type.label,
              _atom_text(atom, fields.get(atom.id))) for atom in packet.atoms]
     title = f"{packet.command} (0x{packet.command:02X}) {display_name(packet.command)}"

@@ -34,7 +34,7 @@ def _remark(result: StepResult) -> str:
     if result.reason:
         return printable(result.reason)
     return ", ".join(f"{name} {printable(str(value).strip())}"
-                     for name, value in result.values.items() if name != "result")
+                     for name, value in result.values.items() if name != "result" and value != "")
 
 
 def summary(plan: Plan, results: Sequence[StepResult]) -> str:

@@ -43,12 +43,12 @@ def find_operation(path: tuple[str, ...]) -> tuple[Request, Operation]:
 
 
 def display_name(command: int) -> str:
-    """The best name of an id: the catalogue's, else the table's."""
+    """The best name of an id: the catalogue's, else the table's, else its number."""
     if command in command_names():
         return command_name(command)
     row = requests_by_id().get(command) or requests_by_id().get(command - 1)
     if row is None:
-        return command_name(command)
+        return f"command {command}"
     return row.name if row.id == command else f"{row.name} answer"
 
 

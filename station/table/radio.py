@@ -46,7 +46,7 @@ REQUESTS: tuple[Request, ...] = (
         answer_fields=(Field(154, BYTES, "step", "the step asked for", choices=_WIFI_STEPS,
                              width=1),
                        Field(158, INT, "packets", "packets received, only in the answer to the "
-                             "end of reception", unit="packets"), RESULT),
+                             "end of reception"), RESULT),
         pc=on_pc(_WIFI_HOW, *_WIFI_REFUSALS), app=on_app(_WIFI_HOW, *_WIFI_REFUSALS),
         timeout=30.0, at_twin="AT^DWLTSD=",
         notes=("Transmission needs channel, rate and power; reception channel and rate. "

@@ -7,7 +7,7 @@ import subprocess
 from typing import Iterator
 
 import pytest
-from hypothesis import settings
+from hypothesis import configuration, settings
 from station_peer import ROOT, Peer, Run, station_command, station_environment
 
 from station.decoder import BareDecoder, EnvelopeDecoder
@@ -19,6 +19,7 @@ from station.requests import Channel
 settings.register_profile("station", deadline=None, database=None, print_blob=True,
                           derandomize=bool(os.environ.get("CI")))
 settings.load_profile("station")
+configuration.set_hypothesis_home_dir(str(ROOT / "build" / "hypothesis"))
 
 
 @pytest.fixture

@@ -174,6 +174,14 @@ def test_send_shows_a_refusal_too(peer: Peer, run_station: Run) -> None:
     assert "refused with code 3" in result.stderr
 
 
+def test_an_answer_is_named_after_its_request(peer: Peer, run_station: Run) -> None:
+    peer.script = sequence([ok(201)], [ACKNOWLEDGEMENT, ok(175)])
+    lines = run_station("-p", peer.path, "send", "200").stdout.splitlines()
+    assert lines == ["201 (0xC9) CELL_SWITCH_MODE_CMD", "  1  result  int  0"]
+    lines = run_station("-p", peer.path, "send", "gps-test").stdout.splitlines()
+    assert lines == ["175 (0xAF) AMT_GPS_CONTROL_RSPCMD", "  1  result  int  0"]
+
+
 def json_of(result: subprocess.CompletedProcess[str]) -> Any:
     return json.loads(result.stdout)
 

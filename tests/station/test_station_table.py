@@ -180,7 +180,7 @@ def test_an_answer_with_names() -> None:
 
 @pytest.mark.parametrize("command, name", [
     (45, "AMT_VERSION_CMD"), (46, "AMT_VERSION_RSPCMD"), (191, "adb-serial"),
-    (192, "adb-serial answer"), (200, UNDEFINED)])
+    (192, "adb-serial answer"), (200, "command 200")])
 def test_the_best_name_of_an_id(command: int, name: str) -> None:
     assert display_name(command) == name
 
