@@ -114,7 +114,8 @@ def run(suite: Suite) -> Count:
     report.unlink(missing_ok=True)
     say(f"suite {suite.name}")
     started = time.monotonic()
-    status = subprocess.run(suite.command(report), cwd=PROJECT, check=False, stdin=subprocess.DEVNULL,
+    status = subprocess.run(suite.command(report), cwd=PROJECT, check=False,
+                            stdin=subprocess.DEVNULL,
                             env={**os.environ, **suite.environment}).returncode
     count = read_count(report) if report.exists() else Count()
     if status != 0 and count.failed == 0:

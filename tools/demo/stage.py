@@ -1,4 +1,4 @@
-"""What the demo shows: every exchange decoded, with its time, and whether it came out as it should."""
+"""What the demo shows: every exchange decoded, timed, and whether it came out as it should."""
 
 import sys
 from dataclasses import dataclass, field
