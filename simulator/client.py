@@ -6,7 +6,7 @@ import socket
 from pathlib import Path
 from typing import Any, Sequence
 
-from .errors import HandsetError
+from .errors import HandsetError, HandsetTimeout
 from .waiting import scaled
 
 MESSAGE_SIZE = 1 << 18
@@ -37,13 +37,13 @@ class Client:
             raise HandsetError(f"{operation} handed out {len(fds)} descriptors")
         return fds[0], answer
 
-    def give_fd(self, operation: str, fd: int, **request: Any) -> dict[str, Any]:
-        """Have an operation done that takes a descriptor along; FD stays the caller's too."""
-        return self._exchange(operation, request, ANSWER_SECONDS, (fd,))[0]
+    def give_fds(self, operation: str, fds: Sequence[int], **request: Any) -> dict[str, Any]:
+        """Have an operation done that takes descriptors along; they stay the caller's too."""
+        return self._exchange(operation, request, ANSWER_SECONDS, fds)[0]
 
-    def ask_slowly(self, operation: str, timeout: float, **request: Any) -> dict[str, Any]:
-        """Have an operation done that answers when something has ended."""
-        return self._exchange(operation, request, timeout)[0]
+    def ask_slowly(self, operation: str, seconds: float, **request: Any) -> dict[str, Any]:
+        """Have an operation done that answers when something has ended, after SECONDS at most."""
+        return self._exchange(operation, request, seconds + ANSWER_SECONDS)[0]
 
     def _exchange(self, operation: str, request: dict[str, Any],
                   timeout: float, given: Sequence[int] = ()) -> tuple[dict[str, Any], list[int]]:
@@ -56,7 +56,7 @@ class Client:
                 data, fds, _, _ = socket.recv_fds(connection, MESSAGE_SIZE, 1,
                                                   socket.MSG_CMSG_CLOEXEC)
             except socket.timeout:
-                raise TimeoutError(f"no answer to {operation}") from None
+                raise HandsetTimeout(f"no answer to {operation} of the handset's init") from None
             except OSError as error:
                 raise HandsetError(f"the handset is not up ({error.strerror})") from None
         if not data:

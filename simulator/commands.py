@@ -131,7 +131,8 @@ def screen(handset: HandsetControl, file: Path) -> None:
     click.echo(str(file))
 
 
-@click.command("answer")
+# Answers are often negative numbers, which are no options.
+@click.command("answer", context_settings={"ignore_unknown_options": True})
 @click.argument("function")
 @click.argument("lines", nargs=-1)
 @pass_handset
@@ -140,7 +141,7 @@ def answer(handset: HandsetControl, function: str, lines: tuple[str, ...]) -> No
     handset.answer(function, *lines)
 
 
-@click.command("set")
+@click.command("set", context_settings={"ignore_unknown_options": True})
 @click.argument("key")
 @click.argument("value", required=False)
 @pass_handset

@@ -8,10 +8,11 @@ from pathlib import Path
 from typing import Mapping, Sequence
 
 from .client import Client
+from .errors import HandsetTimeout
 from .files import HandsetFiles
 from .line import AppLine, Line
 from .usb import Usb
-from .waiting import wait_until
+from .waiting import scaled, wait_until
 
 RECORD = re.compile(r"^\S+ (?P<what>start|exit) #(?P<number>\d+) pid (?P<pid>\d+): (?P<how>.*)$")
 
@@ -121,9 +122,13 @@ class HandsetControl(HandsetFiles):
         PROGRAM is the file to execute when ARGV's first word is not its path.
         """
         daemon = json.loads(self.text("/handset/init.json"))["daemon"]
+        seconds = scaled(timeout)
         answer = self.client.ask_slowly(
-            "run", timeout, argv=list(argv), program=program, directory=directory,
-            env={**daemon["env"], **(env or {})}, no_randomize=daemon["no_randomize"])
+            "run", seconds, timeout=seconds, argv=list(argv), program=program,
+            directory=directory, env={**daemon["env"], **(env or {})},
+            no_randomize=daemon["no_randomize"])
+        if answer["late"]:
+            raise HandsetTimeout(f"{' '.join(argv)} did not end within {seconds:g} s")
         return Completed(answer["status"], self.read(answer["output"] + ".out"),
                          self.read(answer["output"] + ".err"))
 

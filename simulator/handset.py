@@ -70,13 +70,12 @@ class Handset(HandsetControl):
         if names and self.options.modem == "held":
             names += ["modem", "mux"]
         for name in names:
-            # The app's port is not held: the daemon is to hear of a program that closes it.
-            self._ports.append(Port(self.client, name, self.directory / name, name != "app"))
+            self._ports.append(Port(self.client, name, self.directory / name))
 
     def _end_sandbox(self, sandbox: Sandbox) -> None:
         try:
             self.client.ask("shutdown")
-        except (HandsetError, TimeoutError):
+        except HandsetError:
             # It is down already, or its init does not listen any more.
             pass
         else:

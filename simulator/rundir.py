@@ -106,7 +106,7 @@ class RunDirectory:
         self._keeper = subprocess.Popen(
             ["/bin/sh", "-c", KEEPER, "handset-keeper", str(self.path)], stdin=subprocess.PIPE,
             stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL, start_new_session=True,
-            cwd="/")
+            cwd="/", env={"PATH": "/usr/bin:/bin"})
 
     def close(self, keep: bool = False) -> None:
         """Give the directory up; KEEP leaves it to whoever wants to look into it."""

@@ -71,7 +71,7 @@ class ControlServer:
 
     def _serve(self, client: socket.socket) -> None:
         try:
-            message, fds, _, _ = socket.recv_fds(client, MESSAGE_SIZE, 1,
+            message, fds, _, _ = socket.recv_fds(client, MESSAGE_SIZE, 2,
                                                  socket.MSG_CMSG_CLOEXEC)
         except BlockingIOError:
             return
@@ -85,7 +85,7 @@ class ControlServer:
         reply = Reply(client)
         try:
             request = json.loads(message)
-            request.update({"fd": fd for fd in fds})
+            request["fds"] = list(fds)
             operation = self._operations.get(request.get("op", ""))
             if operation is None:
                 raise Refused(f"no such operation: {request.get('op')}")

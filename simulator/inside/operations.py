@@ -4,6 +4,7 @@ from __future__ import annotations
 
 import ctypes
 import os
+import signal
 
 from . import mounts, procinfo, uevent
 from .attendance import Attendance
@@ -52,10 +53,11 @@ class Operations:
 
     def _op_relay(self, request: Request, reply: Reply) -> None:
         if request["line"] == "app":
-            AppRelay(self._loop, request["fd"], self._app)
+            master, watch = request["fds"]
+            AppRelay(self._loop, master, watch, self._app)
         else:
             line = self._line(request)
-            self._attendance.relay(line.name, PortRelay(self._loop, request["fd"]))
+            self._attendance.relay(line.name, PortRelay(self._loop, *request["fds"]))
         reply()
 
     def _op_take(self, request: Request, reply: Reply) -> None:
@@ -157,11 +159,20 @@ class Operations:
 
         def ended(process: Process) -> None:
             if not request.get("background"):
-                reply({"status": process.returncode, "output": name})
+                reply({"status": process.returncode, "output": name, "late": process.is_late})
 
         process = self._processes.start("command", launch, ended)
         if request.get("background"):
             reply({"pid": process.pid, "number": process.number, "output": name})
+        elif request.get("timeout"):
+            self._loop.after(request["timeout"], lambda: self._end_late(process))
+
+    @staticmethod
+    def _end_late(process: Process) -> None:
+        """End a command that takes too long, with all that belongs to its group."""
+        if process.returncode is None:
+            process.is_late = True
+            os.killpg(process.pid, signal.SIGKILL)
 
     # kernel and card
 

@@ -21,6 +21,8 @@ class Process:
     pid: int
     argv: list[str]
     returncode: int | None = None
+    # It was ended because it took too long.
+    is_late: bool = False
     on_exit: list[Callable[["Process"], None]] = field(default_factory=list)
 
 

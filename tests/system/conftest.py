@@ -9,6 +9,7 @@ from simulator import Handset
 from support.channels import AppChannel, PcChannel
 
 HandsetFactory = Callable[..., Handset]
+FAKE_DAEMON = Path(__file__).with_name("support") / "fake_daemon.py"
 HANDSETS = pytest.StashKey[list[Handset]]()
 
 
@@ -100,3 +101,18 @@ def pytest_runtest_makereport(item: pytest.Item) -> Iterator[None]:
     if report.when == "call" and report.failed:
         for number, handset in enumerate(item.stash.get(HANDSETS, [])):
             report.sections.append((f"handset {number}", handset.story()))
+
+
+@pytest.fixture
+def make_fake(make_handset: HandsetFactory) -> HandsetFactory:
+    """Make handsets as `make_handset` does, with a fake daemon that needs no build."""
+    def make(path: str = "pc", ready: bool = True, **options: Any) -> Handset:
+        return make_handset(path, ready, build=None, daemon=FAKE_DAEMON, **options)
+
+    return make
+
+
+@pytest.fixture
+def fake(make_fake: HandsetFactory) -> Handset:
+    """A handset with a fake daemon on the PC path."""
+    return make_fake()

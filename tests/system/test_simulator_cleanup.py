@@ -1,0 +1,155 @@
+"""Nothing of a handset outlives its launcher, however the launcher ends."""
+
+import json
+import os
+import signal
+import subprocess
+import sys
+import time
+from pathlib import Path
+from typing import Callable, Iterator
+
+import pytest
+
+from simulator import Handset
+from simulator.rundir import BASE_VARIABLE, RunDirectory, remove_tree, sweep
+
+PROJECT = Path(__file__).resolve().parents[2]
+FAKE_DAEMON = Path(__file__).with_name("support") / "fake_daemon.py"
+LAUNCHER = """
+import json, sys, time
+from pathlib import Path
+from simulator import Handset
+with Handset("pc", build=None, daemon=Path(sys.argv[1])) as handset:
+    handset.wait_ready()
+    print(json.dumps([str(handset.directory), handset.pid]), flush=True)
+    if sys.argv[2] == "raise":
+        raise RuntimeError("as a test that fails")
+    time.sleep(60)
+"""
+
+
+@pytest.fixture
+def base(tmp_path: Path, monkeypatch: pytest.MonkeyPatch) -> Path:
+    """A base directory of this test's own."""
+    monkeypatch.setenv(BASE_VARIABLE, str(tmp_path / "base"))
+    return tmp_path / "base"
+
+
+@pytest.fixture
+def launcher(base: Path) -> Iterator[Callable[..., subprocess.Popen[str]]]:
+    """Start a program that launches a handset."""
+    started = []
+
+    def launch(how: str) -> "subprocess.Popen[str]":
+        process = subprocess.Popen(
+            [sys.executable, "-c", LAUNCHER, str(FAKE_DAEMON), how], cwd=PROJECT, text=True,
+            stdout=subprocess.PIPE, stderr=subprocess.DEVNULL)
+        started.append(process)
+        return process
+
+    yield launch
+    for process in started:
+        process.kill()
+        process.communicate()
+
+
+def processes_of(directory: str) -> list[int]:
+    """Processes of the PC that belong to the handset in DIRECTORY, by root or command line."""
+    found = []
+    for entry in Path("/proc").iterdir():
+        if not entry.name.isdigit():
+            continue
+        try:
+            if directory in (entry / "cmdline").read_text("utf-8", "replace") or (
+                    directory in (entry / "mountinfo").read_text()):
+                found.append(int(entry.name))
+        except OSError:
+            continue
+    return found
+
+
+def wait_gone(directory: str) -> None:
+    """Wait until no process and no file of the handset is left."""
+    end = time.monotonic() + 10
+    while processes_of(directory) or os.path.exists(directory):
+        assert time.monotonic() < end, (processes_of(directory), os.path.exists(directory))
+        time.sleep(0.01)
+
+
+@pytest.mark.parametrize("number", [signal.SIGKILL, signal.SIGINT, signal.SIGTERM])
+def test_a_launcher_that_is_ended(launcher, number: int) -> None:
+    """By a crash as by Ctrl-C: processes, mounts and files are gone."""
+    process = launcher("stay")
+    assert process.stdout is not None
+    directory, pid = json.loads(process.stdout.readline())
+    assert pid and len(processes_of(directory)) >= 3
+    process.send_signal(number)
+    process.wait(10)
+    wait_gone(directory)
+
+
+def test_a_launcher_that_fails(launcher) -> None:
+    """An exception in the test takes the handset down too."""
+    process = launcher("raise")
+    directory = json.loads(process.stdout.readline())[0]
+    assert process.wait(10) == 1
+    assert not os.path.exists(directory)
+    assert processes_of(directory) == []
+
+
+def test_taking_down_leaves_nothing(base: Path) -> None:
+    """Neither after a plain end, nor after a power-off, nor with forbidden directories."""
+    for order in (b"", b"!off"):
+        with Handset(build=None, daemon=FAKE_DAEMON) as handset:
+            handset.wait_ready()
+            handset.run(["/bin/sh", "-c", "mkdir -p /data/a/b; touch /data/a/b/c; "
+                                          "chmod 0 /data/a/b /data/a"])
+            directory = str(handset.directory)
+            if order:
+                handset.pc.write(order)
+                handset.wait_power_off()
+        assert list(base.iterdir()) == []
+        assert processes_of(directory) == []
+        handset.down()
+
+
+def test_a_daemon_that_cannot_come_up_leaves_nothing(base: Path, tmp_path: Path,
+                                                     monkeypatch: pytest.MonkeyPatch) -> None:
+    """A sandbox that fails is cleaned up before the error is told."""
+    stub = tmp_path / "bwrap"
+    stub.write_text("#!/bin/sh\nexit 1\n")
+    stub.chmod(0o755)
+    monkeypatch.setenv("PATH", f"{tmp_path}:{os.environ['PATH']}")
+    with pytest.raises(Exception, match="did not come up: no message"):
+        Handset(build=None, daemon=FAKE_DAEMON).up()
+    assert list(base.iterdir()) == []
+
+
+def test_a_directory_can_be_kept(base: Path) -> None:
+    """For looking into it afterwards; no later start sweeps it."""
+    with Handset(build=None, daemon=FAKE_DAEMON, keep=True) as handset:
+        directory = handset.directory
+    assert (directory / "state" / "log.txt").exists()
+    sweep(base)
+    assert directory.exists()
+    remove_tree(directory)
+
+
+def test_left_directories_are_swept(base: Path) -> None:
+    """What a power cut of the PC left is removed by the next start; what is in use is not."""
+    base.mkdir()
+    stale = base / "1-stale"
+    stale.mkdir()
+    (stale / "owner").touch()
+    foreign = base / "something"
+    foreign.mkdir()
+    used = RunDirectory()
+    other = RunDirectory()
+    try:
+        assert not stale.exists()
+        assert foreign.exists() and used.path.exists() and other.path.exists()
+    finally:
+        used.close()
+        other.close()
+    assert not used.path.exists()

@@ -1,0 +1,145 @@
+"""The simulated modem: its table, its memory, its packets, and how a test replaces it."""
+
+import pytest
+
+from simulator import Handset
+from simulator.inside import modem_table
+from simulator.inside.modem import Modem, Session
+from station import wire
+
+OK = b"\r\nOK\r\n"
+ERROR = b"\r\nERROR\r\n"
+
+
+@pytest.fixture
+def session() -> Session:
+    """A tty of a fresh modem."""
+    return Session(Modem())
+
+
+def info(text: str) -> bytes:
+    """An information line and the final result."""
+    return f"\r\n{text}\r\n".encode() + OK
+
+
+@pytest.mark.parametrize("command, answer", [
+    ("AT", OK), ("at", OK), ("ATE0", OK), ("AT;^DLKS=1", OK), ("AT^DLKS=0", OK),
+    ("ATI", info("Handset Works KEL-1")), ("AT+CGMI", info("Handset Works")),
+    ("AT+CGSN", info("860000000000017")), ("AT^DMSN", info("^DMSN: KEL0000000000001")),
+    ("AT^DMFD??", info("^DMFD: 20130121")), ("AT^DMCC?", info("^DMCC: 2,2,1,3")),
+    ("AT^DTOC", info("^DTOC: 1")), ("AT^DSWAMT=1", OK), ("AT^DMPCHN=1", OK),
+    ("AT^DCMR=17", info("^DCMR: 17,0D4B454C2D31204C3120312E31372E300A0A")),
+    ("AT^DCMR=3", b"\r\n+CME ERROR: 50\r\n"), ("AT^DMSN=?", OK),
+    ("AT+CGSN;^DLKS?", b"\r\n860000000000017\r\n\r\n^DLKS: 0\r\n" + OK),
+    ("AT^DATOMR=1,5", info("^DATOMR: 5,0")), ("AT^DCGSNW=", b"\r\n+CME ERROR: 50\r\n"),
+    ("AT^NOSUCH", ERROR), ("ATQ9", ERROR), ("hello", b""), ("", b""),
+    ("AT^DMSN;^NOSUCH", b"\r\n^DMSN: KEL0000000000001\r\n" + ERROR),
+])
+def test_commands(session: Session, command: str, answer: bytes) -> None:
+    """Each command has its answer; text that is no command has none."""
+    assert session.feed(command.encode() + b"\r") == answer
+
+
+def test_every_row_answers(session: Session) -> None:
+    """No row of the table is dead: each gives a final result, none plain ERROR."""
+    operands = {"^DATOMR=": "1,2", "^DATOMW=": "1,2", "^DCMR=": "18", "^DTTEST=": "07"}
+    for row in modem_table.COMMANDS:
+        operand = operands.get(row.command, "1") if row.command.endswith("=") else ""
+        answer = session.feed(f"AT{row.command}{operand}\r".encode())
+        assert answer.endswith(OK), (row, answer)
+
+
+def test_what_is_written_is_remembered(session: Session) -> None:
+    """Identities by channel, results by station."""
+    for line in ("AT^DCGSNW=111", 'AT^DMSN="S0"', "AT^DMPCHN=1", "AT^DCGSNW=222",
+                 "AT^DATOMW=7,2,it, failed"):
+        assert session.feed(line.encode() + b"\r") == OK
+    assert session.feed(b"AT+CGSN\r") == info("222")
+    assert session.feed(b"AT^DATOMR=1,7\r") == info("^DATOMR: 7,2,it, failed")
+    session.feed(b"AT^DMPCHN=0\r")
+    assert session.feed(b"AT+CGSN;^DMSN\r") == b"\r\n111\r\n\r\n^DMSN: S0\r\n" + OK
+
+
+def test_ttys_share_one_modem() -> None:
+    """What is written on one tty is read on the other; a line may come in pieces."""
+    modem = Modem()
+    one, other = Session(modem), Session(modem)
+    assert one.feed(b"AT^DM") == b""
+    assert other.feed(b"AT^DMSN=XY\r") == OK
+    assert one.feed(b"SN\rAT\r\n") == info("^DMSN: XY") + OK
+
+
+@pytest.mark.parametrize("request_block, answer", [
+    ("1A", "1B" "00000000"), ("19", "1A" "00000000" "FFFFFFD1"),
+    ("07", "08" "00000000" + b"860000000000017".hex().upper()),
+    ("2F", "30" "00000000" "20000000" + bytes(range(32)).hex().upper()),
+    ("97", "98" "00000000" "0400" "05060708"), ("63", "64" "00000000" "01"),
+    ("DD", "DD" "00000000" "0200" "090A"),
+])
+def test_the_tunnel(session: Session, request_block: str, answer: str) -> None:
+    """A block is answered by a block: numbers with their high byte first, lengths with the low."""
+    assert session.feed(f"AT^DTTEST={request_block}\r".encode()) == info(f"^DTTEST: {answer}")
+
+
+@pytest.mark.parametrize("operand", ["", "1", "XY", "1A0"])
+def test_a_block_that_is_none(session: Session, operand: str) -> None:
+    """Something that is not whole hexadecimal bytes is refused."""
+    assert session.feed(f"AT^DTTEST={operand}\r".encode()) == b"\r\n+CME ERROR: 50\r\n"
+
+
+def test_the_tunnel_knows_every_response_with_fields() -> None:
+    """Each response that has more than a result is in the table."""
+    assert set(modem_table.RESPONSES) == {0x08, 0x18, 0x1A, 0x2E, 0x30, 0x3C, 0x3E, 0x4E, 0x64,
+                                          0x6A, 0x6E, 0x72, 0x98, 0xDD}
+
+
+def answered(session: Session, data: bytes) -> wire.Packet:
+    """The packet that answers DATA."""
+    return wire.decode_envelope(session.feed(data))
+
+
+def test_packets(session: Session) -> None:
+    """A request packet is answered with a packet in its envelope, and identities are kept."""
+    request = wire.Packet(5, (wire.Atom.string(21, "868686868686868"),))
+    assert answered(session, wire.encode_envelope(request)) == wire.Packet(
+        6, (wire.Atom.integer(1, 0),))
+    assert session.feed(b"AT+CGSN\r") == info("868686868686868")
+    assert answered(session, wire.encode_envelope(wire.Packet(7))).find(21) == wire.Atom.raw(
+        21, b"868686868686868")
+    board = wire.Packet(87, (wire.Atom.string(38, "B1"),))
+    assert answered(session, wire.encode_envelope(board)).command == 88
+    assert session.feed(b"AT^DMSN\r") == info("^DMSN: B1")
+    assert answered(session, wire.encode_envelope(wire.Packet(200))) == wire.Packet(
+        201, (wire.Atom.integer(1, 0),))
+
+
+def test_packets_in_pieces_and_between_text(session: Session) -> None:
+    """A packet may come byte by byte, behind garbage, and before text."""
+    data = b"\x00\xff" + wire.encode_envelope(wire.Packet(87)) + b"AT\r"
+    said = b"".join(session.feed(data[i:i + 1]) for i in range(len(data)))
+    assert wire.decode_envelope(said[:-len(OK)]).command == 88
+    assert said.endswith(OK)
+
+
+def test_an_answer_can_be_replaced() -> None:
+    """A whole command line, without regard to case; None gives the table's answer back."""
+    modem = Modem({"at^dmsn": "\r\n+CME ERROR: 3\r\n"})
+    session = Session(modem)
+    assert session.feed(b"AT^DMSN\r") == b"\r\n+CME ERROR: 3\r\n"
+    modem.set_answer("AT^DMSN", None)
+    assert session.feed(b"AT^DMSN\r") == info("^DMSN: KEL0000000000001")
+
+
+def test_in_the_handset(make_fake) -> None:
+    """The modem serves its tty, with replaced answers from the start or later."""
+    handset: Handset = make_fake(modem_answers={"AT+CSQ": "none"})
+    handset.pc.write(b"AT+CSQ\r")
+    assert handset.pc.read_exactly(4) == b"none"
+    handset.answer_modem("AT+CSQ", "x" * 3000)
+    handset.pc.write(b"AT+CSQ\r")
+    assert handset.pc.read_exactly(3000) == b"x" * 3000
+    handset.answer_modem("AT+CSQ", None)
+    handset.pc.write(b"AT+CSQ\r")
+    assert handset.pc.read_until(OK) == info("+CSQ: 24,99")
+    handset.client.ask("say", line="modem", text="\r\n^RING\r\n")
+    assert handset.pc.read_exactly(9) == b"\r\n^RING\r\n"
