@@ -24,6 +24,7 @@ RECOVER_TIMEOUT = 3.0
 
 # A frame's bytes follow each other closely; after so long a silence its rest will not come.
 _SILENCE = 0.3
+_DRAIN_SECONDS = 1.0
 
 
 @dataclass(frozen=True)
@@ -63,20 +64,26 @@ class Link:
         self.port.close()
 
     def drain(self) -> list[Item]:
-        """Take what has arrived unasked."""
+        """Take what has arrived unasked, for a second at most where that never ends."""
         items: list[Item] = []
-        while data := self.port.read(0.0):
+        end = time.monotonic() + _DRAIN_SECONDS
+        while time.monotonic() < end and (data := self.port.read(0.0)):
             items += self._decoder.feed(data)
         return items + self._decoder.give_up()
 
-    def arrivals(self, timeout: float) -> Iterator[TimedItem]:
-        """Everything that arrives within ``timeout`` seconds from now."""
+    def _arrivals(self, data: bytes, timeout: float) -> Iterator[TimedItem]:
+        """Send ``data``; everything that arrives within ``timeout`` seconds from then.
+
+        What arrived before is taken away first: it cannot be an answer.
+        """
+        self.drain()
         start = time.monotonic()
+        self.port.write(data)
         seconds = 0.0
         while seconds < timeout:
             left = timeout - seconds
-            data = self.port.read(min(left, _SILENCE) if self._decoder.pending else left)
-            items = self._decoder.feed(data) if data else self._decoder.give_up()
+            piece = self.port.read(min(left, _SILENCE) if self._decoder.pending else left)
+            items = self._decoder.feed(piece) if piece else self._decoder.give_up()
             seconds = time.monotonic() - start
             for item in items:
                 yield TimedItem(seconds, item)
@@ -96,9 +103,7 @@ class Link:
         row = requests_by_id().get(packet.command)
         limit = timeout or self.timeout or (row.timeout if row else None) or DEFAULT_TIMEOUT
         exchange = Exchange(self.channel, packet, _encode(packet, self.channel))
-        self.drain()
-        self.port.write(exchange.sent)
-        for timed in self.arrivals(limit):
+        for timed in self._arrivals(exchange.sent, limit):
             exchange.items.append(timed)
             exchange.seconds = timed.seconds
             if self._completes(exchange, timed.item, row.answers if row else 1):
@@ -120,10 +125,8 @@ class Link:
         command = text.rstrip("\r\n")
         data = self._encode_text(command)
         limit = timeout or self.timeout or DEFAULT_TIMEOUT
-        self.drain()
-        self.port.write(data)
         reply = AtReply(command)
-        for timed in self.arrivals(limit):
+        for timed in self._arrivals(data, limit):
             item, reply.seconds = timed.item, timed.seconds
             if isinstance(item, Text):
                 reply.raw += item.text

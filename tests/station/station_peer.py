@@ -101,6 +101,11 @@ def sequence(*answers: Sequence[bytes]) -> Script:
     return lambda item: left.pop(0) if left else ()
 
 
+def ok(command: int, *atoms: Atom) -> bytes:
+    """A positive answer in its envelope."""
+    return encode_envelope(Packet(command, (*atoms, Atom.integer(1, 0))))
+
+
 def error_packet(command: int, code: int = 1) -> bytes:
     """An error packet in its envelope."""
     return encode_envelope(Packet(command, (Atom.integer(1, code),)))
