@@ -58,6 +58,14 @@ bool read_property(const char *key, char *value, const char *unset)
     return property_get(key, value, unset) > 0;
 }
 
+/* The failure of a property that the text starts with. */
+int fail_property(int line, const char *key)
+{
+    pub_log_error(g_amt_handle_log, line, "get_ap_sw_version", PUB_ERR_FAIL);
+    PUB_LOG(g_amt_handle_log, "read %s error", key);
+    return PUB_ERR_FAIL;
+}
+
 bool is_own_brand()
 {
     char value_a[PROPERTY_VALUE_MAX];
@@ -73,9 +81,7 @@ int append_own_brand(version_text_st *version_ptr, bool *is_complete_ptr)
 {
     char value_a[PROPERTY_VALUE_MAX];
     if (!read_property("ro.build.version.incremental", value_a, UNSET)) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
-        PUB_LOG(g_amt_handle_log, "read ro.build.version.incremental error");
-        return PUB_ERR_FAIL;
+        return fail_property(__LINE__, "ro.build.version.incremental");
     }
     append(version_ptr, "ORLA ", value_a, "");
     *is_complete_ptr = !read_property("ro.build.display.vx.id", value_a, UNSET);
@@ -90,9 +96,7 @@ int append_other_brand(version_text_st *version_ptr)
 {
     char value_a[PROPERTY_VALUE_MAX];
     if (!read_property("ro.build.display.id", value_a, UNSET)) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
-        PUB_LOG(g_amt_handle_log, "read ro.build.display.id error");
-        return PUB_ERR_FAIL;
+        return fail_property(__LINE__, "ro.build.display.id");
     }
     append_field(version_ptr, value_a);
     return PUB_ERR_NONE;
@@ -170,6 +174,7 @@ int get_ap_sw_version(char *buf, uint32_t *length_ptr)
 
 int amt_read_emmc_info(char *buf)
 {
+    PUB_LOG_ENTRY(g_amt_handle_log);
     buf[0] = '\0';
     FILE *const stream = fopen(EMMC_INFO_FILE, "r");
     if (stream == nullptr) {
@@ -196,6 +201,7 @@ int amt_read_emmc_info(char *buf)
 
 int amt_read_cm_info(char *buf)
 {
+    PUB_LOG_ENTRY(g_amt_handle_log);
     buf[0] = '\0';
     FILE *const stream = fopen(CARRIER_FILE, "r");
     if (stream == nullptr) {

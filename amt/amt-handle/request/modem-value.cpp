@@ -21,6 +21,8 @@ constexpr uint8_t ATOM_BOARD = 38;
 constexpr uint8_t ATOM_CHANNEL = 159;
 constexpr uint8_t RSP_CHANNEL_SWITCH = 233;
 
+constexpr const char *TEMPERATURE_HANDLER = "amt_modem_handle_temperature";
+
 /* Relative to the working directory, which is the root directory in service. */
 constexpr const char *TEMPERATURE_FILE = "sys/class/power_supply/battery/temp";
 
@@ -89,13 +91,13 @@ int read_temperature(uint32_t *temperature_ptr)
 {
     FILE *const stream = fopen(TEMPERATURE_FILE, "r");
     if (stream == nullptr) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FILE);
+        pub_log_error(g_amt_handle_log, __LINE__, TEMPERATURE_HANDLER, PUB_ERR_FILE);
         PUB_LOG(g_amt_handle_log, "fopen error: errno=%d", errno);
         return PUB_ERR_FILE;
     }
     const int count = amt_number_scan_unsigned(stream, temperature_ptr);
     if (count != 1) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FILE);
+        pub_log_error(g_amt_handle_log, __LINE__, TEMPERATURE_HANDLER, PUB_ERR_FILE);
         PUB_LOG(g_amt_handle_log, "fscanf error: errno=%d", errno);
     }
     fclose(stream);

@@ -23,11 +23,11 @@ void log_failure(const char *call, const char *path)
     PUB_LOG(g_amt_handle_log, "%s(%s) failure. errorr: %d - %s", call, path, errno, strerror(errno));
 }
 
-FILE *open_file(const char *path, const char *mode)
+FILE *open_file(const char *func, const char *path, const char *mode)
 {
     FILE *const stream = fopen(path, mode);
     if (stream == nullptr) {
-        PUB_LOG_ERROR(g_amt_handle_log, AMT_RESULT_FILE_ERR_ACCESS);
+        pub_log_error(g_amt_handle_log, __LINE__, func, AMT_RESULT_FILE_ERR_ACCESS);
         log_failure("open file", path);
     }
     return stream;
@@ -49,33 +49,33 @@ char get_digit(int32_t verdict)
     return verdict == VERDICT_FAIL ? '2' : '0';
 }
 
-int check_index(int32_t index, int32_t count)
+int check_index(const char *func, int32_t index, int32_t count)
 {
     if (index < count) {
         return PUB_ERR_NONE;
     }
-    PUB_LOG_ERROR(g_amt_handle_log, AMT_RESULT_FILE_ERR_ITEM);
+    pub_log_error(g_amt_handle_log, __LINE__, func, AMT_RESULT_FILE_ERR_ITEM);
     PUB_LOG(g_amt_handle_log, "item index error: %d\n", index);
     return AMT_RESULT_FILE_ERR_ITEM;
 }
 
-int save_result(const char *path, int32_t count, int32_t index, int32_t verdict)
+int save_result(const char *func, const char *path, int32_t count, int32_t index, int32_t verdict)
 {
-    if (check_index(index, count) != PUB_ERR_NONE) {
+    if (check_index(func, index, count) != PUB_ERR_NONE) {
         return AMT_RESULT_FILE_ERR_ITEM;
     }
     if (access(FOLDER, R_OK | W_OK) != 0) {
-        PUB_LOG_ERROR(g_amt_handle_log, AMT_RESULT_FILE_ERR_ACCESS);
+        pub_log_error(g_amt_handle_log, __LINE__, func, AMT_RESULT_FILE_ERR_ACCESS);
         PUB_LOG(g_amt_handle_log, "Save fail: Directory access deny\n");
         return AMT_RESULT_FILE_ERR_ACCESS;
     }
     if (access(path, F_OK) != 0 && initTestFile(path, count) != PUB_ERR_NONE) {
-        PUB_LOG_ERROR(g_amt_handle_log, AMT_RESULT_FILE_ERR_WRITE);
+        pub_log_error(g_amt_handle_log, __LINE__, func, AMT_RESULT_FILE_ERR_WRITE);
         PUB_LOG(g_amt_handle_log, "Save fail: init result file error\n");
         return AMT_RESULT_FILE_ERR_WRITE;
     }
     if (updateTestItem(path, index, verdict) != PUB_ERR_NONE) {
-        PUB_LOG_ERROR(g_amt_handle_log, AMT_RESULT_FILE_ERR_ITEM);
+        pub_log_error(g_amt_handle_log, __LINE__, func, AMT_RESULT_FILE_ERR_ITEM);
         PUB_LOG(g_amt_handle_log, "Save fail: update result error\n");
         return AMT_RESULT_FILE_ERR_ITEM;
     }
@@ -86,7 +86,7 @@ int save_result(const char *path, int32_t count, int32_t index, int32_t verdict)
 int read_item(FILE *stream, int32_t index)
 {
     if (seek_item(stream, index) != 0) {
-        PUB_LOG_ERROR(g_amt_handle_log, AMT_RESULT_FILE_ERR_ACCESS);
+        pub_log_error(g_amt_handle_log, __LINE__, "readProductResult", AMT_RESULT_FILE_ERR_ACCESS);
         PUB_LOG(g_amt_handle_log, "call fseek failure. errorr: %d - %s", errno, strerror(errno));
         return AMT_RESULT_FILE_ERR_ACCESS;
     }
@@ -96,7 +96,7 @@ int read_item(FILE *stream, int32_t index)
         return atoi(text_a);
     }
     if (ferror(stream) != 0) {
-        PUB_LOG_ERROR(g_amt_handle_log, AMT_RESULT_FILE_ERR_ACCESS);
+        pub_log_error(g_amt_handle_log, __LINE__, "readProductResult", AMT_RESULT_FILE_ERR_ACCESS);
         PUB_LOG(g_amt_handle_log, "call fgets error. errorr: %d - %s", errno, strerror(errno));
         return AMT_RESULT_FILE_ERR_ACCESS;
     }
@@ -114,7 +114,7 @@ int initTestFile(const char *path, int32_t count)
         return AMT_RESULT_FILE_ERR_ACCESS;
     }
     PUB_LOG(g_amt_handle_log, "initTestFile . path:%s; count: %d\n", path, count);
-    FILE *const stream = open_file(path, "w");
+    FILE *const stream = open_file(__func__, path, "w");
     if (stream == nullptr) {
         return AMT_RESULT_FILE_ERR_ACCESS;
     }
@@ -128,7 +128,7 @@ int initTestFile(const char *path, int32_t count)
 int updateTestItem(const char *path, int32_t index, int32_t verdict)
 {
     PUB_LOG_ENTRY(g_amt_handle_log);
-    FILE *const stream = open_file(path, "r+");
+    FILE *const stream = open_file(__func__, path, "r+");
     if (stream == nullptr) {
         return AMT_RESULT_FILE_ERR_ACCESS;
     }
@@ -148,19 +148,19 @@ int updateTestItem(const char *path, int32_t index, int32_t verdict)
 int saveAmtResult(int32_t index, int32_t verdict)
 {
     PUB_LOG_ENTRY(g_amt_handle_log);
-    return save_result(AMT_RESULT_FILE, AMT_RESULT_COUNT, index, verdict);
+    return save_result(__func__, AMT_RESULT_FILE, AMT_RESULT_COUNT, index, verdict);
 }
 
 int saveProductResult(int32_t index, int32_t verdict)
 {
     PUB_LOG_ENTRY(g_amt_handle_log);
-    return save_result(AMT_PRODUCT_FILE, AMT_PRODUCT_COUNT, index, verdict);
+    return save_result(__func__, AMT_PRODUCT_FILE, AMT_PRODUCT_COUNT, index, verdict);
 }
 
 int readProductResult(int32_t index)
 {
     PUB_LOG_ENTRY(g_amt_handle_log);
-    if (check_index(index, AMT_PRODUCT_COUNT) != PUB_ERR_NONE) {
+    if (check_index(__func__, index, AMT_PRODUCT_COUNT) != PUB_ERR_NONE) {
         return AMT_RESULT_FILE_ERR_ITEM;
     }
     if (access(FOLDER, R_OK) != 0) {
@@ -176,7 +176,7 @@ int readProductResult(int32_t index)
             return AMT_RESULT_FILE_ERR_WRITE;
         }
     }
-    FILE *const stream = open_file(AMT_PRODUCT_FILE, "r");
+    FILE *const stream = open_file(__func__, AMT_PRODUCT_FILE, "r");
     if (stream == nullptr) {
         return AMT_RESULT_FILE_ERR_ACCESS;
     }
