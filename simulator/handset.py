@@ -18,7 +18,8 @@ from .waiting import scaled, wait_until
 class Handset(HandsetControl):
     """A handset with the unmodified daemon in it. A context manager: entered, it is up.
 
-    The keyword arguments are those of `options.Options`, which explains them.
+    The keyword arguments are those of `options.Options`, which explains them. The thread that
+    brings a handset up must live as long as the handset: the sandbox ends with it.
     """
 
     def __init__(self, path: str = "pc", build: str | Path | None = "release",
@@ -46,7 +47,7 @@ class Handset(HandsetControl):
         try:
             self.attach(self._run.path)
             furnish(self.directory, self.options, self.program)
-            self._sandbox = Sandbox(self.directory, self.kind.program, self.options.shared)
+            self._sandbox = Sandbox(self.directory, self.kind.program, self._shared())
             self._open_ports()
         except BaseException:
             self.down()
@@ -64,6 +65,15 @@ class Handset(HandsetControl):
             self._end_sandbox(self._sandbox)
         self._run.close(self.options.keep)
         self._run = None
+
+    def _shared(self) -> dict[str, Path]:
+        """Directories of the PC that the handset may write to: none but those asked for."""
+        shared = dict(self.options.shared)
+        if self.program.counts_coverage and self.program.build is not None:
+            # Such a daemon adds its counts to files beside its objects.
+            build = self.program.build.resolve()
+            shared[str(build)] = build
+        return shared
 
     def _open_ports(self) -> None:
         names = ["pc", "app"] if self.options.ports else []

@@ -19,6 +19,7 @@ LIBRARIES = {
 PROGRAMS = ("amt-audio", "sync")
 # Init's modules, and the wire codec that its modem speaks.
 MODULES = ("simulator/inside", "station")
+COVERAGE = b".gcda\0"
 SANITIZER = re.compile(rb"lib([at])san\.so\.\d+\0")
 
 # In the handset, and on the PC beside the root.
@@ -33,12 +34,19 @@ class Program:
 
     daemon: Path
     build: Path | None
+    # What it is instrumented with: a sanitizer, and the counting of what is run.
     sanitizer: str = ""
+    counts_coverage: bool = False
 
     @property
     def no_randomize(self) -> bool:
         """Whether it runs only at fixed addresses: the shadow of that sanitizer has its place."""
         return self.sanitizer == "tsan"
+
+    @property
+    def tells_at_exit(self) -> bool:
+        """Whether its end must be a proper one, because only then it tells what it has found."""
+        return bool(self.sanitizer) or self.counts_coverage
 
     @property
     def has_preload(self) -> bool:
@@ -61,8 +69,10 @@ def find_program(build: "str | Path | None", daemon: Path | None) -> Program:
     if not daemon.is_file():
         raise HandsetError(f"{daemon} is not there; ./dev build makes the build "
                            f"{directory.name if directory else ''}".rstrip())
-    match = SANITIZER.search(daemon.read_bytes())
-    return Program(daemon, directory, {b"a": "asan", b"t": "tsan"}[match[1]] if match else "")
+    content = daemon.read_bytes()
+    match = SANITIZER.search(content)
+    return Program(daemon, directory, {b"a": "asan", b"t": "tsan"}[match[1]] if match else "",
+                   directory is not None and COVERAGE in content)
 
 
 def _copy(source: Path, target: Path) -> None:

@@ -59,8 +59,8 @@ def make_handset(request: pytest.FixtureRequest,
 
 
 def _end(handset: Handset) -> dict[str, str]:
-    """End the daemon of a sanitizer build properly: some reports are only made at its exit."""
-    if not handset.program.sanitizer:
+    """End an instrumented daemon properly: some of what it finds is only told at its exit."""
+    if not handset.program.tells_at_exit:
         return {}
     if handset.is_up:
         handset.set_restart(False)
