@@ -1,9 +1,11 @@
 #include <errno.h>
+#include <poll.h>
 #include <pthread.h>
 #include <signal.h>
 #include <stdint.h>
 #include <stdio.h>
 #include <string.h>
+#include <time.h>
 #include <unistd.h>
 
 #include "amt/amt-cfg.h"
@@ -32,7 +34,7 @@ constexpr int MODE_NORMAL = 1;
 constexpr int MODE_SIMPLIFIED = 0;
 
 /* Seconds of one sleep of the main thread, which sleeps for ever. */
-constexpr unsigned SLEEP_SECONDS = 0xFFFFFFF;
+constexpr time_t SLEEP_SECONDS = 0xFFFFFFF;
 
 constexpr uint32_t PATH_SIZE = 60;
 constexpr uint32_t PROCESS_PATH_SIZE = 256;
@@ -44,6 +46,11 @@ struct run_mode_st
 };
 
 pthread_t g_main_thread;
+
+/* Set while the main thread only waits for signals; the one it has got then, else 0. */
+volatile sig_atomic_t g_is_parked = 0;
+volatile sig_atomic_t g_parked_signal = 0;
+
 char g_cfg_path_a[PATH_SIZE];
 char g_pid_path_a[PATH_SIZE];
 
@@ -127,22 +134,9 @@ bool is_fault(int signal_number)
     return signal_number == SIGSEGV || signal_number == SIGBUS;
 }
 
-/*
- * A fault is treated on the thread it happened on. Any other signal is the main thread's business, which
- * sleeps and holds no lock: a worker hit by one hands it over and goes on until it is stopped.
- */
-void signal_treatment(int signal_number)
+[[noreturn]] void end_by_signal(int signal_number)
 {
-    if (!amt_service_process_is_own()) {
-        _exit(0);
-    }
-    if (!is_fault(signal_number) && pthread_equal(pthread_self(), g_main_thread) == 0) {
-        const int saved_errno = errno;
-        pthread_kill(g_main_thread, signal_number);
-        errno = saved_errno;
-        return;
-    }
-    PUB_LOG_ENTRY(g_amt_main_log);
+    PUB_LOG(g_amt_main_log, "signal_treatment()");
     PUB_LOG(g_amt_main_log, "receive signal: %d - %s", signal_number,
             pub_util_get_signal_name(signal_number));
     amt_process_end_begin(0);
@@ -150,11 +144,61 @@ void signal_treatment(int signal_number)
     amt_process_end_finish();
 }
 
+/*
+ * A fault is treated where it happens. Any other signal is the main thread's business: a worker, which may
+ * hold a lock, hands it over and goes on until it is stopped; and the main thread, once start-up is over,
+ * treats it outside the handler, where nothing is forbidden.
+ */
+void signal_treatment(int signal_number)
+{
+    if (!amt_service_process_is_own()) {
+        _exit(0);
+    }
+    if (is_fault(signal_number)) {
+        end_by_signal(signal_number);
+    }
+    if (pthread_equal(pthread_self(), g_main_thread) == 0) {
+        const int saved_errno = errno;
+        pthread_kill(g_main_thread, signal_number);
+        errno = saved_errno;
+        return;
+    }
+    if (g_is_parked == 0) {
+        end_by_signal(signal_number);
+    }
+    g_parked_signal = signal_number;
+}
+
+constexpr int g_treated_signal_a[] = {SIGINT, SIGTERM, SIGSEGV, SIGBUS, 12};
+
 /* 12 is SIGUSR2 here; the number is what counts. */
 void install_signal_treatment()
 {
-    for (const int signal_number : {SIGINT, SIGTERM, SIGSEGV, SIGBUS, 12}) {
+    for (const int signal_number : g_treated_signal_a) {
         signal(signal_number, signal_treatment);
+    }
+}
+
+/* Sleeps for ever, open to signals only while it sleeps, so that none comes between the look and the sleep.
+ */
+[[noreturn]] void park()
+{
+    sigset_t treated;
+    sigset_t open;
+    sigemptyset(&treated);
+    for (const int signal_number : g_treated_signal_a) {
+        if (!is_fault(signal_number)) {
+            sigaddset(&treated, signal_number);
+        }
+    }
+    pthread_sigmask(SIG_BLOCK, &treated, &open);
+    g_is_parked = 1;
+    for (;;) {
+        const timespec time = {SLEEP_SECONDS, 0};
+        ppoll(nullptr, 0, &time, &open);
+        if (g_parked_signal != 0) {
+            end_by_signal(g_parked_signal);
+        }
     }
 }
 
@@ -208,7 +252,5 @@ int main(int argc, char **argv)
     if (status != PUB_ERR_NONE) {
         end_by_fatal_error(status);
     }
-    for (;;) {
-        sleep(SLEEP_SECONDS);
-    }
+    park();
 }

@@ -18,6 +18,12 @@ STATE = "/sys/class/android_usb/android0/state"
 OK = "\r\nOK\r\n"
 
 
+def skip_under_tsan(handset: Handset) -> None:
+    """ThreadSanitizer crashes on the threads that the C library makes for timers by itself."""
+    if handset.program.sanitizer == "tsan":
+        pytest.skip("the sanitizer does not know the C library's timer threads")
+
+
 def start(make_handset: HandsetFactory, ready: bool = True, **options: object) -> Handset:
     """A handset that a cable has started; its init does not start the daemon again."""
     return make_handset("usb-inserted", ready=ready, restart=False, **options)
@@ -173,10 +179,11 @@ def test_configured_event_makes_ready(make_handset: HandsetFactory) -> None:
 
 def test_silent_station_ends_it_after_5_seconds(make_handset: HandsetFactory) -> None:
     handset = start(make_handset, modem="held")
+    skip_under_tsan(handset)
     handset.usb.configure()
     handset.log.wait("get usb CONFIGURED event")
     handset.modem.write(b"x")
-    handset.log.wait("setTimer success")
+    handset.log.wait("timeMSec:5000")
     begun = time.monotonic()
     assert handset.wait_exit() == 0
     assert 4.5 <= time.monotonic() - begun < scaled(7.0)
@@ -191,6 +198,7 @@ def test_silent_station_ends_it_after_5_seconds(make_handset: HandsetFactory) ->
 
 def test_unconfigured_link_ends_it_after_20_seconds(make_handset: HandsetFactory) -> None:
     handset = start(make_handset)
+    skip_under_tsan(handset)
     assert handset.log.find(re.compile(r"setTimer success, timerId\[-?\d+\], timeMSec:20000\. "))
     assert handset.wait_exit(timeout=30) == 0
     texts = handset.log.texts(TAG)

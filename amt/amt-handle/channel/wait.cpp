@@ -43,7 +43,11 @@ int wait_for(int fd, bool is_to_write, int timeout_ms)
 
 ssize_t amt_wait_read(int fd, void *buf, size_t size)
 {
-    return wait_open_to_end([=] { return read(fd, buf, size); });
+    ssize_t count = -1;
+    do {
+        count = wait_open_to_end([=] { return read(fd, buf, size); });
+    } while (count < 0 && errno == EINTR);
+    return count;
 }
 
 int amt_wait_readable(int fd, int timeout_ms)

@@ -8,7 +8,7 @@
  * nowhere else. All leave errno as the wait left it.
  */
 
-/* read(2). */
+/* read(2), taken up again when a signal has interrupted it. */
 ssize_t amt_wait_read(int fd, void *buf, size_t size);
 
 /* Waits until fd is readable. Returns what select(2) returns: 1, 0 after timeout_ms milliseconds, or -1. */

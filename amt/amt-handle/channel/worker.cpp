@@ -11,7 +11,7 @@ namespace {
 constexpr uint32_t STOP_PATIENCE_MS = 200;
 
 pthread_key_t g_end_key;
-bool g_has_end_key = false;
+bool g_is_prepared = false;
 
 /* Held while a thread is created: it must find its id stored, whatever it does first. */
 pthread_mutex_t g_start_lock = PTHREAD_MUTEX_INITIALIZER;
@@ -21,12 +21,32 @@ void mark_ended(void *worker_ptr)
     static_cast<amt_worker_st *>(worker_ptr)->m_is_alive.store(0, std::memory_order_release);
 }
 
-/* A key's destructor runs however the thread ends; a destructor on the stack would not when it ends by
- * pthread_exit. */
-void create_end_key()
+void *leave_at_once(void *)
 {
-    if (!g_has_end_key) {
-        g_has_end_key = pthread_key_create(&g_end_key, mark_ended) == 0;
+    pthread_exit(nullptr);
+}
+
+/*
+ * The first pthread_exit of a process loads the unwinder, which allocates. A worker ends inside a signal
+ * handler, so that must have happened before.
+ */
+void load_unwinder()
+{
+    pthread_t id = 0;
+    if (pthread_create(&id, nullptr, leave_at_once, nullptr) == 0) {
+        pthread_join(id, nullptr);
+    }
+}
+
+/*
+ * What all workers need, once. A key's destructor runs however a thread ends; a destructor on its stack would
+ * not when it ends by pthread_exit.
+ */
+void prepare_thread_ends()
+{
+    if (!g_is_prepared) {
+        load_unwinder();
+        g_is_prepared = pthread_key_create(&g_end_key, mark_ended) == 0;
     }
 }
 
@@ -60,7 +80,7 @@ int create_detached(amt_worker_st *worker_ptr)
 
 int amt_worker_start(amt_worker_st *worker_ptr, void (*loop)())
 {
-    create_end_key();
+    prepare_thread_ends();
     /* Installed before the thread exists: a stop that comes first must not end the whole process. */
     signal(SIGUSR1, pub_util_handle_thread_signal);
     worker_ptr->m_loop = loop;
