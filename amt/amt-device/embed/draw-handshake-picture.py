@@ -1,9 +1,10 @@
 #!/usr/bin/python3
-"""Draws the handshake picture: a handset with a test pulse through it, "TEST MODE", hazard stripes.
+"""Draws the handshake picture: a handset, a test pulse through it, "TEST MODE", hazard stripes.
 
 Usage: draw-handshake-picture.py OUTPUT.png
 
-The build does not run this: it takes the PNG beside this file. Needs python3-pil and fonts-dejavu-core.
+The build does not run this: it takes the PNG beside this file. Needs python3-pil and
+fonts-dejavu-core.
 """
 
 import sys

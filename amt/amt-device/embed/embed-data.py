@@ -4,8 +4,8 @@
 Usage: embed-data.py picture INPUT.png OUTPUT.cpp
        embed-data.py script INPUT.sh OUTPUT.cpp
 
-picture: a PNG (8 bits a channel, RGB, not interlaced) becomes little-endian RGB565 pixels in a gzip member without a
-         date, so that the same picture always gives the same bytes.
+picture: a PNG (8 bits a channel, RGB, not interlaced) becomes little-endian RGB565 pixels in a gzip
+         member without a date, so that the same picture always gives the same bytes.
 script:  a text becomes a zero-terminated array of characters.
 
 Needs nothing but Python itself.
