@@ -3,8 +3,9 @@
 import json
 import os
 import socket
+from contextlib import contextmanager
 from pathlib import Path
-from typing import Any, Sequence
+from typing import Any, Iterator, Sequence
 
 from .errors import HandsetError, HandsetTimeout
 from .waiting import scaled
@@ -15,6 +16,16 @@ ANSWER_SECONDS = 30.0
 
 class Refused(HandsetError):
     """The handset's init answered that it cannot."""
+
+
+@contextmanager
+def socket_address(path: Path) -> Iterator[str]:
+    """An address for the socket PATH that fits a socket address, however long the path is."""
+    directory = os.open(path.parent, os.O_PATH | os.O_DIRECTORY | os.O_CLOEXEC)
+    try:
+        yield f"/proc/self/fd/{directory}/{path.name}"
+    finally:
+        os.close(directory)
 
 
 class Client:
@@ -50,7 +61,8 @@ class Client:
         with socket.socket(socket.AF_UNIX, socket.SOCK_SEQPACKET) as connection:
             connection.settimeout(scaled(timeout))
             try:
-                connection.connect(str(self.path))
+                with socket_address(self.path) as address:
+                    connection.connect(address)
                 message = json.dumps({"op": operation, **request}).encode()
                 socket.send_fds(connection, [message], given)
                 data, fds, _, _ = socket.recv_fds(connection, MESSAGE_SIZE, 1,

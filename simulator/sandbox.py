@@ -10,6 +10,7 @@ import time
 from pathlib import Path
 from typing import Mapping
 
+from .client import socket_address
 from .errors import HandsetError
 from .program import DAEMON_COPY, INSIDE, MODULE_DIRECTORY
 from .root import DEVICE_FILES, PROC_DRIVER, ROOT, STATE
@@ -25,6 +26,8 @@ POWERED_OFF = 128 + signal.SIGINT
 
 NO_BUBBLEWRAP = ("bubblewrap is not installed; it is the sandbox of the handset: "
                  "apt-get install bubblewrap")
+# What bubblewrap says when the system refuses it the namespaces or what belongs to them.
+NAMESPACE_SIGNS = ("namespace", "uid map", "Can't mount proc", "Failed to mount")
 NO_NAMESPACES = ("this system does not let {who} make user namespaces, which the handset lives in; "
                  "allow them (sysctl user.max_user_namespaces, kernel.unprivileged_userns_clone=1, "
                  "kernel.apparmor_restrict_unprivileged_userns=0), or, in a container, start it "
@@ -69,7 +72,8 @@ class Sandbox:
         ready_read, ready_write = os.pipe()
         with socket.socket(socket.AF_UNIX, socket.SOCK_SEQPACKET) as listener:
             # It listens before the handset's init exists: nobody who asks comes too early.
-            listener.bind(str(directory / "control"))
+            with socket_address(directory / "control") as address:
+                listener.bind(address)
             listener.listen(64)
             with open(self._messages, "wb") as messages:
                 self._process = subprocess.Popen(
@@ -94,7 +98,7 @@ class Sandbox:
 
     def _why(self) -> str:
         text = self._messages.read_text("utf-8", "replace").strip()
-        if "namespace" in text or "uid map" in text:
+        if any(sign in text for sign in NAMESPACE_SIGNS):
             who = "root" if os.getuid() == 0 else "an ordinary user"
             return f"{NO_NAMESPACES.format(who=who)} (bubblewrap says: {text.splitlines()[-1]})"
         return f"the handset did not come up: {text.splitlines()[-1] if text else 'no message'}"

@@ -151,6 +151,7 @@ def test_bad_options_are_told(options: dict, text: str) -> None:
     ("bwrap: No permissions to create a new namespace, likely because the kernel does not allow "
      "non-privileged user namespaces.", "does not let .* make user namespaces"),
     ("bwrap: setting up uid map: Permission denied", "does not let .* make user namespaces"),
+    ("bwrap: Can't mount proc on /newroot/proc: Operation not permitted", "in a container"),
     ("bwrap: Can't find source path /x: No such file or directory", "Can't find source path /x"),
 ])
 def test_a_system_without_namespaces_is_told(make_fake, tmp_path: Path, message: str, text: str,
@@ -163,6 +164,13 @@ def test_a_system_without_namespaces_is_told(make_fake, tmp_path: Path, message:
     with pytest.raises(HandsetError, match=text) as caught:
         make_fake()
     assert "\n" not in str(caught.value)
+
+
+def test_a_long_way_to_the_directory(make_fake, tmp_path: Path,
+                                     monkeypatch: pytest.MonkeyPatch) -> None:
+    """The directory may lie deeper than a socket's address is long."""
+    monkeypatch.setenv("HANDSET_BASE", str(tmp_path / ("deep/" * 30)))
+    assert make_fake().pid
 
 
 def test_a_missing_bubblewrap_is_told(make_fake, tmp_path: Path,
