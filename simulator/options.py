@@ -93,7 +93,7 @@ def environment(options: Options, program: programs.Program) -> dict[str, str]:
     return {**env, **options.env}
 
 
-def _specification(options: Options, program: programs.Program) -> dict[str, Any]:
+def _orders(options: Options, program: programs.Program) -> dict[str, Any]:
     """What init is told."""
     kind = options.kind
     service = service_entry(kind.service)
@@ -133,4 +133,4 @@ def furnish(directory: Path, options: Options, program: programs.Program) -> Non
     for inside, content in options.files.items():
         root.place(directory, inside, content)
     root.place(directory, "/handset/init.json",
-               json.dumps(_specification(options, program), indent=1))
+               json.dumps(_orders(options, program), indent=1))

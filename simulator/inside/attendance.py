@@ -1,7 +1,7 @@
 """Who is at the far end of each tty: the modem, a relay to a port of the PC, or nobody."""
 
 from .lines import Line, NoLine
-from .modem import Modem, Session
+from .modem import Modem, Conversation
 from .relay import PortRelay
 
 MODEM_LINES = ("modem", "mux")
@@ -11,12 +11,12 @@ MODES = ("table", "silent", "held", "absent")
 class Answerer:
     """Hears one tty for the modem and says its answers."""
 
-    def __init__(self, session: Session, line: Line) -> None:
-        self._session = session
+    def __init__(self, conversation: Conversation, line: Line) -> None:
+        self._conversation = conversation
         self._line = line
 
     def __call__(self, data: bytes) -> None:
-        said = self._session.feed(data)
+        said = self._conversation.feed(data)
         if said:
             self._line.send(said)
 
@@ -59,7 +59,7 @@ class Attendance:
         if mode == "silent":
             line.listen(lambda data: None)
         elif mode == "table":
-            line.listen(Answerer(Session(self.modem), line))
+            line.listen(Answerer(Conversation(self.modem), line))
         elif relay:
             line.listen(relay.send)
             relay.listen(lambda data: self._from_port(line, data))

@@ -155,7 +155,7 @@ def encode_block(response: int, fields: list[table.Field]) -> bytes:
     return b"".join(parts)
 
 
-class Session:
+class Conversation:
     """One tty of the modem: finds command lines and packets in what arrives."""
 
     def __init__(self, modem: Modem) -> None:

@@ -15,7 +15,7 @@ from .modem import Modem
 from .operations import Operations
 from .processes import Launch, Processes, Service
 
-SPECIFICATION = "/handset/init.json"
+ORDERS = "/handset/init.json"
 
 
 def _make_lines(loop: Loop, paths: dict[str, str]) -> dict[str, Line]:
@@ -38,29 +38,29 @@ def main() -> None:
     for number in (signal.SIGINT, signal.SIGTERM, signal.SIGHUP):
         signal.signal(number, signal.SIG_IGN)
     os.set_inheritable(ready_fd, False)
-    with open(SPECIFICATION, encoding="utf-8") as stream:
-        specification = json.load(stream)
+    with open(ORDERS, encoding="utf-8") as stream:
+        orders = json.load(stream)
     mounts.protect_devices()
     loop = Loop()
-    lines = _make_lines(loop, specification["lines"])
-    attendance = Attendance(Modem(specification["modem_answers"]), lines)
-    attendance.set_modem_mode(specification["modem"])
-    if specification["card"] is not None:
-        mounts.insert_card(specification["card"])
+    lines = _make_lines(loop, orders["lines"])
+    attendance = Attendance(Modem(orders["modem_answers"]), lines)
+    attendance.set_modem_mode(orders["modem"])
+    if orders["card"] is not None:
+        mounts.insert_card(orders["card"])
 
     def forget_input() -> None:
         for line in lines.values():
             line.discard_input()
 
     processes = Processes(loop)
-    service = Service(loop, processes, _launch(specification["daemon"]),
-                      specification["restart"], specification["restart_pause"], forget_input)
+    service = Service(loop, processes, _launch(orders["daemon"]),
+                      orders["restart"], orders["restart_pause"], forget_input)
     operations = Operations(loop, processes, service, lines, attendance,
-                            AppLine(specification["lines"]["app"]),
-                            specification["start_on_plug"])
+                            AppLine(orders["lines"]["app"]),
+                            orders["start_on_plug"])
     # The loop holds the server through its callbacks, and runs until the sandbox ends.
     ControlServer(loop, control_fd, operations.table())
-    if specification["start"]:
+    if orders["start"]:
         service.start()
     os.write(ready_fd, b"up\n")
     os.close(ready_fd)

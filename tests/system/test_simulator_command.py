@@ -87,7 +87,7 @@ def wait_for(condition: Callable[[], bool]) -> None:
         time.sleep(0.05)
 
 
-def test_a_session(up, tmp_path: Path) -> None:
+def test_a_whole_visit(up, tmp_path: Path) -> None:
     """A person's way: up, talk, look, steer, down."""
     process = up("--screen", "120x90", "--property", "a.b=c", "--config", "vx.mode.file=/amt/m",
                  "--answer", "ldt_btCtrl=-1", "--answer", "ldt_btCtrl=0", "--card", "2M",

@@ -4,7 +4,7 @@ import pytest
 
 from simulator import Handset
 from simulator.inside import modem_table
-from simulator.inside.modem import Modem, Session
+from simulator.inside.modem import Modem, Conversation
 from station import wire
 
 OK = b"\r\nOK\r\n"
@@ -12,9 +12,9 @@ ERROR = b"\r\nERROR\r\n"
 
 
 @pytest.fixture
-def session() -> Session:
+def tty() -> Conversation:
     """A tty of a fresh modem."""
-    return Session(Modem())
+    return Conversation(Modem())
 
 
 def info(text: str) -> bytes:
@@ -35,35 +35,35 @@ def info(text: str) -> bytes:
     ("AT^NOSUCH", ERROR), ("ATQ9", ERROR), ("hello", b""), ("", b""),
     ("AT^DMSN;^NOSUCH", b"\r\n^DMSN: KEL0000000000001\r\n" + ERROR),
 ])
-def test_commands(session: Session, command: str, answer: bytes) -> None:
+def test_commands(tty: Conversation, command: str, answer: bytes) -> None:
     """Each command has its answer; text that is no command has none."""
-    assert session.feed(command.encode() + b"\r") == answer
+    assert tty.feed(command.encode() + b"\r") == answer
 
 
-def test_every_row_answers(session: Session) -> None:
+def test_every_row_answers(tty: Conversation) -> None:
     """No row of the table is dead: each gives a final result, none plain ERROR."""
     operands = {"^DATOMR=": "1,2", "^DATOMW=": "1,2", "^DCMR=": "18", "^DTTEST=": "07"}
     for row in modem_table.COMMANDS:
         operand = operands.get(row.command, "1") if row.command.endswith("=") else ""
-        answer = session.feed(f"AT{row.command}{operand}\r".encode())
+        answer = tty.feed(f"AT{row.command}{operand}\r".encode())
         assert answer.endswith(OK), (row, answer)
 
 
-def test_what_is_written_is_remembered(session: Session) -> None:
+def test_what_is_written_is_remembered(tty: Conversation) -> None:
     """Identities by channel, results by station."""
     for line in ("AT^DCGSNW=111", 'AT^DMSN="S0"', "AT^DMPCHN=1", "AT^DCGSNW=222",
                  "AT^DATOMW=7,2,it, failed"):
-        assert session.feed(line.encode() + b"\r") == OK
-    assert session.feed(b"AT+CGSN\r") == info("222")
-    assert session.feed(b"AT^DATOMR=1,7\r") == info("^DATOMR: 7,2,it, failed")
-    session.feed(b"AT^DMPCHN=0\r")
-    assert session.feed(b"AT+CGSN;^DMSN\r") == b"\r\n111\r\n\r\n^DMSN: S0\r\n" + OK
+        assert tty.feed(line.encode() + b"\r") == OK
+    assert tty.feed(b"AT+CGSN\r") == info("222")
+    assert tty.feed(b"AT^DATOMR=1,7\r") == info("^DATOMR: 7,2,it, failed")
+    tty.feed(b"AT^DMPCHN=0\r")
+    assert tty.feed(b"AT+CGSN;^DMSN\r") == b"\r\n111\r\n\r\n^DMSN: S0\r\n" + OK
 
 
 def test_ttys_share_one_modem() -> None:
     """What is written on one tty is read on the other; a line may come in pieces."""
     modem = Modem()
-    one, other = Session(modem), Session(modem)
+    one, other = Conversation(modem), Conversation(modem)
     assert one.feed(b"AT^DM") == b""
     assert other.feed(b"AT^DMSN=XY\r") == OK
     assert one.feed(b"SN\rAT\r\n") == info("^DMSN: XY") + OK
@@ -76,15 +76,15 @@ def test_ttys_share_one_modem() -> None:
     ("97", "98" "00000000" "0400" "05060708"), ("63", "64" "00000000" "01"),
     ("DD", "DD" "00000000" "0200" "090A"),
 ])
-def test_the_tunnel(session: Session, request_block: str, answer: str) -> None:
+def test_the_tunnel(tty: Conversation, request_block: str, answer: str) -> None:
     """A block is answered by a block: numbers with their high byte first, lengths with the low."""
-    assert session.feed(f"AT^DTTEST={request_block}\r".encode()) == info(f"^DTTEST: {answer}")
+    assert tty.feed(f"AT^DTTEST={request_block}\r".encode()) == info(f"^DTTEST: {answer}")
 
 
 @pytest.mark.parametrize("operand", ["", "1", "XY", "1A0"])
-def test_a_block_that_is_none(session: Session, operand: str) -> None:
+def test_a_block_that_is_none(tty: Conversation, operand: str) -> None:
     """Something that is not whole hexadecimal bytes is refused."""
-    assert session.feed(f"AT^DTTEST={operand}\r".encode()) == b"\r\n+CME ERROR: 50\r\n"
+    assert tty.feed(f"AT^DTTEST={operand}\r".encode()) == b"\r\n+CME ERROR: 50\r\n"
 
 
 def test_the_tunnel_knows_every_response_with_fields() -> None:
@@ -93,30 +93,30 @@ def test_the_tunnel_knows_every_response_with_fields() -> None:
                                           0x6A, 0x6E, 0x72, 0x98, 0xDD}
 
 
-def answered(session: Session, data: bytes) -> wire.Packet:
+def answered(tty: Conversation, data: bytes) -> wire.Packet:
     """The packet that answers DATA."""
-    return wire.decode_envelope(session.feed(data))
+    return wire.decode_envelope(tty.feed(data))
 
 
-def test_packets(session: Session) -> None:
+def test_packets(tty: Conversation) -> None:
     """A request packet is answered with a packet in its envelope, and identities are kept."""
     request = wire.Packet(5, (wire.Atom.string(21, "868686868686868"),))
-    assert answered(session, wire.encode_envelope(request)) == wire.Packet(
+    assert answered(tty, wire.encode_envelope(request)) == wire.Packet(
         6, (wire.Atom.integer(1, 0),))
-    assert session.feed(b"AT+CGSN\r") == info("868686868686868")
-    assert answered(session, wire.encode_envelope(wire.Packet(7))).find(21) == wire.Atom.raw(
+    assert tty.feed(b"AT+CGSN\r") == info("868686868686868")
+    assert answered(tty, wire.encode_envelope(wire.Packet(7))).find(21) == wire.Atom.raw(
         21, b"868686868686868")
     board = wire.Packet(87, (wire.Atom.string(38, "B1"),))
-    assert answered(session, wire.encode_envelope(board)).command == 88
-    assert session.feed(b"AT^DMSN\r") == info("^DMSN: B1")
-    assert answered(session, wire.encode_envelope(wire.Packet(200))) == wire.Packet(
+    assert answered(tty, wire.encode_envelope(board)).command == 88
+    assert tty.feed(b"AT^DMSN\r") == info("^DMSN: B1")
+    assert answered(tty, wire.encode_envelope(wire.Packet(200))) == wire.Packet(
         201, (wire.Atom.integer(1, 0),))
 
 
-def test_packets_in_pieces_and_between_text(session: Session) -> None:
+def test_packets_in_pieces_and_between_text(tty: Conversation) -> None:
     """A packet may come byte by byte, behind garbage, and before text."""
     data = b"\x00\xff" + wire.encode_envelope(wire.Packet(87)) + b"AT\r"
-    said = b"".join(session.feed(data[i:i + 1]) for i in range(len(data)))
+    said = b"".join(tty.feed(data[i:i + 1]) for i in range(len(data)))
     assert wire.decode_envelope(said[:-len(OK)]).command == 88
     assert said.endswith(OK)
 
@@ -124,10 +124,10 @@ def test_packets_in_pieces_and_between_text(session: Session) -> None:
 def test_an_answer_can_be_replaced() -> None:
     """A whole command line, without regard to case; None gives the table's answer back."""
     modem = Modem({"at^dmsn": "\r\n+CME ERROR: 3\r\n"})
-    session = Session(modem)
-    assert session.feed(b"AT^DMSN\r") == b"\r\n+CME ERROR: 3\r\n"
+    tty = Conversation(modem)
+    assert tty.feed(b"AT^DMSN\r") == b"\r\n+CME ERROR: 3\r\n"
     modem.set_answer("AT^DMSN", None)
-    assert session.feed(b"AT^DMSN\r") == info("^DMSN: KEL0000000000001")
+    assert tty.feed(b"AT^DMSN\r") == info("^DMSN: KEL0000000000001")
 
 
 def test_in_the_handset(make_fake) -> None:

@@ -1,1 +1,1 @@
-"""Helpers that the system tests share."""
+"""What the system tests share."""
