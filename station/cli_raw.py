@@ -12,7 +12,7 @@ from station.errors import Refused, UsageProblem
 from station.exchange import Exchange
 from station.packet import Packet
 from station.render import at_json, columns, exchange_json, item_line, packet_json, packet_lines
-from station.requests import Request, Service
+from station.requests import Channel, Request, Service
 from station.table import REQUESTS, display_name, find_command, operations, requests_by_id
 
 
@@ -80,6 +80,8 @@ def show_exchange(exchange: Exchange) -> None:
 @click.pass_obj
 def at(settings: Settings, text: str, force: bool) -> None:
     """Send an AT text on the PC line and show its reply; the line end is added."""
+    if settings.chosen_channel is not Channel.PC:
+        raise UsageProblem("AT text is understood on the PC line only")
     why = known_refusal(text)
     if why and not force:
         raise UsageProblem(f"the handset is known to refuse {text}: {why}; it would keep the "

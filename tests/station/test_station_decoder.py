@@ -68,6 +68,14 @@ def test_every_single_byte_split_gives_the_same() -> None:
         "('Frame', '')", "('Text', '')"]
 
 
+@pytest.mark.parametrize("text", ["ê ", "\u20aa\u00bb!", "\U0001f4aa."])
+def test_a_character_that_looks_like_the_beginning_of_a_frame(text: str) -> None:
+    stream = text.encode()
+    for place in range(len(stream)):
+        assert merged(decode(EnvelopeDecoder(), cut(stream, [place]))) == [
+            ("('Text', '')", stream)]
+
+
 @given(st.lists(chunks, max_size=8), st.lists(st.integers(0, 400), max_size=12))
 def test_items_do_not_depend_on_the_pieces(parts: list[bytes], places: list[int]) -> None:
     stream = b"".join(parts)
