@@ -1,5 +1,7 @@
 #include "amt/amt-handle/channel/at-exchange.h"
 
+#include <algorithm>
+
 #include <gtest/gtest.h>
 
 #include "pub/error.h"
@@ -40,6 +42,15 @@ struct value_row_st
     int m_status;
     const char *m_value_ptr;
 };
+
+/* Line ends are shown as dots. */
+void PrintTo(const value_row_st &row, std::ostream *out)
+{
+    std::string text = row.m_received_ptr;
+    std::replace_if(
+        text.begin(), text.end(), [](char c) { return c < ' '; }, '.');
+    *out << text;
+}
 
 class at_value : public testing::TestWithParam<value_row_st> {};
 

@@ -81,11 +81,31 @@ std::vector<std::string> packets(const std::string &packet)
     return packet.empty() ? std::vector<std::string>() : std::vector<std::string>{packet};
 }
 
-class modem_kind : public testing::TestWithParam<size_t> {
+/* A row of g_kinds, shown by its name. */
+struct kind_row_st
+{
+    size_t m_index;
+};
+
+void PrintTo(const kind_row_st &row, std::ostream *out)
+{
+    *out << g_kinds[row.m_index].m_name_ptr;
+}
+
+std::vector<kind_row_st> all_rows()
+{
+    std::vector<kind_row_st> rows;
+    for (size_t i = 0; i < g_kinds.size(); i++) {
+        rows.push_back({i});
+    }
+    return rows;
+}
+
+class modem_kind : public testing::TestWithParam<kind_row_st> {
 protected:
     const kind_st &kind() const
     {
-        return g_kinds[GetParam()];
+        return g_kinds[GetParam().m_index];
     }
 
     /* Handles the request with the queued answer and expects this end of it. */
@@ -269,9 +289,9 @@ TEST_P(modem_kind, tells_when_its_answer_cannot_be_sent)
     EXPECT_EQ(line.handle(kind().m_handler, kind().m_request), PUB_ERR_FAIL);
 }
 
-INSTANTIATE_TEST_SUITE_P(handlers, modem_kind, testing::Range<size_t>(0, g_kinds.size()),
-                         [](const testing::TestParamInfo<size_t> &param) {
-                             return std::string(g_kinds[param.param].m_name_ptr);
+INSTANTIATE_TEST_SUITE_P(handlers, modem_kind, testing::ValuesIn(all_rows()),
+                         [](const testing::TestParamInfo<kind_row_st> &param) {
+                             return std::string(g_kinds[param.param.m_index].m_name_ptr);
                          });
 
 } // namespace

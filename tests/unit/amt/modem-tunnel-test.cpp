@@ -142,6 +142,11 @@ struct length_row_st
     int m_status;
 };
 
+void PrintTo(const length_row_st &row, std::ostream *out)
+{
+    *out << row.m_answer_ptr;
+}
+
 class tunnel_length : public testing::TestWithParam<length_row_st> {};
 
 TEST_P(tunnel_length, that_cannot_be_is_refused)

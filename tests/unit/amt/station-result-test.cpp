@@ -16,6 +16,11 @@ struct row_st
     const char *m_description_ptr;
 };
 
+void PrintTo(const row_st &row, std::ostream *out)
+{
+    *out << "line " << row.m_line_ptr;
+}
+
 class station_result : public testing::TestWithParam<row_st> {};
 
 TEST_P(station_result, is_parsed)

@@ -45,6 +45,11 @@ struct module_row_st
     const char *m_name_ptr;
 };
 
+void PrintTo(const module_row_st &row, std::ostream *out)
+{
+    *out << row.m_name_ptr;
+}
+
 class fixed_version : public testing::TestWithParam<module_row_st> {};
 
 TEST_P(fixed_version, is_answered_to_the_app)
@@ -156,6 +161,11 @@ struct value_row_st
     const char *m_value_ptr;
     std::string m_version;
 };
+
+void PrintTo(const value_row_st &row, std::ostream *out)
+{
+    *out << row.m_value_ptr;
+}
 
 class modem_version : public testing::TestWithParam<value_row_st> {};
 
