@@ -2,8 +2,6 @@
 
 #include <stdint.h>
 
-#include "amt/amt-buf.h"
-
 /* Room for the version that the modem gives for one of its modules, in bytes. */
 constexpr uint32_t AMT_MODEM_VERSION_SIZE = 410;
 
