@@ -1,0 +1,394 @@
+"""AT commands of the PC line that the daemon answers itself, the identity files' apart."""
+
+import re
+import time
+
+import pytest
+
+from conftest import HandsetFactory
+from simulator import Handset
+from simulator.waiting import scaled
+from support.channels import PcChannel, integer, packet
+from support.trace import Trace, error_line
+
+OK = "\r\nOK\r\n"
+ERROR = "\r\nERROR\r\n"
+CME = "\r\n+CME ERROR: 100\r\n"
+PERMISSION = "/amt/power_usb_amt.txt"
+EMMC = "/sys/devinfo/emmc_info"
+BOARD = "/sys/sarvo/board_info"
+
+
+def value(name: str, text: str) -> str:
+    """The reply that shows a value."""
+    return f"\r\n^{name}: {text}\r\n{OK}"
+
+
+def refused(pc: PcChannel, command: str) -> None:
+    """A command without its operands: an error packet, and no AT text. Nothing stays held."""
+    pc.send(command.encode() + b"\r")
+    assert pc.read_packet() == packet(0, integer(1, 1)), command
+    pc.at("AT^DBTADDR=?", OK)
+
+
+# software version and eMMC
+
+
+def test_software_version(pc: PcChannel) -> None:
+    trace = Trace(pc.handset)
+    text = "(KEL-1_4.2.1)(F01)(KEL board rev C\n)(HW8G-0031 7456 MiB rev 5)(Freenet)"
+    pc.at("AT^DSVER", value("DSVER", text))
+    trace.expect("get_ap_sw_version()", "getted sw-module: " + text.replace("\n", "\\n"))
+
+    pc.handset.set_property("ro.build.display.id", None)
+    pc.handset.set_property("ro.build.factory.id", None)
+    pc.at("AT^DSVER", value("DSVER", "( )( )(KEL board rev C\n)(HW8G-0031 7456 MiB rev 5)"
+                            "(Freenet)"))
+
+
+def test_software_version_of_254_characters(pc: PcChannel) -> None:
+    # Two fields as long as a property may be, and the board's: more than fits.
+    pc.handset.set_property("ro.build.display.id", "d" * 91)
+    pc.handset.set_property("ro.build.factory.id", "f" * 91)
+    pc.handset.place(BOARD, "b" * 91 + "\n")
+    text = f"({'d' * 91})({'f' * 91})({'b' * 91}"[:254]
+    pc.at("AT^DSVER", value("DSVER", text))
+
+
+def test_software_version_needs_the_board(pc: PcChannel) -> None:
+    pc.handset.place(BOARD, None)
+    trace = Trace(pc.handset)
+    pc.at("AT^DSVER", CME)
+    trace.expect("get_ap_sw_version()", error_line("amt_read_data_from_file", -118, 2))
+
+
+def test_emmc_information(pc: PcChannel) -> None:
+    trace = Trace(pc.handset)
+    pc.at("AT^DEMMCINFO?", value("DEMMCINFO", '"HW8G-0031 7456 MiB rev 5"'))
+    trace.expect("amt_read_emmc_info()", "emmc_info_len: 25")
+    pc.handset.place(EMMC, "x" * 80 + "\n")
+    pc.at("AT^DEMMCINFO?", value("DEMMCINFO", f'"{"x" * 47}"'))
+    pc.handset.place(EMMC, "")
+    trace = Trace(pc.handset)
+    pc.at("AT^DEMMCINFO?", CME)
+    trace.expect(error_line("amt_read_emmc_info", -100), "read fail")
+    pc.handset.place(EMMC, None)
+    trace = Trace(pc.handset)
+    pc.at("AT^DEMMCINFO?", CME)
+    trace.expect(error_line("amt_read_emmc_info", -100, 2), f"open {EMMC} fail")
+
+
+# connectivity, Bluetooth
+
+
+@pytest.mark.parametrize("number, function", [(0, "ldt_wifiCheck"), (1, "ldt_gpsCheck"),
+                                              (3, "ldt_btCheck")])
+def test_connectivity_check(pc: PcChannel, number: int, function: str) -> None:
+    pc.handset.answer(function, "0", "-3", "1")
+    trace = Trace(pc.handset)
+    for answer in (OK, ERROR, ERROR):
+        pc.at(f"AT^DDEVCONNCHK={number}", answer)
+    assert trace.calls() == [f"{function}() = {code}" for code in (0, -3, 1)]
+
+
+def test_connectivity_check_of_nothing(pc: PcChannel) -> None:
+    trace = Trace(pc.handset)
+    for operand in ("2", "4", "-1", "255", "", " ", "7,0"):
+        pc.at(f"AT^DDEVCONNCHK={operand}", ERROR)
+    assert trace.calls() == []
+
+
+def test_operand_forms(pc: PcChannel) -> None:
+    trace = Trace(pc.handset)
+    for operand in ("   3", "3x", "03", "+3", "3,9"):
+        pc.at(f"AT^DDEVCONNCHK={operand}", OK)
+    assert trace.calls() == ["ldt_btCheck() = 0"] * 5
+    # Not at the line's start, in the middle of other text.
+    pc.at("xyzAT^DDEVCONNCHK=3", OK)
+    # The parameter ends at the request's first line end, which stands before the command here.
+    pc.send(b"\rAT^DDEVCONNCHK=3\r")
+    assert pc.line.read_exactly(len(ERROR)) == ERROR.encode()
+
+
+def test_bluetooth_control(pc: PcChannel) -> None:
+    pc.handset.answer("ldt_btCtrl", "0", "0", "-1", "5")
+    trace = Trace(pc.handset)
+    for operand, answer in (("1", OK), ("0", OK), ("1", ERROR), ("0", ERROR)):
+        pc.at(f"AT^DBTCTRL={operand}", answer)
+    assert trace.calls() == ["ldt_btCtrl(1) = 0", "ldt_btCtrl(0) = 0", "ldt_btCtrl(1) = -1",
+                             "ldt_btCtrl(0) = 5"]
+    trace = Trace(pc.handset)
+    for operand in ("2", "-1", "", "10"):
+        pc.at(f"AT^DBTCTRL={operand}", ERROR)
+    assert trace.calls() == []
+
+
+# GPS
+
+
+def test_gps_stop(pc: PcChannel) -> None:
+    pc.handset.answer("ldt_gpsCtrl", "0", "-7")
+    trace = Trace(pc.handset)
+    pc.at("AT^DGPSCTRL=0", OK)
+    pc.at("AT^DGPSCTRL=0,4", ERROR)
+    assert trace.calls() == ["ldt_gpsCtrl(0, 0, null, null) = 0",
+                             "ldt_gpsCtrl(0, 0, null, null) = -7"]
+
+
+def test_gps_signal(pc: PcChannel) -> None:
+    pc.handset.answer("ldt_gpsCtrl", "0", "0 17 -23")
+    trace = Trace(pc.handset)
+    pc.at("AT^DGPSCTRL=2,5", value("DGPSCTRL", "17,-23"))
+    assert trace.calls() == ["ldt_gpsCtrl(1, 0, null, null) = 0",
+                             "ldt_gpsCtrl(2, 5, out, out) = 0 [17 -23]"]
+
+
+def test_gps_failures(pc: PcChannel) -> None:
+    pc.handset.answer("ldt_gpsCtrl", "-1")
+    trace = Trace(pc.handset)
+    pc.at("AT^DGPSCTRL=2,5", ERROR)
+    assert trace.calls() == ["ldt_gpsCtrl(1, 0, null, null) = -1"]
+
+    pc.handset.answer("ldt_gpsCtrl", "0", "-1 3 4")
+    trace = Trace(pc.handset)
+    pc.at("AT^DGPSCTRL=2,5", ERROR)
+    assert trace.calls()[1:] == ["ldt_gpsCtrl(2, 5, out, out) = -1 [3 4]"]
+
+    trace = Trace(pc.handset)
+    pc.handset.answer("ldt_gpsCtrl")
+    pc.at("AT^DGPSCTRL=2", ERROR)
+    trace.expect(error_line("amt_at_control_gps", -101), "index is null!!!")
+    assert trace.calls() == ["ldt_gpsCtrl(1, 0, null, null) = 0"]
+
+    trace = Trace(pc.handset)
+    for operands in ("1", "3", "-2", "1,2"):
+        pc.at(f"AT^DGPSCTRL={operands}", ERROR)
+    assert trace.calls() == []
+
+
+# Wi-Fi transmission and reception
+
+
+def test_wifi_transmission(pc: PcChannel) -> None:
+    trace = Trace(pc.handset)
+    pc.at("AT^DWLTSD=1,6,540,15", OK)
+    pc.at("AT^DWLTSD=0", OK)
+    assert trace.calls() == ["ldt_wifiCtrl(1) = 0", "ldt_TxTest(1, 15, 540, 6) = 0",
+                             "ldt_TxTest(0, 0, 0, 0) = 0", "ldt_wifiCtrl(0) = 0"]
+    trace.expect("WIFI-TX-start start. channel:6; power:15; rate:540(will multi 100)")
+
+
+def test_wifi_transmission_takes_the_low_bits(pc: PcChannel) -> None:
+    trace = Trace(pc.handset)
+    pc.at("AT^DWLTSD=1,262,65537,40000", OK)
+    pc.at("AT^DWLTSD=1,-1,-1,-1", OK)
+    assert trace.calls() == ["ldt_wifiCtrl(1) = 0", "ldt_TxTest(1, -25536, 1, 6) = 0",
+                             "ldt_wifiCtrl(1) = 0", "ldt_TxTest(1, -1, 65535, 255) = 0"]
+    trace.expect("WIFI-TX-start start. channel:6; power:-25536; rate:1(will multi 100)",
+                 "WIFI-TX-start start. channel:255; power:-1; rate:65535(will multi 100)")
+
+
+@pytest.mark.parametrize("switch, test, operands, calls", [
+    ("-1", "0", "1,6,540,15", ["ldt_wifiCtrl(1) = -1"]),
+    ("0", "-2", "1,6,540,15", ["ldt_wifiCtrl(1) = 0", "ldt_TxTest(1, 15, 540, 6) = -2"]),
+    ("0", "4", "0", ["ldt_TxTest(0, 0, 0, 0) = 4", "ldt_wifiCtrl(0) = 0"]),
+    ("6", "0", "0", ["ldt_TxTest(0, 0, 0, 0) = 0", "ldt_wifiCtrl(0) = 6"]),
+    ("0", "0", "2", []), ("0", "0", "-1,6,540,15", []), ("0", "0", "10", [])])
+def test_wifi_transmission_failures(make_handset: HandsetFactory, switch: str, test: str,
+                                    operands: str, calls: list[str]) -> None:
+    handset = make_handset("pc", answers={"ldt_wifiCtrl": switch, "ldt_TxTest": test})
+    trace = Trace(handset)
+    PcChannel(handset).at(f"AT^DWLTSD={operands}", ERROR)
+    assert trace.calls() == calls
+
+
+def test_wifi_transmission_without_an_operand(pc: PcChannel) -> None:
+    for operands, name in (("1", "channel"), ("1,6", "rate"), ("1,6,540", "power"),
+                           ("1,,6,540", "power")):
+        trace = Trace(pc.handset)
+        pc.at(f"AT^DWLTSD={operands}", ERROR)
+        trace.expect(error_line("handle_amt_device_wifi_tx_ctrl", -101), f"{name} is null!!!")
+        assert trace.calls() == ["ldt_wifiCtrl(1) = 0"]
+
+
+def test_wifi_reception(pc: PcChannel) -> None:
+    pc.handset.answer("ldt_RxTest", "0", "0 0", "-1", "0 12", "0", "0 4711", "0 5")
+    trace = Trace(pc.handset)
+    pc.at("AT^DWLTRD=0", OK)             # nothing was started: channel 0
+    pc.at("AT^DWLTRD=1,11,20", OK)
+    pc.at("AT^DWLTRD=1,3,20", ERROR)     # what is not started is not remembered
+    pc.at("AT^DWLTRD=0", OK)
+    pc.at("AT^DWLTRD=1,267,65556", OK)   # 11 and 20 in their low bits
+    pc.at("AT^DWLTRD=0", OK)
+    pc.at("AT^DWLTRD=0", OK)
+    start, stop = "ldt_wifiCtrl(1) = 0", "ldt_wifiCtrl(0) = 0"
+    assert trace.calls() == [
+        "ldt_RxTest(0, 0, 0, out) = 0 [1000]", stop,
+        start, "ldt_RxTest(1, 11, 20, null) = 0",
+        start, "ldt_RxTest(1, 3, 20, null) = -1",
+        "ldt_RxTest(0, 11, 0, out) = 0 [12]", stop,
+        start, "ldt_RxTest(1, 11, 20, null) = 0",
+        "ldt_RxTest(0, 11, 0, out) = 0 [4711]", stop,
+        "ldt_RxTest(0, 11, 0, out) = 0 [5]", stop]
+    trace.expect("WIFI-RX-stop end. return:0; cnt:1000.", "WIFI-RX-stop end. return:0; cnt:12.",
+                 "WIFI-RX-stop end. return:0; cnt:4711.")
+
+
+def test_wifi_reception_failures(pc: PcChannel) -> None:
+    pc.handset.answer("ldt_wifiCtrl", "-1", "0", "-9")
+    pc.handset.answer("ldt_RxTest", "-2", "0")
+    trace = Trace(pc.handset)
+    pc.at("AT^DWLTRD=1,6,20", ERROR)
+    pc.at("AT^DWLTRD=0", ERROR)
+    pc.at("AT^DWLTRD=0", ERROR)
+    pc.at("AT^DWLTRD=7", ERROR)
+    assert trace.calls() == [
+        "ldt_wifiCtrl(1) = -1",
+        "ldt_RxTest(0, 0, 0, out) = -2 [0]", "ldt_wifiCtrl(0) = 0",
+        "ldt_RxTest(0, 0, 0, out) = 0 [1000]", "ldt_wifiCtrl(0) = -9"]
+    pc.handset.answer("ldt_wifiCtrl")
+    for operands, name in (("1", "channel"), ("1,6", "rate")):
+        trace = Trace(pc.handset)
+        pc.at(f"AT^DWLTRD={operands}", ERROR)
+        trace.expect(error_line("handle_amt_device_wifi_rx_ctrl", -101), f"{name} is null!!!")
+        assert trace.calls() == ["ldt_wifiCtrl(1) = 0"]
+
+
+# commands without their first operand
+
+
+def test_missing_operands_are_refused_with_a_packet(pc: PcChannel) -> None:
+    for command, func, text in (
+            ("AT^DGPSCTRL=", "amt_at_control_gps", "flag is null!!!"),
+            ("AT^DWLTSD=", "handle_amt_device_wifi_tx_ctrl", "control is null!!!"),
+            ("AT^DWLTRD=", "handle_amt_device_wifi_rx_ctrl", "control is null!!!"),
+            ("AT^DAMT1=", "amt_at_control_permission", "type is null!!!"),
+            ("AT^DPCBACTRL=,", "amt_at_control_pcba", "type is null!!!")):
+        trace = Trace(pc.handset)
+        refused(pc, command)
+        trace.expect(error_line(func, -101), text, "handle_amt_imei_and_sn--->req_id_en:255.")
+        assert trace.calls() == []
+
+
+# the switch for starts by cable
+
+
+def test_start_permission(pc: PcChannel) -> None:
+    for digit in ("0", "1"):
+        trace = Trace(pc.handset)
+        pc.at(f"AT^DAMT1={digit}", OK)
+        assert pc.handset.text(PERMISSION) == digit
+        assert trace.calls() == ["sync() = 0", "sync() = 0"]
+        trace.expect(f"Writed to file({PERMISSION}) success.flag: {digit}.")
+        trace = Trace(pc.handset)
+        pc.at("AT^DAMT1=2", value("DAMT1", digit))
+        assert trace.calls() == []
+
+
+def test_start_permission_reads_any_number(pc: PcChannel) -> None:
+    for content, shown in ((None, "1"), ("7\n", "7"), ("-3", "-3"), ("text\n", "0"), ("", "1")):
+        pc.handset.place(PERMISSION, content)
+        pc.at("AT^DAMT1=2", value("DAMT1", shown))
+
+
+def test_start_permission_failures(pc: PcChannel) -> None:
+    trace = Trace(pc.handset)
+    for operation, shown in (("3", "3"), ("-1", "4294967295"), ("10", "10")):
+        pc.at(f"AT^DAMT1={operation}", ERROR)
+        trace.expect(error_line("handle_amt_damt1_operation", -101),
+                     f"unknown operation type: {shown}")
+    assert trace.calls() == []
+
+    pc.handset.path(PERMISSION).mkdir()
+    trace = Trace(pc.handset)
+    pc.at("AT^DAMT1=1", ERROR)
+    trace.expect(error_line("amt_write_content_to_file_sync", -118, 21),
+                 f'open("{PERMISSION}") fail: 21 - Is a directory',
+                 error_line("handle_amt_damt1_operation", -100, 21),
+                 "write error to do-not-permit-handshake file.")
+    pc.handset.path(PERMISSION).rmdir()
+    pc.handset.path(PERMISSION).symlink_to("/dev/full")
+    trace = Trace(pc.handset)
+    pc.at("AT^DAMT1=0", ERROR)
+    trace.expect(error_line("amt_write_content_to_file_sync", -118, 28),
+                 "fputs fail: 28 - No space left on device",
+                 "write error to do-not-permit-handshake file.")
+
+
+# test HAL
+
+
+def test_idle_and_boot_download(pc: PcChannel) -> None:
+    pc.handset.answer("enter_idle", "0", "-4", "3")
+    pc.handset.answer("amt_check_system_sanity", "0", "1", "-5")
+    trace = Trace(pc.handset)
+    for answer in (OK, ERROR, ERROR):
+        pc.at("AT^DENTERIDLE", answer)
+    for verdict in ("0", "1", "-5"):
+        pc.at("AT^DBOOTDLFIN", value("DBOOTDLFIN", verdict))
+    # Neither needs its line end to be recognised.
+    pc.send(b"AT^DBOOTDLFIN")
+    wanted = value("DBOOTDLFIN", "-5").encode()
+    assert pc.line.read_exactly(len(wanted)) == wanted
+    assert trace.calls() == [
+        "enter_idle() = 0", "enter_idle() = -4", "enter_idle() = 3",
+        "amt_check_system_sanity() = 0", "amt_check_system_sanity() = 1",
+        *["amt_check_system_sanity() = -5"] * 2]
+
+
+def test_without_the_test_hal(make_handset: HandsetFactory) -> None:
+    handset = make_handset("pc", files={"/system/lib/hw/amt.tq5530.misc.so": "no library\n"})
+    pc = PcChannel(handset)
+    pc.at("AT^DENTERIDLE", ERROR)
+    pc.at("AT^DBOOTDLFIN", ERROR)
+    trace = Trace(handset)
+    pc.at("AT", OK)
+    handset.log.wait("call amt_usb_charge_ctrl for amt4.")
+    trace.expect("call amt_usb_charge_ctrl for amt4. return:-118, current amt mode:4.")
+
+
+# power
+
+
+def test_power_off_ends_the_handset(pc: PcChannel) -> None:
+    begun = time.monotonic()
+    pc.at("AT^DAMTOFF", OK)
+    pc.handset.wait_power_off()
+    # The answer has two seconds to arrive.
+    assert 1.9 <= time.monotonic() - begun < scaled(4.0)
+
+
+# which command is meant
+
+
+def test_commands_are_found_in_their_order(pc: PcChannel) -> None:
+    # Two in one request: the one that is looked for first, wherever it stands, and only that.
+    trace = Trace(pc.handset)
+    pc.send(b"AT^DBTCTRL=1\rAT^DDEVCONNCHK=3\r")
+    assert pc.line.read_exactly(len(ERROR)) == ERROR.encode()  # its operand is cut at the first CR
+    pc.send(b"AT^DAMT1=2\rAT^DWLTSD=0\r")
+    assert pc.line.read_exactly(len(OK)) == OK.encode()
+    assert trace.calls() == ["ldt_TxTest(0, 0, 0, 0) = 0", "ldt_wifiCtrl(0) = 0"]
+    pc.expect_silence(0.1)
+
+
+def test_texts_that_are_not_quite_commands(pc: PcChannel) -> None:
+    pc.handset.modem.open()
+    trace = Trace(pc.handset)
+    for text in (b"AT^DSVER?\r", b"AT^DSVER", b"AT^DSVER\n", b"at^dsver\r", b"AT^DEMMCINFO?\n",
+                 b"AT^DBTADDR?", b"AT^DBTADDR=12\r", b"AT^DBTCTRL\r", b"AT^DAMTOFF",
+                 b"AT^DAMTOFF?\r", b"AT ^DSVER\r", b"AT^dENTERIDLE\r", b"ATI\r", b"\r\nOK\r\n",
+                 b"\0AT^DENTERIDLE\r"):
+        pc.send(text)
+        assert pc.handset.modem.read_exactly(len(text)) == text
+    pc.expect_silence(0.1)
+    assert trace.calls() == []
+
+
+def test_replies_are_logged(pc_handset: Handset) -> None:
+    pc = PcChannel(pc_handset)
+    trace = Trace(pc_handset)
+    pc.at("AT^DENTERIDLE", OK)
+    pc_handset.log.wait(re.compile(r"send PC rsp data: : \(data_len = 6\) -- 0D0A4F4B0D0A$"))
+    trace.expect("handle_amt_imei_and_sn--->req_id_en:255.",
+                 "send PC rsp data: : (data_len = 6) -- 0D0A4F4B0D0A")
