@@ -7,8 +7,8 @@ import subprocess
 from typing import Iterator
 
 import pytest
-from hypothesis import configuration, settings
-from station_peer import ROOT, Peer, Run, station_command, station_environment
+from hypothesis import HealthCheck, configuration, settings
+from station_peer import PATIENCE, ROOT, Peer, Run, station_command, station_environment
 
 from station.decoder import BareDecoder, EnvelopeDecoder
 from station.link import Link
@@ -17,6 +17,7 @@ from station.requests import Channel
 
 # New examples at a desk; the same ones every time where a machine judges a change.
 settings.register_profile("station", deadline=None, database=None, print_blob=True,
+                          suppress_health_check=[HealthCheck.too_slow],
                           derandomize=bool(os.environ.get("CI")))
 settings.load_profile("station")
 configuration.set_hypothesis_home_dir(str(ROOT / "build" / "hypothesis"))
@@ -40,15 +41,15 @@ def app_peer() -> Iterator[Peer]:
 
 @pytest.fixture
 def link(peer: Peer) -> Iterator[Link]:
-    """A link to the handset on the PC line, given little time."""
-    with Link(FdPort(peer.slave), timeout=2.0) as line:
+    """A link to the handset on the PC line."""
+    with Link(FdPort(peer.slave), timeout=PATIENCE) as line:
         yield line
 
 
 @pytest.fixture
 def app_link(app_peer: Peer) -> Iterator[Link]:
     """A link to the handset on the app channel."""
-    with Link(FdPort(app_peer.slave), Channel.APP, timeout=2.0) as line:
+    with Link(FdPort(app_peer.slave), Channel.APP, timeout=PATIENCE) as line:
         yield line
 
 

@@ -12,7 +12,7 @@ from station.link import Link
 
 OK = "\r\nOK\r\n"
 FLUSH = b"AT^DBTADDR=?\r"
-SHORT = 0.4
+SHORT = 1.0
 
 
 def test_an_at_reply(peer: Peer, link: Link) -> None:

@@ -92,7 +92,7 @@ def test_no_answer(peer: Peer, run_station: Run) -> None:
 
 def test_bad_frame(peer: Peer, run_station: Run) -> None:
     peer.script = sequence([ok(46)[:-1] + b"\0"])
-    result = run_station("-p", peer.path, "--timeout", "0.5", "version", "--module", "app")
+    result = run_station("-p", peer.path, "--timeout", "2", "version", "--module", "app")
     assert (result.returncode, result.stdout) == (6, "")
     assert ONE_LINE.match(result.stderr) and "checksum" in result.stderr
 

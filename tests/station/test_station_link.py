@@ -17,7 +17,7 @@ from station.port import FdPort, SerialPort
 from station.requests import Channel
 
 VERSION = Packet(45, (Atom.integer(19, 16),))
-SHORT = 0.4
+SHORT = 1.0
 
 
 def test_a_request_with_its_acknowledgement_and_answer(peer: Peer, link: Link) -> None:
@@ -145,7 +145,7 @@ def test_an_at_error_beside_a_request_of_the_handset_is_only_stray(peer: Peer,
 
 
 def test_no_answer(peer: Peer, link: Link) -> None:
-    with pytest.raises(NoAnswer, match=r"no answer to AMT_VERSION_CMD within 0\.4 s"):
+    with pytest.raises(NoAnswer, match=r"no answer to AMT_VERSION_CMD within 1 s"):
         link.request(VERSION, SHORT)
 
 
