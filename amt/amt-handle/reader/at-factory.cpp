@@ -16,13 +16,8 @@
 
 namespace {
 
-/* Where the Bluetooth address goes when no handset file holds one yet. */
-constexpr char BT_ADDRESS_FILE[] = "/amt/BT/BT_Address.txt";
-constexpr char PCBA_FILE[] = "/amt/sn-2.txt";
-
 constexpr uint32_t ADDRESS_SIZE = 20; /* 19 characters */
 constexpr uint32_t LINE_SIZE = 100;
-constexpr uint32_t PCBA_SIZE = 30; /* 29 characters */
 
 constexpr int PCBA_READ = 1;
 constexpr int PCBA_WRITE = 2;
@@ -58,13 +53,9 @@ int read_bt_address(char *word)
     return PUB_ERR_NONE;
 }
 
-int write_bt_address(const char *address)
+int put_bt_address(const char *path, const char *address)
 {
-    const char *const known_path = get_bt_addr_file();
-    const char *const path = known_path != nullptr ? known_path : BT_ADDRESS_FILE;
-    char line_a[ADDRESS_SIZE + 1];
-    snprintf(line_a, sizeof(line_a), "%s\n", address);
-    const amt_factory_step_en step = amt_factory_file_write(path, line_a);
+    const amt_factory_step_en step = amt_factory_file_put(path, address, "\n");
     if (step == amt_factory_step_en::DONE) {
         PUB_LOG(g_amt_handle_log, "write BT address: %s", address);
         return PUB_ERR_NONE;
@@ -72,15 +63,26 @@ int write_bt_address(const char *address)
     PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FILE);
     if (step == amt_factory_step_en::OPEN_FAILED) {
         PUB_LOG(g_amt_handle_log, "open(\"%s\") fail: %d - %s", path, errno, strerror(errno));
-    } else {
-        PUB_LOG(g_amt_handle_log, "fputs() fail");
+        return PUB_ERR_FILE;
     }
-    return PUB_ERR_FILE;
+    PUB_LOG(g_amt_handle_log, "fputs() fail");
+    return PUB_ERR_INCOMPLETE;
+}
+
+/* Writes the address to the file that holds one, or to where the first one goes. */
+int write_bt_address(const char *address)
+{
+    const char *const known_path = get_bt_addr_file();
+    const int status = put_bt_address(known_path != nullptr ? known_path : AMT_BT_ADDRESS_FILE, address);
+    if (status != PUB_ERR_FILE) {
+        amt_factory_file_sync();
+    }
+    return status;
 }
 
 int reply_pcba_sn()
 {
-    char sn_a[PCBA_SIZE] = {};
+    char sn_a[AMT_PCBA_SN_SIZE] = {};
     if (amt_read_pcba_sn(sn_a) != PUB_ERR_NONE) {
         PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
         PUB_LOG(g_amt_handle_log, "read error.");
@@ -94,9 +96,9 @@ int write_pcba_sn(const char *sn)
     if (sn == nullptr) {
         return fail_param("amt_at_control_pcba", __LINE__, "pcba-sn is null!!!");
     }
-    char sn_a[PCBA_SIZE];
+    char sn_a[AMT_PCBA_SN_SIZE];
     snprintf(sn_a, sizeof(sn_a), "%s", sn);
-    if (amt_write_pcba_sn(sn_a, PCBA_FILE) != PUB_ERR_NONE) {
+    if (amt_write_pcba_sn(sn_a, AMT_PCBA_SN_FILE) != PUB_ERR_NONE) {
         PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
         PUB_LOG(g_amt_handle_log, "write error.");
         return amt_at_reply_error();
