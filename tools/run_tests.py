@@ -93,6 +93,7 @@ def all_suites() -> list[Suite]:
         suites.append(Suite(f"unit-{preset}", preset, ctest(preset), {}))
         suites.append(Suite(f"system-{preset}", preset, system(preset, SANITIZED_WORKERS),
                             {"HANDSET_TIME_SCALE": SANITIZED_PATIENCE}))
+    suites.append(Suite("fuzz", "fuzz", pytest("tests/fuzz", "-n", "2"), {}))
     return suites
 
 

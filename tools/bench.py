@@ -1,0 +1,138 @@
+"""Measure the daemon beside what its lines cost by themselves: `./dev bench`."""
+
+import argparse
+import json
+import os
+import shutil
+import subprocess
+import sys
+import tempfile
+from pathlib import Path
+from typing import Any
+
+from simulator import Handset
+from station import wire
+
+BUILD = Path("build/release")
+ROUNDS = "4000"
+THROUGHPUT_BYTES = "40000000"
+
+# What is aimed at: the daemon's figure over the bare one's.
+ROUND_TRIP_TARGET = 2.0
+PASS_THROUGH_TARGET = 1.5
+
+Figures = dict[str, Any]
+
+
+def run_link_bench(arguments: list[str], descriptors: tuple[int, ...]) -> Figures:
+    """One measurement of link-bench, which inherits the lines."""
+    ended = subprocess.run([str(BUILD / "bin" / "link-bench"), *arguments], pass_fds=descriptors,
+                           capture_output=True, text=True, check=False)
+    if ended.returncode != 0:
+        sys.exit(f"dev: {ended.stderr.strip()}")
+    return json.loads(ended.stdout)  # type: ignore[no-any-return]
+
+
+def show(what: str, figures: Figures, own: str, bare: str, target: float | None) -> float:
+    """A row: both sides and their ratio. Returns the ratio of the medians."""
+    ours, theirs = figures[own], figures[bare]
+    ratio = ours["median_us"] / theirs["median_us"]
+    tail = ours["p99_us"] / theirs["p99_us"]
+    aim = f"  (target {target:.1f})" if target else ""
+    print(f"  {what:34} {ours['median_us']:8.1f} {ours['p99_us']:9.1f}   "
+          f"{theirs['median_us']:8.1f} {theirs['p99_us']:9.1f}   {ratio:6.2f} {tail:6.2f}{aim}")
+    return ratio
+
+
+def head(title: str, bare: str) -> None:
+    """The head of a table of rows."""
+    print(f"\n{title}\n  {'':34} {'daemon':>8} {'':9}   {bare:>8}\n"
+          f"  {'':34} {'median':>8} {'p99 us':>9}   {'median':>8} {'p99 us':>9}   "
+          f"{'ratio':>6} {'p99':>6}")
+
+
+def bench_round_trips(handset: Handset) -> None:
+    """Request to whole response over the PC line."""
+    head("Round trip on the PC line, against a bare process on a pseudo-terminal", "bare")
+    line = handset.pc.fileno()
+    ok = wire.encode_envelope(wire.Packet(175, (wire.Atom.integer(1, 0),)))
+    for what, request, response in (
+            ("packet (acknowledged, answered)", wire.encode_envelope(wire.Packet(176, ())),
+             wire.ACKNOWLEDGEMENT + ok),
+            ("AT text (AT^DBTADDR=?)", b"AT^DBTADDR=?\r", b"\r\nOK\r\n")):
+        figures = run_link_bench(["round-trip", str(line), request.hex(), response.hex(), ROUNDS],
+                                 (line,))
+        show(what, figures, "daemon", "bare", ROUND_TRIP_TARGET)
+
+
+def bench_pass_through(handset: Handset) -> None:
+    """What the daemon copies between the modem and the PC."""
+    lines = (handset.pc.fileno(), handset.modem.fileno())
+    figures = run_link_bench(["pass-through", *map(str, lines), THROUGHPUT_BYTES, ROUNDS], lines)
+    head("Pass-through of a line of text, against socat between two pseudo-terminals", "socat")
+    show("modem to PC", figures, "daemon", "socat", PASS_THROUGH_TARGET)
+    show("PC to modem", figures["to_modem"], "daemon", "socat", PASS_THROUGH_TARGET)
+    rates = figures["from_modem"]
+    print(f"\n  throughput modem to PC: daemon {rates['daemon_mb_s']:.0f} MB/s, socat "
+          f"{rates['socat_mb_s']:.0f} MB/s, socat over daemon "
+          f"{rates['socat_mb_s'] / rates['daemon_mb_s']:.2f}  (target {PASS_THROUGH_TARGET:.1f})")
+
+
+def bench_exchange() -> None:
+    """A request of the app that the modem answers, against the bare exchange with that modem."""
+    with Handset("packet") as handset:
+        handset.wait_ready()
+        app = handset.app.fileno()
+        request = wire.Packet(7, ()).encode()
+        handset.app.write(request)
+        answer = handset.app.read_until(bytes([0xBB, 8]))[:0] + handset.app.read_all()
+        length = len(answer) + 4
+        with Handset("pc") as other:
+            other.wait_ready()
+            text = b"AT^DTTEST=07\r"
+            line = other.bare_modem()
+            os.write(line, text)
+            bare = len(other.read_bare(line))
+            figures = run_link_bench(["exchange", str(app), request.hex(), str(length), str(line),
+                                      text.hex(), str(bare), "2000"], (app, line))
+    head("Tunnel round trip on the app line, against the bare exchange with the modem", "bare")
+    show("READIMEI through the tunnel", figures, "daemon", "bare", None)
+
+
+def show_size(handset: Handset) -> None:
+    """How small the daemon is."""
+    with tempfile.TemporaryDirectory() as folder:
+        stripped = Path(folder) / "vx-kel-amt"
+        shutil.copy(BUILD / "bin" / "vx-kel-amt", stripped)
+        subprocess.run(["strip", str(stripped)], check=True)
+        size = stripped.stat().st_size
+    print(f"\nSize\n  program, stripped: {size / 1024:.0f} KiB; resident set while serving the PC: "
+          f"{handset.inspect().resident_kib} KiB")
+
+
+def bench_codec() -> None:
+    """The codec by itself."""
+    print("\nCodec", flush=True)
+    subprocess.run([str(BUILD / "bin" / "micro-bench"), "--benchmark_min_time=0.1"], check=True,
+                   stderr=subprocess.DEVNULL)
+
+
+def main() -> int:
+    """Measure everything. The log goes to its file, as in service."""
+    parser = argparse.ArgumentParser(prog="./dev bench", description=__doc__)
+    parser.add_argument("--no-codec", action="store_true", help="only what needs a handset")
+    options = parser.parse_args()
+    if not options.no_codec:
+        bench_codec()
+    with Handset("pc", modem="held") as handset:
+        handset.wait_ready()
+        bench_round_trips(handset)
+        bench_pass_through(handset)
+        show_size(handset)
+    print("\nLeft out, because a described pause is part of them: every write of a factory file"
+          "\n(two pauses of 50 ms), power-off (2 s), the battery ADC (20 ms).")
+    return 0
+
+
+if __name__ == "__main__":
+    sys.exit(main())
