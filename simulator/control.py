@@ -14,6 +14,7 @@ from .line import AppLine, Line
 from .usb import Usb
 from .waiting import scaled, wait_until
 
+STORY_LINES = 8
 RECORD = re.compile(r"^\S+ (?P<what>start|exit) #(?P<number>\d+) pid (?P<pid>\d+): (?P<how>.*)$")
 
 
@@ -148,4 +149,8 @@ class HandsetControl(HandsetFiles):
 
     def story(self) -> str:
         """What a person wants to read when something went wrong."""
-        return "\n".join((self.log.tail(), "init's record:", self.text("/handset/init.txt")))
+        last = {"init's record": self.text("/handset/init.txt"),
+                "standard error": self.stderr().decode("utf-8", "replace")}
+        return "\n".join([self.log.tail(), *(
+            f"{name} ends with:\n" + "\n".join(text.splitlines()[-STORY_LINES:])
+            for name, text in last.items() if text)])

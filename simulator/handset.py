@@ -98,9 +98,9 @@ class Handset(HandsetControl):
         PATH names the kind of start whose lines these are, when it is not the handset's own.
         """
         kind = KINDS[path] if path else self.kind
-        pid = self.pid or wait_until(lambda: self.pid or None, "the daemon to run", timeout)
 
         def attempt() -> bool:
+            pid = self.pid
             texts = [record.text for record in self.log.records() if record.pid == pid]
             return all(any(text in line for line in texts) for text in kind.ready)
 

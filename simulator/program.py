@@ -50,8 +50,8 @@ class Program:
 
     @property
     def has_preload(self) -> bool:
-        """Whether the build has the library that answers device requests."""
-        return self.build is not None and (self.build / "lib" / PRELOAD).exists()
+        """Whether the library that answers device requests comes with it."""
+        return self.build is not None
 
 
 def build_directory(build: "str | Path") -> Path:
@@ -75,6 +75,14 @@ def find_program(build: "str | Path | None", daemon: Path | None) -> Program:
                    directory is not None and COVERAGE in content)
 
 
+def _part(build: Path, place: str, name: str) -> Path:
+    """A file that belongs to the daemon of a build."""
+    path = build / place / name
+    if not path.is_file():
+        raise HandsetError(f"{path} is not there; ./dev build makes all of the build {build.name}")
+    return path
+
+
 def _copy(source: Path, target: Path) -> None:
     target.parent.mkdir(parents=True, exist_ok=True)
     shutil.copy2(source, target)
@@ -88,11 +96,9 @@ def install(directory: Path, program: Program) -> None:
     root = directory / ROOT
     if program.build is not None:
         for name, place in LIBRARIES.items():
-            if (program.build / "lib" / name).exists():
-                _copy(program.build / "lib" / name, root / place / name)
+            _copy(_part(program.build, "lib", name), root / place / name)
         for name in PROGRAMS:
-            if (program.build / "bin" / name).exists():
-                _copy(program.build / "bin" / name, root / "system/bin" / name)
+            _copy(_part(program.build, "bin", name), root / "system/bin" / name)
     for name in MODULES:
         for source in (PROJECT / name).rglob("*.py*"):
             _copy(source, directory / MODULE_DIRECTORY / source.relative_to(PROJECT))

@@ -6,7 +6,7 @@ from pathlib import Path
 
 import pytest
 
-from simulator import Handset, HandsetError
+from simulator import Handset, HandsetError, HandsetTimeout
 
 SHELL = "/bin/sh"
 DEVICE_MODES = {name: os.stat(f"/dev/{name}").st_mode for name in ("null", "zero", "tty")}
@@ -164,6 +164,23 @@ def test_a_system_without_namespaces_is_told(make_fake, tmp_path: Path, message:
     with pytest.raises(HandsetError, match=text) as caught:
         make_fake()
     assert "\n" not in str(caught.value)
+
+
+def test_a_build_that_is_not_whole(tmp_path: Path) -> None:
+    """A build without one of its libraries is refused, not run into the ground."""
+    (tmp_path / "bin").mkdir()
+    (tmp_path / "bin" / "vx-kel-amt").touch()
+    with pytest.raises(HandsetError, match="lib/liblog.so is not there; ./dev build"):
+        Handset(build=tmp_path).up()
+
+
+def test_a_daemon_that_does_not_start_is_told(tmp_path: Path) -> None:
+    """What it printed on standard error is shown when the wait for it is in vain."""
+    daemon = tmp_path / "daemon"
+    daemon.write_text("#!/bin/sh\necho broken >&2\nexit 1\n")
+    with Handset(build=None, daemon=daemon) as handset:
+        with pytest.raises(HandsetTimeout, match=r"(?s)exit #1 .*: status 1.*broken"):
+            handset.wait_ready(timeout=0.3)
 
 
 def test_a_long_way_to_the_directory(make_fake, tmp_path: Path,
