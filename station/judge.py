@@ -36,20 +36,18 @@ def is_answer(request: Packet, packet: Packet, channel: Channel) -> bool:
     return packet.command in answer_ids(request.command) or is_refusal(packet, channel)
 
 
-def served_by_modem(command: int, channel: Channel) -> bool:
-    """Whether the request goes on to the modem, so that the modem's own words come back."""
-    row = requests_by_id().get(command)
-    if row is None:
-        return channel is Channel.PC
-    service = row.service(channel)
-    return service is not None and service.by == "modem"
+def passed_on(request: Packet, channel: Channel) -> bool:
+    """Whether the handset hands the packet to its modem, whose own words then come back.
 
-
-def may_be_text(request: Packet, channel: Channel) -> bool:
-    """Whether an AT error may be the answer: of a modem that does not know the packet."""
+    A modem that does not know the packet may answer with an AT error.
+    """
+    if channel is not Channel.PC:
+        return False
     row = requests_by_id().get(request.command)
-    acknowledged = row is not None and row.pc is not None and row.pc.acknowledged
-    return channel is Channel.PC and not acknowledged
+    service = row.pc if row else None
+    if service is None or service.by == "modem":
+        return True
+    return any(request.get_int(atom) in values for atom, values in service.passes_on.items())
 
 
 def judge(exchange: Exchange) -> None:
@@ -84,8 +82,8 @@ def _held(exchange: Exchange, refusal: Packet) -> Held:
         return Held.NOTHING
     if refusal.command == _TEXT_ANSWER:
         return Held.TEXT
-    command = exchange.request.command
-    if refusal.command in answer_ids(command) and served_by_modem(command, exchange.channel):
+    own = refusal.command in answer_ids(exchange.request.command)
+    if own and passed_on(exchange.request, exchange.channel):
         return Held.UNKNOWN
     return Held.PACKET
 

@@ -117,7 +117,7 @@ class Link:
         if isinstance(item, Frame) and judge.is_answer(request, item.packet, self.channel):
             exchange.answers.append(item.packet)
             return len(exchange.answers) == wanted
-        return (isinstance(item, Text) and judge.may_be_text(request, self.channel)
+        return (isinstance(item, Text) and judge.passed_on(request, self.channel)
                 and split_reply(exchange.text)[1] not in ("", "OK"))
 
     def at(self, text: str, timeout: float | None = None) -> AtReply:

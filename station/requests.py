@@ -120,12 +120,16 @@ class Refusal:
 
 @dataclass(frozen=True)
 class Service:
-    """Who answers a request on one channel, and how."""
+    """Who answers a request on one channel, and how.
+
+    ``passes_on`` names the values of an int atom for which the modem answers after all.
+    """
 
     by: str
     acknowledged: bool
     how: str
     refusals: tuple[Refusal, ...] = ()
+    passes_on: Mapping[int, tuple[int, ...]] = field(default_factory=dict)
 
 
 PASSED_ON = Service("modem", False, "passed on to the modem unchanged; the modem answers")

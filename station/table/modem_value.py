@@ -25,7 +25,8 @@ VERSION = Request(
                (_UNKNOWN_MODULE,
                 Refusal("module software: a build property cannot be read, or the factory id is "
                         "set and /sys/sarvo/board_info cannot be read; the acknowledgement has "
-                        "gone out by then"))),
+                        "gone out by then")),
+               passes_on={19: (MODULES["l1"], MODULES["hls"])}),
     app=Service("handset", False,
                 "modules l1 and hls are asked of the modem (AT^DCMR); every other gives a fixed "
                 "text of 64 bytes",
