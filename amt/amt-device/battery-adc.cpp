@@ -50,10 +50,11 @@ int amt_write_adc_diff_value(int32_t a, int32_t b, int32_t c, int32_t d)
 {
     char text_a[CALIBRATION_SIZE];
     snprintf(text_a, sizeof(text_a), "amt_set_vbatt[%d] [%d] [%d] [%d]", a, b, c, d);
-    const amt_factory_step_en step = amt_factory_file_write(CALIBRATION_FILE, text_a);
+    const amt_factory_step_en step = amt_factory_file_put(CALIBRATION_FILE, text_a);
     if (step == amt_factory_step_en::OPEN_FAILED) {
         return AMT_DEVICE_FAIL_CALL(__func__, "fopen");
     }
     PUB_LOG(g_amt_device_log, "SAVA ADC value: %d %d %d %d", a, b, c, d);
+    amt_factory_file_sync();
     return step == amt_factory_step_en::DONE ? PUB_ERR_NONE : AMT_DEVICE_FAIL_CALL(__func__, "fprintf");
 }
