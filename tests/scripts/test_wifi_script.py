@@ -15,7 +15,7 @@ import pytest
 SCRIPT = Path(__file__).parents[2] / "scripts" / "wifi-radio-test.sh"
 TOOL_LINE = "WL_PATH=/system/bin/wl"
 
-# Notes its words one by one, so that quoting shows; fails on the given words from the given call on.
+# Notes its words one by one, so that quoting shows; fails on the given words from a given call on.
 FAKE_TOOL = """#!/bin/sh
 for word in "$@"; do printf '[%s]' "$word" >> "$FAKE_CALLS"; done
 echo >> "$FAKE_CALLS"

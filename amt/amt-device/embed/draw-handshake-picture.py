@@ -64,7 +64,7 @@ def draw_phone(draw: ImageDraw.ImageDraw) -> None:
 
 
 def draw_pulse(draw: ImageDraw.ImageDraw) -> None:
-    """The test pulse, through the handset from edge to edge, with a black rim that keeps it apart."""
+    """The test pulse, from edge to edge, with a black rim that keeps it apart from the handset."""
     points = [scaled(point) for point in PULSE]
     for width, colour in ((20, BLACK), (10, GREEN)):
         draw.line(points, fill=colour, width=width * SCALE, joint="curve")
