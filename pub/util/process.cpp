@@ -40,9 +40,8 @@ FILE *open_file(const char *path, const char *func, int line)
 }
 
 /*
- * Reads the first blank-delimited word as fscanf's %s would, of which what exceeds the buffer is left unread.
- * The zero bytes between the arguments of a command line are part of the word and end its text. Returns 1, or
- * EOF with buf untouched.
+ * Reads the first word of a command line, whose arguments are separated by zero bytes; what exceeds the
+ * buffer is left unread. Returns 1, or EOF with buf untouched, as fscanf would.
  */
 int scan_word(FILE *file, char *buf, uint32_t capacity)
 {
@@ -54,8 +53,9 @@ int scan_word(FILE *file, char *buf, uint32_t capacity)
         return EOF;
     }
     uint32_t used = 0;
-    for (; used < capacity - 1 && character != EOF && !is_blank(character); character = getc(file)) {
+    while (used < capacity - 1 && character != EOF && character != '\0' && !is_blank(character)) {
         buf[used++] = static_cast<char>(character);
+        character = getc(file);
     }
     buf[used] = '\0';
     return 1;

@@ -20,10 +20,30 @@ thread_local volatile sig_atomic_t t_is_deferred = 0;
 thread_local volatile sig_atomic_t t_is_forbidden = 0;
 thread_local volatile sig_atomic_t t_is_noted = 0;
 
+pthread_once_t g_unwinder_once = PTHREAD_ONCE_INIT;
+
+void *end_at_once(void *)
+{
+    pthread_exit(nullptr);
+}
+
+/*
+ * The first pthread_exit of a process loads the unwinder, which allocates and takes the loader's locks. A
+ * thread that does nothing else does it, so that no signal handler has to.
+ */
+void load_unwinder()
+{
+    pthread_t thread = 0;
+    if (pthread_create(&thread, nullptr, end_at_once, nullptr) == 0) {
+        pthread_join(thread, nullptr);
+    }
+}
+
 } // namespace
 
 void pub_util_defer_thread_end()
 {
+    pthread_once(&g_unwinder_once, load_unwinder);
     if (t_is_forbidden == 0) {
         t_is_deferred = 1;
     }
@@ -52,13 +72,16 @@ bool pub_util_is_thread_end_deferred()
 
 void pub_util_sleep_ms(uint32_t ms)
 {
+    const int saved_errno = errno;
     const bool was_deferred = pub_util_is_thread_end_deferred();
     timespec left = {};
     left.tv_sec = static_cast<time_t>(ms / 1000);
     left.tv_nsec = static_cast<long>(ms % 1000) * 1000000L;
     pub_util_allow_thread_end();
-    while (clock_nanosleep(CLOCK_MONOTONIC, 0, &left, &left) == EINTR) {
+    /* nanosleep, which the kernel measures on its monotonic clock: ThreadSanitizer delivers signals in it. */
+    while (nanosleep(&left, &left) != 0 && errno == EINTR) {
     }
+    errno = saved_errno;
     if (was_deferred) {
         pub_util_defer_thread_end();
     }
