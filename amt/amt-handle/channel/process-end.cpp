@@ -6,6 +6,7 @@
 #include <sys/time.h>
 #include <unistd.h>
 
+#include "amt/amt-handle/channel/service-process.h"
 #include "amt/amt-handle/startup.h"
 #include "pub/util/thread-end.h"
 
@@ -56,6 +57,9 @@ void block_terminating_signals()
 
 void amt_process_end_begin(int exit_status)
 {
+    if (!amt_service_process_is_own()) {
+        _exit(0);
+    }
     pub_util_forbid_thread_end();
     block_terminating_signals();
     pthread_t nobody = 0;

@@ -11,6 +11,8 @@
  * thread is the ender already. From here on SIGUSR1 and the terminating signals no longer reach this thread,
  * and should the shut-down get stuck (a fault may have come in the middle of an allocation), the process ends
  * all the same within a second.
+ *
+ * A child of the service ends here at once: nothing that would be shut down is its own.
  */
 void amt_process_end_begin(int exit_status);
 
