@@ -49,6 +49,13 @@ bool is_open(int fd)
     return fcntl(fd, F_GETFD) >= 0;
 }
 
+/* What stands in the brackets at the end of a log text. */
+std::string in_brackets(const std::string &text)
+{
+    const size_t begin = text.find('[') + 1;
+    return text.substr(begin, text.size() - 1 - begin);
+}
+
 int open_descriptors()
 {
     int count = 0;
@@ -318,10 +325,7 @@ TEST_F(pty, link_that_cannot_be_made)
     EXPECT_EQ(open_descriptors(), descriptors);
     const lines_t text_list = without_line_numbers(capture);
     ASSERT_EQ(text_list.size(), 15U);
-    const std::string name_line = text_list[2];
-    const std::string pts =
-        name_line.substr(name_line.find('['), name_line.size()).substr(1, name_line.size());
-    const std::string slave_name = pts.substr(0, pts.size() - 1);
+    const std::string slave_name = in_brackets(text_list[2]);
     const lines_t expected_list =
         lines_t{"create_pts_mapping unlink(" + m_mapping + ") ret_val[-1]",
                 "create_pts_mapping symlink(" + slave_name + ", " + m_mapping + ") ret_val[-1]",
@@ -472,8 +476,7 @@ TEST_P(pty_request, refused)
     EXPECT_EQ(run.m_result, PUB_ERR_FILE);
     const lines_t text_list = run.m_text_list;
     ASSERT_GT(text_list.size(), 6U);
-    const std::string opened = text_list[1];
-    const std::string master = opened.substr(opened.find('[') + 1, opened.size() - opened.find('[') - 2);
+    const std::string master = in_brackets(text_list[1]);
     const lines_t tail = lines_t{"set_ptm_attr " + GetParam().m_call + "(" + master + ") ret_val[-1]",
                                  sys_call_line(GetParam().m_call, EIO), pty_error("set_ptm_attr", -1, EIO),
                                  "set_ptm_attr fd[" + master + "] ret_val[-118]"} +
