@@ -3,6 +3,7 @@
 from __future__ import annotations
 
 from collections import Counter
+from typing import Hashable
 
 import pytest
 
@@ -62,8 +63,10 @@ def test_a_broken_catalogue_is_noticed(text: str) -> None:
 
 
 def test_rows_are_unique() -> None:
-    for values in ([row.id for row in REQUESTS], [row.name for row in REQUESTS],
-                   [operation.path for _, operation in operations()]):
+    columns: list[list[Hashable]] = [
+        [row.id for row in REQUESTS], [row.name for row in REQUESTS],
+        [operation.path for _, operation in operations()]]
+    for values in columns:
         assert [value for value, count in Counter(values).items() if count > 1] == []
 
 

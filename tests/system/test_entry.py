@@ -159,7 +159,7 @@ def test_missing_configuration_is_fatal(idle_handset: Handset) -> None:
     assert ended.stdout.decode().endswith("[vx-kel-amt]config over result=-118\n")
     texts = idle_handset.log.texts(TAG)
     start = texts.index("amt_cfg_init()")
-    expected = [
+    expected: list[str | re.Pattern[str]] = [
         "amt_cfg_init()", "parse_amt_cfg()", "sys call: fopen() failed! errno = 2",
         error_line("parse_amt_cfg", -1, 2, "amt/amt-cfg"),
         error_line("parse_amt_cfg", -118, 2, "amt/amt-cfg"),

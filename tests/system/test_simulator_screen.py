@@ -60,7 +60,7 @@ def test_the_screen_of_a_handset(make_fake, tmp_path: Path) -> None:
     assert memory.stat().st_size == 100 * 60 * 4 * 2
     screen.save(memory, handset.path(screen.STATE), target)
     with Image.open(target) as image:
-        assert image.size == (100, 60) and image.getcolors() == [(6000, (0, 0, 0))]
+        assert image.size == (100, 60) and image.getextrema() == ((0, 0), (0, 0), (0, 0))
     handset.run(["/bin/sh", "-c", "printf '\\377\\377\\377\\0' | dd of=/dev/graphics/fb0 "
                                   "conv=notrunc"])
     screen.save(memory, handset.path(screen.STATE), target)

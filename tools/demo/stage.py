@@ -9,10 +9,10 @@ from simulator import Handset, screen
 from station.decoder import Acknowledgement, Frame, Item, Text
 from station.errors import Refused, StationError
 from station.link import Link
-from station.operations import find_operation, operation_packet, read_answer
+from station.operations import Value, operation_packet, read_answer
 from station.packet import Packet
 from station.render import printable
-from station.table import display_name, requests_by_id
+from station.table import display_name, find_operation, requests_by_id
 
 WIDTHS = (26, 56)
 
@@ -60,14 +60,14 @@ class Stage:
         self.row(reply.seconds * 1000, what, f"-> {text}", lines, expected in reply.raw)
 
     def operation(self, link: Link, what: str, path: tuple[str, ...],
-                  values: "Mapping[str, str | int | bytes] | None" = None,
-                  expected: "Mapping[str, str | int] | None" = None) -> None:
+                  values: "Mapping[str, Value] | None" = None,
+                  expected: "Mapping[str, Value] | None" = None) -> None:
         """A request of the station's table; EXPECTED values must come back."""
         row, operation = find_operation(path)
         self.request(link, what, operation_packet(row, operation, values), expected)
 
     def request(self, link: Link, what: str, packet: Packet,
-                expected: "Mapping[str, str | int] | None" = None) -> None:
+                expected: "Mapping[str, Value] | None" = None) -> None:
         """A packet and its answer."""
         sent = f"-> {_named_request(packet)}"
         try:

@@ -40,9 +40,14 @@ PULSE = [
 ]
 
 
-def scaled(values: tuple[float, ...]) -> tuple[int, ...]:
-    """Coordinates on the enlarged drawing."""
-    return tuple(round(value * SCALE) for value in values)
+def scaled(point: tuple[float, float]) -> tuple[int, int]:
+    """A point on the enlarged drawing."""
+    return round(point[0] * SCALE), round(point[1] * SCALE)
+
+
+def scaled_box(box: tuple[float, float, float, float]) -> tuple[int, int, int, int]:
+    """A box on the enlarged drawing: its left, top, right and bottom."""
+    return scaled(box[:2]) + scaled(box[2:])
 
 
 def draw_stripes(draw: ImageDraw.ImageDraw, top: int) -> None:
@@ -58,9 +63,9 @@ def draw_stripes(draw: ImageDraw.ImageDraw, top: int) -> None:
 
 def draw_phone(draw: ImageDraw.ImageDraw) -> None:
     """The handset: its frame, its earpiece and its button."""
-    draw.rounded_rectangle(scaled(PHONE), radius=20 * SCALE, outline=WHITE, width=11 * SCALE)
-    draw.rounded_rectangle(scaled((156, 66, 190, 72)), radius=3 * SCALE, fill=WHITE)
-    draw.ellipse(scaled((165, 234, 181, 250)), fill=WHITE)
+    draw.rounded_rectangle(scaled_box(PHONE), radius=20 * SCALE, outline=WHITE, width=11 * SCALE)
+    draw.rounded_rectangle(scaled_box((156, 66, 190, 72)), radius=3 * SCALE, fill=WHITE)
+    draw.ellipse(scaled_box((165, 234, 181, 250)), fill=WHITE)
 
 
 def draw_pulse(draw: ImageDraw.ImageDraw) -> None:

@@ -33,7 +33,7 @@ int wait_for(int fd, bool is_to_write, int timeout_ms)
     fd_set fds;
     FD_ZERO(&fds);
     FD_SET(fd, &fds);
-    timeval timeout = {timeout_ms / 1000, (timeout_ms % 1000) * 1000};
+    timeval timeout = {timeout_ms / 1000, (timeout_ms % 1000) * 1000L};
     return wait_open_to_end([&] {
         return select(fd + 1, is_to_write ? nullptr : &fds, is_to_write ? &fds : nullptr, nullptr, &timeout);
     });

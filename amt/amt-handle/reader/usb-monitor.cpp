@@ -11,6 +11,7 @@
 #include "amt/amt-handle/channel/process-end.h"
 #include "amt/amt-handle/channel/wait.h"
 #include "amt/amt-log.h"
+#include "pub/util/thread-end.h"
 
 namespace {
 
@@ -36,14 +37,19 @@ int open_event_socket()
     address.nl_family = AF_NETLINK;
     address.nl_pid = static_cast<uint32_t>(getpid());
     address.nl_groups = KERNEL_GROUP;
-    bind(fd, reinterpret_cast<const sockaddr *>(&address), sizeof(address));
+    (void)bind(fd, reinterpret_cast<const sockaddr *>(&address), sizeof(address));
     return fd;
 }
 
 /* Whether an event has come in time. */
 bool receive_event(int fd, event_st *event_ptr)
 {
-    if (amt_wait_readable(fd, POLL_MS) <= 0) {
+    const int ready = amt_wait_readable(fd, POLL_MS);
+    if (ready < 0) {
+        /* Without a socket there is nothing to wait on, but still somebody who may stop this thread. */
+        pub_util_sleep_ms(POLL_MS);
+    }
+    if (ready <= 0) {
         return false;
     }
     const ssize_t length = recv(fd, event_ptr->m_text_a, EVENT_SIZE, MSG_DONTWAIT);
