@@ -11,6 +11,7 @@ from support.channels import AppChannel, PcChannel
 HandsetFactory = Callable[..., Handset]
 FAKE_DAEMON = Path(__file__).with_name("support") / "fake_daemon.py"
 HANDSETS = pytest.StashKey[list[Handset]]()
+FAILED = pytest.StashKey[bool]()
 
 
 def pytest_addoption(parser: pytest.Parser) -> None:
@@ -27,6 +28,36 @@ def handset_build(request: pytest.FixtureRequest) -> "str | Path":
     return Path(name).resolve() if "/" in name else name
 
 
+class Workshop:
+    """Makes handsets, keeps them in a node's stash for the reports, and takes them down."""
+
+    def __init__(self, node: pytest.Item | pytest.Collector, build: "str | Path") -> None:
+        self._made = node.stash.setdefault(HANDSETS, [])
+        self._build = build
+
+    def make(self, path: str = "pc", ready: bool = True, **options: Any) -> Handset:
+        """Make one handset."""
+        if "daemon" not in options:
+            options.setdefault("build", self._build)
+        handset = Handset(path, **options)
+        handset.up()
+        self._made.append(handset)
+        if ready:
+            handset.wait_ready()
+        return handset
+
+    def close(self) -> None:
+        """Take every handset down; a report of a sanitizer is a failure."""
+        reports: dict[str, str] = {}
+        for handset in self._made:
+            try:
+                reports.update(_end(handset))
+            finally:
+                handset.down()
+        self._made.clear()
+        assert not reports, "\n".join(["sanitizer reports:", *reports.values()])
+
+
 @pytest.fixture
 def make_handset(request: pytest.FixtureRequest,
                  handset_build: "str | Path") -> Iterator[HandsetFactory]:
@@ -35,27 +66,33 @@ def make_handset(request: pytest.FixtureRequest,
     With `ready`, the daemon serves its lines when the handset is returned. After the test every
     handset is taken down; a report of a sanitizer fails the test.
     """
-    made = request.node.stash.setdefault(HANDSETS, [])
+    workshop = Workshop(request.node, handset_build)
+    yield workshop.make
+    workshop.close()
 
-    def make(path: str = "pc", ready: bool = True, **options: Any) -> Handset:
-        if "daemon" not in options:
-            options.setdefault("build", handset_build)
-        handset = Handset(path, **options)
-        handset.up()
-        made.append(handset)
-        if ready:
-            handset.wait_ready()
-        return handset
 
-    yield make
-    reports: dict[str, str] = {}
-    for handset in made:
-        try:
-            reports.update(_end(handset))
-        finally:
-            handset.down()
-    made.clear()
-    assert not reports, "\n".join(["sanitizer reports:", *reports.values()])
+@pytest.fixture(scope="module")
+def share_handset(request: pytest.FixtureRequest,
+                  handset_build: "str | Path") -> Iterator[HandsetFactory]:
+    """As `make_handset`, for tests that leave a handset as they found it.
+
+    The tests of a module get the same handset for the same arguments, and a new one after a test
+    that failed. All are taken down behind the last test, which a sanitizer's report fails.
+    """
+    workshop = Workshop(request.node, handset_build)
+    shared: dict[str, Handset] = {}
+
+    def share(path: str = "pc", ready: bool = True, **options: Any) -> Handset:
+        if request.node.stash.get(FAILED, False):
+            request.node.stash[FAILED] = False
+            shared.clear()
+        key = repr((path, ready, sorted(options.items())))
+        if key not in shared:
+            shared[key] = workshop.make(path, ready, **options)
+        return shared[key]
+
+    yield share
+    workshop.close()
 
 
 def _end(handset: Handset) -> dict[str, str]:
@@ -99,8 +136,12 @@ def pytest_runtest_makereport(item: pytest.Item) -> Iterator[None]:
     outcome = yield
     report = outcome.get_result()  # type: ignore[attr-defined]
     if report.when == "call" and report.failed:
-        for number, handset in enumerate(item.stash.get(HANDSETS, [])):
+        made = [handset for node in item.listchain() for handset in node.stash.get(HANDSETS, [])]
+        for number, handset in enumerate(made):
             report.sections.append((f"handset {number}", handset.story()))
+    if report.failed:
+        for node in item.listchain():
+            node.stash[FAILED] = True
 
 
 @pytest.fixture
