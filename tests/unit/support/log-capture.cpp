@@ -1,6 +1,7 @@
 #include "tests/unit/support/log-capture.h"
 
 #include <algorithm>
+#include <errno.h>
 #include <mutex>
 #include <stdarg.h>
 #include <stdio.h>
@@ -22,10 +23,14 @@ extern "C" int __android_log_print(int priority, const char *tag, const char *fo
     va_start(args, format);
     const int length = vsnprintf(text_a, sizeof(text_a), format, args);
     va_end(args);
-    const std::lock_guard<std::mutex> guard(g_lock);
-    if (g_is_capturing) {
-        g_records.push_back({priority, tag == nullptr ? "(null)" : tag, text_a});
+    {
+        const std::lock_guard<std::mutex> guard(g_lock);
+        if (g_is_capturing) {
+            g_records.push_back({priority, tag == nullptr ? "(null)" : tag, text_a});
+        }
     }
+    /* A log call may do this, and the next line must show the failing call's errno all the same. */
+    errno = EOWNERDEAD;
     return length;
 }
 

@@ -12,11 +12,10 @@ struct log_record_st
 };
 
 /*
- * Takes the place of the platform's log in the unit tests: while an object of this class lives, every record of every
- * thread is kept in it. One at a time.
+ * Takes the place of the platform's log in the unit tests: while an object of this class lives, every record
+ * of every thread is kept in it. One at a time.
  */
-class log_capture_c
-{
+class log_capture_c {
 public:
     log_capture_c();
     ~log_capture_c();
