@@ -11,50 +11,44 @@ namespace {
 constexpr uint32_t STOP_PATIENCE_MS = 200;
 
 pthread_key_t g_end_key;
-bool g_is_prepared = false;
+bool g_has_end_key = false;
 
 /* Held while a thread is created: it must find its id stored, whatever it does first. */
 pthread_mutex_t g_start_lock = PTHREAD_MUTEX_INITIALIZER;
 
-void mark_ended(void *worker_ptr)
+/* The id of a thread that has ended, by whose signal ever, must not be stopped any more. */
+void mark_ended(void *argument)
 {
-    static_cast<amt_worker_st *>(worker_ptr)->m_is_alive.store(0, std::memory_order_release);
+    auto *const worker_ptr = static_cast<amt_worker_st *>(argument);
+    worker_ptr->m_id.store(0);
+    worker_ptr->m_is_alive.store(0, std::memory_order_release);
 }
 
-void *leave_at_once(void *)
+/* A key's destructor runs however a thread ends; a destructor on its stack would not when it ends by
+ * pthread_exit. */
+void create_end_key()
 {
-    pthread_exit(nullptr);
-}
-
-/*
- * The first pthread_exit of a process loads the unwinder, which allocates. A worker ends inside a signal
- * handler, so that must have happened before.
- */
-void load_unwinder()
-{
-    pthread_t id = 0;
-    if (pthread_create(&id, nullptr, leave_at_once, nullptr) == 0) {
-        pthread_join(id, nullptr);
+    if (!g_has_end_key) {
+        g_has_end_key = pthread_key_create(&g_end_key, mark_ended) == 0;
     }
 }
 
-/*
- * What all workers need, once. A key's destructor runs however a thread ends; a destructor on its stack would
- * not when it ends by pthread_exit.
- */
-void prepare_thread_ends()
+sigset_t get_end_signal()
 {
-    if (!g_is_prepared) {
-        load_unwinder();
-        g_is_prepared = pthread_key_create(&g_end_key, mark_ended) == 0;
-    }
+    sigset_t set;
+    sigemptyset(&set);
+    sigaddset(&set, SIGUSR1);
+    return set;
 }
 
+/* Begins with the end signal blocked: a thread that ended before it has a name would never be known to. */
 void *run(void *argument)
 {
     auto *worker_ptr = static_cast<amt_worker_st *>(argument);
     pub_util_defer_thread_end();
     pthread_setspecific(g_end_key, worker_ptr);
+    const sigset_t end_signal = get_end_signal();
+    pthread_sigmask(SIG_UNBLOCK, &end_signal, nullptr);
     pthread_mutex_lock(&g_start_lock);
     pthread_mutex_unlock(&g_start_lock);
     worker_ptr->m_loop();
@@ -66,12 +60,16 @@ int create_detached(amt_worker_st *worker_ptr)
     pthread_attr_t attr;
     pthread_attr_init(&attr);
     pthread_attr_setdetachstate(&attr, PTHREAD_CREATE_DETACHED);
+    const sigset_t end_signal = get_end_signal();
+    sigset_t own_mask;
+    pthread_sigmask(SIG_BLOCK, &end_signal, &own_mask);
     pthread_mutex_lock(&g_start_lock);
     pthread_t id = 0;
     const int error = pthread_create(&id, &attr, run, worker_ptr);
     worker_ptr->m_id.store(error == 0 ? id : 0);
     worker_ptr->m_is_alive.store(error == 0 ? 1 : 0);
     pthread_mutex_unlock(&g_start_lock);
+    pthread_sigmask(SIG_SETMASK, &own_mask, nullptr);
     pthread_attr_destroy(&attr);
     return error;
 }
@@ -80,7 +78,7 @@ int create_detached(amt_worker_st *worker_ptr)
 
 int amt_worker_start(amt_worker_st *worker_ptr, void (*loop)())
 {
-    prepare_thread_ends();
+    create_end_key();
     /* Installed before the thread exists: a stop that comes first must not end the whole process. */
     signal(SIGUSR1, pub_util_handle_thread_signal);
     worker_ptr->m_loop = loop;

@@ -1,0 +1,148 @@
+#include "amt/amt-handle/channel/wait.h"
+
+#include <chrono>
+#include <errno.h>
+#include <fcntl.h>
+#include <signal.h>
+#include <string>
+#include <sys/select.h>
+#include <sys/time.h>
+#include <unistd.h>
+
+#include <gtest/gtest.h>
+
+#include "pub/util/thread-end.h"
+
+namespace {
+
+using steady_clock_t = std::chrono::steady_clock;
+
+long elapsed_ms(steady_clock_t::time_point start)
+{
+    return static_cast<long>(
+        std::chrono::duration_cast<std::chrono::milliseconds>(steady_clock_t::now() - start).count());
+}
+
+class wait_on_pipe : public testing::Test {
+protected:
+    void SetUp() override
+    {
+        ASSERT_EQ(pipe2(m_fd_a, O_CLOEXEC), 0);
+    }
+    void TearDown() override
+    {
+        close(m_fd_a[0]);
+        close(m_fd_a[1]);
+    }
+
+    void say(const std::string &text) const
+    {
+        ASSERT_EQ(write(m_fd_a[1], text.data(), text.size()), static_cast<ssize_t>(text.size()));
+    }
+
+    /* Nobody reads: no more fits. */
+    void fill() const
+    {
+        ASSERT_EQ(fcntl(m_fd_a[1], F_SETFL, O_NONBLOCK), 0);
+        const std::string block(4096, 'x');
+        while (write(m_fd_a[1], block.data(), block.size()) > 0) {
+        }
+    }
+
+    int m_fd_a[2];
+};
+
+TEST_F(wait_on_pipe, readable)
+{
+    const auto begin = steady_clock_t::now();
+    EXPECT_EQ(amt_wait_readable(m_fd_a[0], 40), 0);
+    EXPECT_GE(elapsed_ms(begin), 40);
+    say("x");
+    EXPECT_EQ(amt_wait_readable(m_fd_a[0], 30000), 1);
+    EXPECT_EQ(amt_wait_readable(m_fd_a[0], 0), 1);
+}
+
+TEST_F(wait_on_pipe, readable_at_the_end_of_data)
+{
+    close(m_fd_a[1]);
+    EXPECT_EQ(amt_wait_readable(m_fd_a[0], 30000), 1);
+    char byte = 0;
+    EXPECT_EQ(amt_wait_read(m_fd_a[0], &byte, 1), 0);
+    m_fd_a[1] = -1;
+}
+
+TEST_F(wait_on_pipe, writable)
+{
+    EXPECT_EQ(amt_wait_writable(m_fd_a[1], 30000), 1);
+    fill();
+    const auto begin = steady_clock_t::now();
+    EXPECT_EQ(amt_wait_writable(m_fd_a[1], 40), 0);
+    EXPECT_GE(elapsed_ms(begin), 40);
+}
+
+TEST_F(wait_on_pipe, no_descriptor)
+{
+    for (const int fd : {-1, static_cast<int>(FD_SETSIZE), 1 << 30}) {
+        errno = 0;
+        EXPECT_EQ(amt_wait_readable(fd, 30000), -1);
+        EXPECT_EQ(errno, EBADF);
+        errno = 0;
+        EXPECT_EQ(amt_wait_writable(fd, 30000), -1);
+        EXPECT_EQ(errno, EBADF);
+    }
+    char byte = 0;
+    errno = 0;
+    EXPECT_EQ(amt_wait_read(-1, &byte, 1), -1);
+    EXPECT_EQ(errno, EBADF);
+}
+
+TEST_F(wait_on_pipe, read_takes_what_is_there)
+{
+    say("abcdef");
+    char text_a[8] = {};
+    EXPECT_EQ(amt_wait_read(m_fd_a[0], text_a, 4), 4);
+    EXPECT_STREQ(text_a, "abcd");
+    EXPECT_EQ(amt_wait_read(m_fd_a[0], text_a, 4), 2);
+    EXPECT_STREQ(text_a, "efcd");
+}
+
+TEST_F(wait_on_pipe, read_goes_on_after_a_signal)
+{
+    static int g_fd = -1;
+    g_fd = m_fd_a[1];
+    struct sigaction action = {};
+    action.sa_handler = [](int) {
+        static int count = 0;
+        if (++count == 3) {
+            const ssize_t ignored = write(g_fd, "y", 1);
+            static_cast<void>(ignored);
+        }
+    };
+    ASSERT_EQ(sigaction(SIGALRM, &action, nullptr), 0); /* interrupts system calls */
+    const itimerval often = {{0, 20000}, {0, 20000}};
+    const itimerval never = {};
+    ASSERT_EQ(setitimer(ITIMER_REAL, &often, nullptr), 0);
+    char byte = 0;
+    EXPECT_EQ(amt_wait_read(m_fd_a[0], &byte, 1), 1);
+    EXPECT_EQ(byte, 'y');
+    setitimer(ITIMER_REAL, &never, nullptr);
+    signal(SIGALRM, SIG_DFL);
+}
+
+TEST_F(wait_on_pipe, keeps_whether_the_threads_end_is_deferred)
+{
+    char byte = 0;
+    say("xy");
+    EXPECT_EQ(amt_wait_readable(m_fd_a[0], 1000), 1);
+    EXPECT_EQ(amt_wait_read(m_fd_a[0], &byte, 1), 1);
+    EXPECT_FALSE(pub_util_is_thread_end_deferred());
+    pub_util_defer_thread_end();
+    EXPECT_EQ(amt_wait_read(m_fd_a[0], &byte, 1), 1);
+    EXPECT_TRUE(pub_util_is_thread_end_deferred());
+    EXPECT_EQ(amt_wait_readable(m_fd_a[0], 1), 0);
+    EXPECT_EQ(amt_wait_writable(m_fd_a[1], 1), 1);
+    EXPECT_TRUE(pub_util_is_thread_end_deferred());
+    pub_util_allow_thread_end();
+}
+
+} // namespace

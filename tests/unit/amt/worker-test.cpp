@@ -1,0 +1,230 @@
+#include "amt/amt-handle/channel/worker.h"
+
+#include <atomic>
+#include <chrono>
+#include <signal.h>
+#include <unistd.h>
+
+#include <gtest/gtest.h>
+
+#include "amt/amt-handle/channel/wait.h"
+#include "pub/util/thread-end.h"
+#include "tests/unit/support/log-capture.h"
+
+namespace {
+
+using steady_clock_t = std::chrono::steady_clock;
+
+constexpr int STEP_STARTED = 1;
+constexpr int STEP_RETURNED = 2;
+constexpr unsigned int DEADLINE_SECONDS = 30;
+
+/* Records live as long as the process, as the hub's do: a thread may still be leaving when its test is over.
+ */
+amt_worker_st g_worker_a[16];
+uint32_t g_worker_count = 0;
+amt_worker_st *g_worker_ptr;
+
+std::atomic<int> g_step{0};
+std::atomic<int> g_released{0};
+int g_pipe_a[2];
+
+long elapsed_ms(steady_clock_t::time_point start)
+{
+    return static_cast<long>(
+        std::chrono::duration_cast<std::chrono::milliseconds>(steady_clock_t::now() - start).count());
+}
+
+template <typename value_t> void wait_for(const std::atomic<value_t> &value, value_t wanted)
+{
+    while (value != wanted) {
+        usleep(1000);
+    }
+}
+
+class worker : public testing::Test {
+protected:
+    void SetUp() override
+    {
+        ASSERT_LT(g_worker_count, std::size(g_worker_a));
+        g_worker_ptr = &g_worker_a[g_worker_count++];
+        g_step = 0;
+        g_released = 0;
+        ASSERT_EQ(pipe(g_pipe_a), 0);
+        alarm(DEADLINE_SECONDS);
+    }
+    void TearDown() override
+    {
+        alarm(0);
+        close(g_pipe_a[0]);
+        close(g_pipe_a[1]);
+    }
+
+    static void start(void (*loop)())
+    {
+        ASSERT_EQ(amt_worker_start(g_worker_ptr, loop), 0);
+        EXPECT_NE(g_worker_ptr->m_id.load(), 0U);
+        EXPECT_EQ(g_worker_ptr->m_is_alive, 1);
+        wait_for(g_step, STEP_STARTED);
+    }
+
+    static void expect_ended()
+    {
+        wait_for(g_worker_ptr->m_is_alive, 0);
+        EXPECT_EQ(g_worker_ptr->m_id.load(), 0U);
+    }
+};
+
+void wait_for_ever()
+{
+    g_step = STEP_STARTED;
+    while (amt_wait_readable(g_pipe_a[0], 600000) <= 0) {
+    }
+    g_step = STEP_RETURNED;
+}
+
+void sleep_for_ever()
+{
+    g_step = STEP_STARTED;
+    pub_util_sleep_ms(600000);
+    g_step = STEP_RETURNED;
+}
+
+void work_until_released()
+{
+    g_step = STEP_STARTED;
+    wait_for(g_released, 1);
+    g_step = STEP_RETURNED;
+    pub_util_sleep_ms(600000);
+}
+
+void note_deferral()
+{
+    g_released = pub_util_is_thread_end_deferred() ? 1 : 2;
+    g_step = STEP_STARTED;
+}
+
+void leave_and_work_on()
+{
+    amt_worker_leave(g_worker_ptr);
+    g_step = STEP_STARTED;
+    wait_for(g_released, 1);
+    g_step = STEP_RETURNED;
+}
+
+void leave_when_released()
+{
+    g_step = STEP_STARTED;
+    wait_for(g_released, 1);
+    amt_worker_leave(g_worker_ptr);
+    g_step = STEP_RETURNED;
+}
+
+TEST_F(worker, starts_with_its_end_deferred_and_ends_by_itself)
+{
+    start(note_deferral);
+    EXPECT_EQ(g_released, 1);
+    expect_ended();
+}
+
+TEST_F(worker, is_stopped_in_a_wait)
+{
+    for (void (*const loop)() : {wait_for_ever, sleep_for_ever}) {
+        g_step = 0;
+        start(loop);
+        const log_capture_c capture;
+        amt_worker_stop(g_worker_ptr);
+        EXPECT_EQ(g_worker_ptr->m_is_alive, 0);
+        EXPECT_EQ(g_worker_ptr->m_id.load(), 0U);
+        EXPECT_EQ(g_step, STEP_STARTED);
+        EXPECT_EQ(capture.count_containing("will be end"), 1);
+    }
+}
+
+TEST_F(worker, finishes_its_work_before_a_stop_ends_it)
+{
+    start(work_until_released);
+    pthread_t helper = 0;
+    ASSERT_EQ(pthread_create(
+                  &helper, nullptr,
+                  [](void *) -> void * {
+                      usleep(50000);
+                      g_released = 1;
+                      return nullptr;
+                  },
+                  nullptr),
+              0);
+    amt_worker_stop(g_worker_ptr);
+    pthread_join(helper, nullptr);
+    expect_ended();
+    EXPECT_EQ(g_step, STEP_RETURNED);
+}
+
+TEST_F(worker, is_waited_for_only_so_long)
+{
+    start(work_until_released);
+    const auto begin = steady_clock_t::now();
+    amt_worker_stop(g_worker_ptr);
+    EXPECT_GE(elapsed_ms(begin), 200);
+    EXPECT_EQ(g_worker_ptr->m_is_alive, 1);
+    EXPECT_EQ(g_worker_ptr->m_id.load(), 0U);
+    /* The stop still holds: it ends at its next wait. */
+    g_released = 1;
+    expect_ended();
+    EXPECT_EQ(g_step, STEP_RETURNED);
+}
+
+TEST_F(worker, that_never_ran_is_not_stopped)
+{
+    const log_capture_c capture;
+    const auto begin = steady_clock_t::now();
+    amt_worker_stop(g_worker_ptr);
+    EXPECT_LT(elapsed_ms(begin), 100);
+    EXPECT_EQ(capture.texts(), std::vector<std::string>{"pub_util_kill_thread()"});
+}
+
+TEST_F(worker, that_is_leaving_is_not_stopped_any_more)
+{
+    start([] { leave_and_work_on(); });
+    EXPECT_EQ(g_worker_ptr->m_id.load(), 0U);
+    const log_capture_c capture;
+    amt_worker_stop(g_worker_ptr);
+    g_released = 1;
+    wait_for(g_step, STEP_RETURNED);
+    expect_ended();
+    EXPECT_EQ(capture.count_containing("will be end"), 0);
+}
+
+TEST_F(worker, that_leaves_while_it_is_stopped_ends_there)
+{
+    start(leave_when_released);
+    const pthread_t id = g_worker_ptr->m_id.exchange(0); /* as the stop does first */
+    g_released = 1;
+    usleep(20000);
+    EXPECT_EQ(g_step, STEP_STARTED);
+    EXPECT_EQ(g_worker_ptr->m_is_alive, 1);
+    EXPECT_EQ(pthread_kill(id, SIGUSR1), 0);
+    expect_ended();
+    EXPECT_EQ(g_step, STEP_STARTED);
+}
+
+TEST_F(worker, ended_by_a_foreign_signal_is_known_to_be_gone)
+{
+    start(sleep_for_ever);
+    EXPECT_EQ(pthread_kill(g_worker_ptr->m_id, SIGUSR1), 0);
+    expect_ended();
+    const log_capture_c capture;
+    amt_worker_stop(g_worker_ptr);
+    EXPECT_EQ(capture.texts(), std::vector<std::string>{"pub_util_kill_thread()"});
+}
+
+TEST_F(worker, can_be_stopped_as_soon_as_it_is_started)
+{
+    for (int i = 0; i < 50; i++) {
+        ASSERT_EQ(amt_worker_start(g_worker_ptr, sleep_for_ever), 0);
+        amt_worker_stop(g_worker_ptr);
+        expect_ended();
+    }
+}
+
+} // namespace
