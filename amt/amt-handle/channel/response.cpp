@@ -56,6 +56,7 @@ int write_rsp(int fd, const amt_buf_st *rsp_ptr)
         return PUB_ERR_FILE;
     }
     if (written != static_cast<ssize_t>(rsp_ptr->m_buf_len)) {
+        pub_log_error(g_amt_handle_log, __LINE__, "amt_handle_send_rsp", PUB_ERR_INCOMPLETE);
         PUB_LOG(g_amt_handle_log, "WARNING !");
         PUB_LOG(g_amt_handle_log, "write not completed: to write(%u) != written(%zd)", rsp_ptr->m_buf_len,
                 written);
