@@ -23,27 +23,36 @@ def _links(directory: str) -> dict[str, str]:
     return found
 
 
-def _children(pid: int) -> list[int]:
-    return [int(child) for task in os.listdir(f"/proc/{pid}/task")
-            for child in _read(f"/proc/{pid}/task/{task}/children").split()]
+def _threads(pid: int) -> tuple[dict[str, dict[str, str]], list[int]]:
+    """The threads of a process, and the children of all of them."""
+    threads = {}
+    children = []
+    for task in os.listdir(f"/proc/{pid}/task"):
+        place = f"/proc/{pid}/task/{task}"
+        try:
+            stat = _read(f"{place}/stat").rpartition(")")
+            call = _read(f"{place}/wchan")
+            started = [int(child) for child in _read(f"{place}/children").split()]
+        except (FileNotFoundError, ProcessLookupError):
+            # A thread that has ended meanwhile; its children are another thread's now.
+            continue
+        threads[task] = {"name": stat[0].partition("(")[2], "state": stat[2].split()[0],
+                         "waits_in": call}
+        children += started
+    return threads, children
 
 
 def describe(pid: int) -> dict[str, object]:
     """Threads, descriptors, children and memory of the process PID."""
     status = _status(pid)
-    threads = {}
-    for task in os.listdir(f"/proc/{pid}/task"):
-        stat = _read(f"/proc/{pid}/task/{task}/stat").rpartition(")")
-        call = _read(f"/proc/{pid}/task/{task}/wchan")
-        threads[task] = {"name": stat[0].partition("(")[2], "state": stat[2].split()[0],
-                         "waits_in": call}
+    threads, children = _threads(pid)
     return {
         "pid": pid,
         "command": _read(f"/proc/{pid}/cmdline").rstrip("\0").split("\0"),
         "state": status["State"],
         "threads": threads,
         "descriptors": _links(f"/proc/{pid}/fd"),
-        "children": _children(pid),
+        "children": children,
         "resident_kib": int(status.get("VmRSS", "0 kB").split()[0]),
         "policy": os.sched_getscheduler(pid),
     }
