@@ -3,7 +3,6 @@
 #include <errno.h>
 #include <fcntl.h>
 #include <string.h>
-#include <sys/resource.h>
 #include <unistd.h>
 
 #include <gtest/gtest.h>
@@ -13,6 +12,7 @@
 #include "amt/amt-packet.h"
 #include "pub/error.h"
 #include "tests/unit/amt/modem-line.h"
+#include "tests/unit/amt/small-file.h"
 #include "tests/unit/support/log-lines.h"
 
 namespace {
@@ -134,35 +134,11 @@ TEST(response, that_cannot_be_written_is_kept)
     close(fd);
 }
 
-/* A file that may not grow beyond so many bytes, as long as this lives. */
-class small_file_c {
-public:
-    explicit small_file_c(rlim_t size) : m_fd(open("/tmp", O_RDWR | O_TMPFILE | O_CLOEXEC, 0600))
-    {
-        EXPECT_GT(m_fd, 0);
-        EXPECT_EQ(getrlimit(RLIMIT_FSIZE, &m_limit), 0);
-        const rlimit limit = {size, m_limit.rlim_max};
-        EXPECT_EQ(setrlimit(RLIMIT_FSIZE, &limit), 0);
-    }
-    ~small_file_c()
-    {
-        setrlimit(RLIMIT_FSIZE, &m_limit);
-        close(m_fd);
-    }
-    small_file_c(const small_file_c &) = delete;
-    small_file_c &operator=(const small_file_c &) = delete;
-
-    int m_fd;
-
-private:
-    rlimit m_limit;
-};
-
 TEST(response, written_in_part_is_kept)
 {
     const modem_line_c line;
     const small_file_c file(5);
-    g_handle_context.m_fd_pc = file.m_fd;
+    g_handle_context.m_fd_pc = file.fd();
     amt_buf_st rsp = make_rsp("\r\nERROR\r\n", 9);
     const log_capture_c capture;
     errno = 0;
