@@ -50,6 +50,8 @@ int read_address(amt_buf_st *rsp_ptr)
         return PUB_ERR_PARAM;
     }
     char address_a[ADDRESS_SIZE] = {};
+    /* An empty file is no error of the system; an older errno would mislead. */
+    errno = 0;
     const int count = fscanf(stream, ADDRESS_WORD_FORMAT, address_a);
     fclose(stream);
     if (count != 1) {
