@@ -17,7 +17,6 @@
 namespace {
 
 using ::testing::ElementsAre;
-using ::testing::ElementsAreArray;
 
 class amt_cfg : public ::testing::Test {
 protected:

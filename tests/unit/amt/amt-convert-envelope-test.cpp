@@ -29,7 +29,8 @@ const std::vector<uint8_t> EMPTY_PACKET_FRAME = {0xAA, 0xBB, 0xCC, 0xDD, 0x0E, 0
 class amt_convert_envelope : public ::testing::Test {
 protected:
     amt_convert_envelope()
-        : m_area(sizeof(amt_buf_st)), m_buf_ptr(reinterpret_cast<amt_buf_st *>(m_area.data()))
+        : m_area(sizeof(amt_buf_st)),
+          m_buf_ptr(reinterpret_cast<amt_buf_st *>(static_cast<void *>(m_area.data())))
     {
         errno = 0;
     }

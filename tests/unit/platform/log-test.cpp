@@ -1,7 +1,9 @@
+#include <algorithm>
 #include <atomic>
 #include <errno.h>
 #include <fcntl.h>
 #include <gmock/gmock.h>
+#include <limits>
 #include <map>
 #include <pthread.h>
 #include <regex>
@@ -71,8 +73,9 @@ TEST_F(log_test, time_is_the_present_in_utc)
 
 TEST_F(log_test, every_day_of_the_calendar_is_right)
 {
-    for (int64_t days = 0; days < int64_t{366} * 200; days++) {
-        const time_t seconds = days * 86400;
+    const int64_t last_day = std::min<int64_t>(366 * 200, std::numeric_limits<time_t>::max() / 86400);
+    for (int64_t days = 0; days < last_day; days++) {
+        const time_t seconds = static_cast<time_t>(days * 86400);
         struct tm expected;
         gmtime_r(&seconds, &expected);
         uint32_t month = 0;

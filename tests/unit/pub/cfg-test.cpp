@@ -45,7 +45,7 @@ std::vector<line_st> read_lines(const std::string &content, uint32_t capacity = 
         is_eof = 0xFFFF;
         EXPECT_EQ(pub_cfg_get_line(stream, buf.data(), capacity, &length, &is_eof), PUB_ERR_NONE);
         EXPECT_EQ(buf[capacity], '\0') << "wrote behind the capacity";
-        line_list.push_back({std::string(buf.data()), length, is_eof});
+        line_list.push_back({buf.substr(0, buf.find('\0')), length, is_eof});
     }
     fclose(stream);
     return line_list;

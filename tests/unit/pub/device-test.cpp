@@ -236,6 +236,12 @@ struct speed_case_st
     std::string m_name;
 };
 
+/* How the name of a test shows its case. */
+static void PrintTo(const speed_case_st &speed_case, std::ostream *stream_ptr)
+{
+    *stream_ptr << speed_case.m_request;
+}
+
 class serial_speed : public testing::TestWithParam<speed_case_st> {};
 
 TEST_P(serial_speed, follows_the_table)

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <errno.h>
 #include <fcntl.h>
+#include <limits.h>
 #include <sched.h>
 #include <stdio.h>
 #include <string.h>
@@ -156,11 +157,12 @@ TEST(check_run, process_that_has_ended_has_no_command_line)
 TEST(check_run, process_that_is_gone)
 {
     const temp_folder_c dir;
-    for (const char *pid : {"2147483647", "999999999999", "-5"}) {
+    /* The largest number is as wide as the machine's long. */
+    for (const std::string &pid : {std::string("2147483647"), std::to_string(LONG_MAX), std::string("-5")}) {
         const std::string pid_file = write_pid_file(dir, pid);
         const check_run_st run = check_run(pid_file, "some-daemon");
         expect_not_running(run);
-        const std::string path = std::string("/proc/").append(pid) + "/cmdline";
+        const std::string path = "/proc/" + pid + "/cmdline";
         ASSERT_EQ(run.m_text_list.size(), 7U);
         EXPECT_EQ(run.m_text_list[3], CHECK_RUN + " fopen buf_a[" + path + "]");
         EXPECT_EQ(run.m_text_list[4], util_error(CHECK_RUN, -118, ENOENT));

@@ -205,7 +205,7 @@ TEST_F(wifi_radio, reception_starts_without_a_counter)
 {
     start();
     const log_capture_c capture;
-    EXPECT_EQ(request(sub_command(5) + channel(6) + rate("\x6C\x00")), PUB_ERR_NONE);
+    EXPECT_EQ(request(sub_command(5) + channel(6) + rate(std::string("\x6C\x00", 2))), PUB_ERR_NONE);
     EXPECT_THAT(m_library.take_calls(), ElementsAre("ldt_RxTest(1, 6, 108, null)"));
     EXPECT_TRUE(capture.has("WIFI-RX-start start. channel:6; rate:108"));
 }
