@@ -4,6 +4,8 @@ import pytest
 
 from conftest import HandsetFactory
 from simulator import Handset
+from simulator.inside.modem import Modem
+from simulator.inside.modem_table import RESPONSES
 from station import wire
 from support.channels import AppChannel, flag, integer, packet, raw, string
 from support.modem_desk import NOT_SERVED, OK, ModemDesk, refusal, standing_still
@@ -315,6 +317,26 @@ ANSWERS = {
 def test_answers_of_the_simulated_modem(phone: Handset, command: int) -> None:
     phone.mux.close()
     assert AppChannel(phone).request(command, integer(5, 1)) == ANSWERS[command]
+
+
+# The daemon asks for these in other ways, so they come as the answer to another request.
+UNASKED = {
+    0x2D: packet(0x2E, RESULT, integer(19, 17), raw(18, b"KEL-1 L1 1.17.0".ljust(64, b"\n"))),
+    0x63: packet(0x64, RESULT, flag(41, 1)),
+}
+
+
+@pytest.mark.parametrize("command", UNASKED, ids=hex)
+def test_answers_to_what_is_asked_in_other_ways(app: AppChannel, command: int) -> None:
+    said = Modem().answer_line(f"AT^DTTEST={command:02X}").decode()
+    app.handset.answer_modem("AT^DTTEST=03", said)
+    assert app.request(3) == UNASKED[command]
+
+
+def test_every_response_with_fields_is_among_them() -> None:
+    answers = {answer.command for answer in (*ANSWERS.values(), *UNASKED.values())}
+    assert answers == set(RESPONSES) == {0x08, 0x18, 0x1A, 0x2E, 0x30, 0x3C, 0x3E, 0x4E, 0x64,
+                                         0x6A, 0x6E, 0x72, 0x98, 0xDD}
 
 
 def test_requests_that_bring_a_result_alone(phone: Handset) -> None:

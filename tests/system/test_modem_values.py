@@ -333,3 +333,17 @@ def test_channel_that_was_switched(make_handset: HandsetFactory) -> None:
         numbers.append(app.request(234).find(163))
     assert numbers == [raw(163, b"KEL0000000000001"), raw(163, b"KEL0000000000002"),
                        raw(163, b"KEL0000000000001")]
+
+
+def test_values_of_the_simulated_modem(app: AppChannel) -> None:
+    for request, answer in (
+            (packet(85), packet(86, string(38, "KEL0000000000001"), RESULT)),
+            (packet(234), packet(235, raw(163, b"KEL0000000000001"), RESULT)),
+            (packet(65), packet(66, string(27, "20130121"), RESULT)),
+            (packet(99), packet(100, flag(41, 1))),
+            (packet(197), packet(198, integer(202, 3), RESULT)),
+            (packet(45, integer(19, 17)),
+             packet(46, integer(19, 17), raw(18, b"KEL-1 L1 1.17.0"), RESULT)),
+            (packet(45, integer(19, 18)),
+             packet(46, integer(19, 18), raw(18, b"KEL-1 HLS 2.18.0"), RESULT))):
+        assert app.request(request.command, *request.atoms) == answer
