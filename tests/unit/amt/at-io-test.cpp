@@ -82,7 +82,7 @@ read_st read_some(uint32_t length)
     std::string buf(length + 1, '\x7F');
     int32_t count = 99;
     const int status = read_at(buf.data(), length, &count);
-    return {status, count, buf.c_str()};
+    return {status, count, buf.substr(0, buf.find('\0'))};
 }
 
 TEST(at_write, says_and_logs_the_text)

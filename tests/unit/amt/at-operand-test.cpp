@@ -150,8 +150,9 @@ std::string copy_quoted(const std::string &text, uint32_t capacity)
     std::string out(capacity + 8, FILLER);
     amt_at_copy_quoted(text.c_str(), out.data(), capacity);
     EXPECT_EQ(out.substr(capacity), std::string(8, FILLER));
-    EXPECT_LT(strlen(out.c_str()), capacity);
-    return out.c_str();
+    const size_t length = out.find('\0');
+    EXPECT_LT(length, capacity);
+    return out.substr(0, length);
 }
 
 TEST_F(at_operand, quoted_value_ends_at_quote_line_end_or_held_data)

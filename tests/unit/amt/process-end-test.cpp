@@ -84,10 +84,12 @@ void *end_process(void *)
         _exit(97);
     }
     g_handle_context.m_fd_modem = fd_a[0];
-    const bool is_clean = amt_handle_deinit() == 0 && amt_handle_deinit() == 0;
+    const int first = amt_handle_deinit();
+    const int second = amt_handle_deinit();
     char byte = 0;
     const bool is_closed = g_handle_context.m_fd_modem == -1 && read(fd_a[0], &byte, 1) == -1;
-    _exit(is_clean && is_closed && capture.count_containing("amt_handle_deinit()") == 1 ? 0 : 1);
+    _exit(first == 0 && second == 0 && is_closed && capture.count_containing("amt_handle_deinit()") == 1 ? 0
+                                                                                                         : 1);
 }
 
 TEST(process_end, has_status_0)

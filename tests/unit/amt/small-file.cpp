@@ -1,6 +1,7 @@
 #include "tests/unit/amt/small-file.h"
 
 #include <fcntl.h>
+#include <signal.h>
 #include <unistd.h>
 
 #include <gtest/gtest.h>
@@ -11,12 +12,15 @@ small_file_c::small_file_c(rlim_t size)
     EXPECT_GT(m_fd, 0);
     EXPECT_EQ(getrlimit(RLIMIT_FSIZE, &m_limit), 0);
     const rlimit limit = {size, m_limit.rlim_max};
+    /* Standard output may be a file, too. */
+    m_handler_ptr = signal(SIGXFSZ, SIG_IGN);
     EXPECT_EQ(setrlimit(RLIMIT_FSIZE, &limit), 0);
 }
 
 small_file_c::~small_file_c()
 {
     setrlimit(RLIMIT_FSIZE, &m_limit);
+    signal(SIGXFSZ, m_handler_ptr);
     close(m_fd);
 }
 

@@ -21,4 +21,5 @@ private:
     temp_folder_c m_folder;
     rlimit m_limit;
     int m_fd;
+    void (*m_handler_ptr)(int);
 };
