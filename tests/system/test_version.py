@@ -1,6 +1,8 @@
 """Version queries: the fixed text, the modem's own versions, and the software text."""
 
 import re
+import subprocess
+from pathlib import Path
 
 import pytest
 
@@ -231,7 +233,7 @@ class Software:
         path = self.handset.path(BOARD)
         board = path.read_bytes() if path.exists() else None
         self.handset.place(BOARD, "board")
-        self.handset.answer("property_get")
+        self.handset.place(UNREADABLE, None)
         self.pc.send(b"\0")
         assert self.pc.read_frame() == ACK
         assert self.pc.read_packet().result == 0
@@ -242,11 +244,12 @@ class Software:
         for name, value in values.items():
             self.handset.set_property(f"ro.build.{name.replace('_', '.')}", value)
 
-    def unreadable(self, *answers: int) -> None:
-        """Script which reads of a property fail, and keep it so for a single text."""
-        self.handset.answer("property_get", *map(str, answers))
+    def unreadable(self, *names: str) -> None:
+        """These properties give neither a value nor the default."""
+        self.handset.place(UNREADABLE, "".join(f"{name}\n" for name in names))
 
 
+UNREADABLE = "/handset/unreadable.txt"
 BOARD = "/sys/sarvo/board_info"
 EMMC = "/sys/devinfo/emmc_info"
 CARRIER = "/data/orla/current/cust.prop"
@@ -302,48 +305,64 @@ def test_any_other_brand(software: Software, customer: str | None, maker: str | 
     software.expect("(KEL-1_4.2.1)" + FACTORY_TAIL)
 
 
-# The reads of a text in their order: customer, maker on any other brand, then the fields.
+# Properties that cannot be read, by a library in the place of the usual one.
+
+SOURCE = Path(__file__).with_name("support") / "unreadable_properties.c"
+CUTILS, OTHER = "/system/lib/libcutils.so", "/system/lib/libcutils-other.so"
 
 
-def test_display_id_that_cannot_be_read(software: Software) -> None:
-    software.unreadable(0, 0, -1, 0, 0, -1)
-    software.expect_failure(-100, error_line("get_ap_sw_version", -100),
-                            "read ro.build.display.id error")
+@pytest.fixture
+def limited(make_handset: HandsetFactory, tmp_path: Path) -> Software:
+    """As `software`, on a handset some of whose properties cannot be read."""
+    library = tmp_path / "libcutils.so"
+    subprocess.run(["cc", "-shared", "-fPIC", "-O1", "-o", library, SOURCE], check=True)
+    handset = make_handset("pc", ready=False, start=False)
+    handset.place(OTHER, handset.read(CUTILS))
+    handset.place(CUTILS, library)
+    handset.start()
+    handset.wait_ready()
+    return Software(handset)
 
 
-def test_brand_that_cannot_be_read_is_another_one(software: Software) -> None:
-    software.set(customer="BRENTA")
-    software.unreadable(-1, 0)
-    assert software.pc.request(45, integer(19, 16)) == version(
+def test_display_id_that_cannot_be_read(limited: Software) -> None:
+    limited.unreadable("ro.build.display.id")
+    limited.expect_failure(-100, error_line("get_ap_sw_version", -100),
+                           "read ro.build.display.id error")
+
+
+def test_brand_that_cannot_be_read_is_another_one(limited: Software) -> None:
+    limited.set(customer="BRENTA")
+    limited.unreadable("ro.build.customer")
+    assert limited.pc.request(45, integer(19, 16)) == version(
         16, ("(KEL-1_4.2.1)" + FACTORY_TAIL).encode())
-    software.handset.set_property("ro.product.manufacturer", "Brenta")
-    software.set(customer=None)
-    software.unreadable(0, -1, 0)
-    assert software.pc.request(45, integer(19, 16)) == version(
+    limited.handset.set_property("ro.product.manufacturer", "Brenta")
+    limited.set(customer=None)
+    limited.unreadable("ro.product.manufacturer")
+    assert limited.pc.request(45, integer(19, 16)) == version(
         16, ("(KEL-1_4.2.1)" + FACTORY_TAIL).encode())
 
 
-def test_factory_id_that_cannot_be_read(software: Software) -> None:
+def test_factory_id_that_cannot_be_read(limited: Software) -> None:
     # Then the board's file is not looked for, and is not missed.
-    software.handset.place(BOARD, None)
-    software.unreadable(0, 0, 0, -1, 0, 0, 0, -1)
-    trace = software.expect("(KEL-1_4.2.1)" + TAIL)
+    limited.handset.place(BOARD, None)
+    limited.unreadable("ro.build.factory.id")
+    trace = limited.expect("(KEL-1_4.2.1)" + TAIL)
     trace.expect_none("amt_read_data_from_file()")
 
 
-def test_incremental_version_that_cannot_be_read(software: Software) -> None:
-    software.set(customer="BRENTA")
-    software.unreadable(0, -1, 0, -1)
-    software.expect_failure(-100, error_line("get_ap_sw_version", -100),
-                            "read ro.build.version.incremental error")
+def test_incremental_version_that_cannot_be_read(limited: Software) -> None:
+    limited.set(customer="BRENTA")
+    limited.unreadable("ro.build.version.incremental")
+    limited.expect_failure(-100, error_line("get_ap_sw_version", -100),
+                           "read ro.build.version.incremental error")
 
 
-def test_own_display_id_that_cannot_be_read(software: Software) -> None:
+def test_own_display_id_that_cannot_be_read(limited: Software) -> None:
     # Then nothing follows, and no file is missed.
-    software.handset.place(BOARD, None)
-    software.set(customer="BRENTA")
-    software.unreadable(0, 0, -1, 0, 0, -1)
-    trace = software.expect("ORLA 1.0.17")
+    limited.handset.place(BOARD, None)
+    limited.set(customer="BRENTA")
+    limited.unreadable("ro.build.display.vx.id")
+    trace = limited.expect("ORLA 1.0.17")
     trace.expect_none("amt_read_data_from_file()", "amt_read_emmc_info()", "amt_read_cm_info()")
 
 
