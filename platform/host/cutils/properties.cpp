@@ -37,11 +37,6 @@ uint32_t read_property(const char *key, char *value)
 
 STAND_IN_INTERFACE int property_get(const char *key, char *value, const char *default_value)
 {
-    stand_in_answer_st answer;
-    if (stand_in_take_answer("property_get", &answer) < 0) {
-        value[0] = '\0';
-        return 0;
-    }
     size_t length = read_property(key, value);
     if (length == 0 && default_value != nullptr) {
         length = strnlen(default_value, PROPERTY_VALUE_MAX - 1);

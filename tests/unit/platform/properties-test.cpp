@@ -40,16 +40,6 @@ TEST_F(properties_test, an_empty_property_is_unset)
     EXPECT_EQ(get("sys.usb.config", nullptr), "");
 }
 
-TEST_F(properties_test, that_cannot_be_read_has_no_default_either)
-{
-    write("properties/a", "1");
-    write("answers/property_get", "0\n-1\n-1\n0\n");
-    EXPECT_EQ(get("a", "0"), "1");
-    EXPECT_EQ(get("a", "0"), "");
-    EXPECT_EQ(get("none", "0"), "");
-    EXPECT_EQ(get("none", "0"), "0");
-}
-
 TEST_F(properties_test, a_line_end_of_the_file_is_not_part_of_the_value)
 {
     write("properties/a", "1\n");
