@@ -4,8 +4,6 @@
 #include <stdarg.h>
 #include <stdio.h>
 
-#include "platform/include/android/log.h"
-
 namespace {
 
 /* Holds the longest text there is: a whole 4096-byte receive area after its title. */
@@ -15,17 +13,21 @@ constexpr uint32_t FLAG_TEXT_SIZE = 32;
 /* Set while this thread is inside the platform's log, whose locks a signal handler must not meet again. */
 thread_local volatile bool t_is_logging = false;
 
-void write_record(const char *tag, const char *text)
+} // namespace
+
+bool pub_log_begin()
 {
     if (t_is_logging) {
-        return;
+        return false;
     }
     t_is_logging = true;
-    __android_log_print(ANDROID_LOG_DEBUG, tag, "%s", text);
-    t_is_logging = false;
+    return true;
 }
 
-} // namespace
+void pub_log_end()
+{
+    t_is_logging = false;
+}
 
 void pub_log_print(const char *tag, const char *format, ...)
 {
@@ -35,7 +37,7 @@ void pub_log_print(const char *tag, const char *format, ...)
     va_start(args, format);
     vsnprintf(text_a, sizeof(text_a), format, args);
     va_end(args);
-    write_record(tag, text_a);
+    pub_log_guarded([&] { __android_log_print(ANDROID_LOG_DEBUG, tag, "%s", text_a); });
     errno = saved_errno;
 }
 

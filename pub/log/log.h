@@ -1,7 +1,10 @@
 #pragma once
 
+#include <errno.h>
 #include <initializer_list>
 #include <stdint.h>
+
+#include "platform/include/android/log.h"
 
 /*
  * Every log text of the daemon and its library is made here: one record a call, at debug priority.
@@ -43,7 +46,24 @@ void pub_log_flags(const pub_log_source_st &source, std::initializer_list<bool> 
 /* Channel traffic: title, length and the first PUB_LOG_DUMP_SIZE bytes in hexadecimal. */
 void pub_log_dump(const pub_log_source_st &source, const char *title, const uint8_t *data, uint32_t length);
 
-#define PUB_LOG(source, ...)           pub_log_print((source).m_tag_ptr, __VA_ARGS__)
+/* Whether this thread may write a record now; if so, pub_log_end must follow it. */
+bool pub_log_begin();
+void pub_log_end();
+
+/* Runs print, which writes one record, unless it interrupts another record of the same thread. */
+template <typename print_func> void pub_log_guarded(print_func print)
+{
+    const int saved_errno = errno;
+    if (pub_log_begin()) {
+        print();
+        pub_log_end();
+    }
+    errno = saved_errno;
+}
+
+/* One record of free text. The platform's log formats it: doing so here first would cost as much again. */
+#define PUB_LOG(source, ...)                                                                                 \
+    pub_log_guarded([&] { __android_log_print(ANDROID_LOG_DEBUG, (source).m_tag_ptr, __VA_ARGS__); })
 #define PUB_LOG_ENTRY(source)          pub_log_entry(source, __func__)
 #define PUB_LOG_ERROR(source, code)    pub_log_error(source, __LINE__, __func__, code)
 #define PUB_LOG_SYS_CALL(source, call) pub_log_sys_call(source, call)
