@@ -1,14 +1,14 @@
 /*
  * What the daemon costs on the wire, beside what the wire costs by itself.
  *
- *   link-bench round-trip PC_FD REQUEST_HEX RESPONSE_HEX ROUNDS
- *       request to whole response over the PC line, against a bare process that answers the same bytes on a
- *       pseudo-terminal of its own
+ *   link-bench round-trip PC_FD REQUEST_HEX RESPONSE_HEX[,RESPONSE_HEX] ROUNDS
+ *       request to whole response over the PC line, against a bare process that answers the same bytes,
+ *       frame by frame, on a pseudo-terminal of its own
  *   link-bench pass-through PC_FD MODEM_FD BYTES ROUNDS
- *       bytes from the modem line to the PC line, BYTES of them as fast as they go and ROUNDS single lines
- * there and back, against socat between two pseudo-terminals link-bench exchange APP_FD REQUEST_HEX
- * RESPONSE_LENGTH BARE_FD BARE_REQUEST_HEX BARE_LENGTH ROUNDS a request over the app line that the modem
- * answers, against the bare exchange with the same modem
+ *       BYTES bytes from the modem line to the PC line as fast as they go, and ROUNDS single lines in each
+ *       direction, against socat between two pseudo-terminals
+ *   link-bench exchange APP_FD REQUEST_HEX LENGTH BARE_FD BARE_REQUEST_HEX BARE_LENGTH ROUNDS
+ *       a request over the app line that the modem answers, against the bare exchange with the same modem
  *
  * The descriptors are the far (master) ends of the handset's lines, inherited. The two sides take turns, so
  * that a change of the machine's speed hits both. Prints one JSON object.
@@ -19,6 +19,7 @@
 #include <fcntl.h>
 #include <poll.h>
 #include <signal.h>
+#include <stddef.h>
 #include <stdint.h>
 #include <stdio.h>
 #include <stdlib.h>
@@ -36,7 +37,7 @@ namespace {
 using clock_type = std::chrono::steady_clock;
 using sample_list = std::vector<double>;
 
-constexpr int TURNS = 20;
+constexpr int TURNS = 50;
 constexpr int WARM_UP_ROUNDS = 50;
 constexpr int ANSWER_TIMEOUT_MS = 5000;
 
@@ -115,17 +116,34 @@ void end_child(pid_t pid)
     waitpid(pid, nullptr, 0);
 }
 
-/* The bare process: reads a request, writes the response, nothing else. */
-[[noreturn]] void answer_for_ever(int fd, size_t request_length, const std::string &response)
+using frame_list = std::vector<std::string>;
+
+/* Frames in hexadecimal, separated by commas. */
+frame_list split_frames(const std::string &text)
+{
+    frame_list frames;
+    size_t start = 0;
+    for (size_t comma = text.find(','); comma != std::string::npos; comma = text.find(',', start)) {
+        frames.push_back(from_hex(text.substr(start, comma - start).c_str()));
+        start = comma + 1;
+    }
+    frames.push_back(from_hex(text.substr(start).c_str()));
+    return frames;
+}
+
+/* The bare process: reads a request, writes the response's frames, nothing else. */
+[[noreturn]] void answer_for_ever(int fd, size_t request_length, const frame_list &response)
 {
     prctl(PR_SET_PDEATHSIG, SIGKILL);
     for (;;) {
         read_whole(fd, request_length);
-        write_whole(fd, response.data(), response.size());
+        for (const std::string &frame : response) {
+            write_whole(fd, frame.data(), frame.size());
+        }
     }
 }
 
-pid_t start_bare_answerer(const std::string &path, size_t request_length, const std::string &response)
+pid_t start_bare_answerer(const std::string &path, size_t request_length, const frame_list &response)
 {
     const int slave = open(path.c_str(), O_RDWR | O_NOCTTY);
     const pid_t pid = fork();
@@ -164,6 +182,28 @@ double get_percentile(sample_list samples, double part)
     return samples[static_cast<size_t>(part * static_cast<double>(samples.size() - 1))];
 }
 
+sample_list get_turn_medians(const sample_list &samples)
+{
+    const size_t turn_size = samples.size() / TURNS;
+    sample_list medians;
+    for (size_t start = 0; start + turn_size <= samples.size(); start += turn_size) {
+        const auto first = samples.begin() + static_cast<ptrdiff_t>(start);
+        medians.push_back(get_percentile(sample_list(first, first + static_cast<ptrdiff_t>(turn_size)), 0.5));
+    }
+    return medians;
+}
+
+/* The median, over all turns, of one side's median over the other's in the same turn. */
+double get_paired_ratio(const sample_list &ours, const sample_list &theirs)
+{
+    sample_list ratios = get_turn_medians(ours);
+    const sample_list their_medians = get_turn_medians(theirs);
+    for (size_t i = 0; i < ratios.size(); i++) {
+        ratios[i] /= their_medians[i];
+    }
+    return get_percentile(ratios, 0.5);
+}
+
 void print_samples(const char *name, const sample_list &samples)
 {
     printf("\"%s\": {\"median_us\": %.2f, \"p99_us\": %.2f, \"rounds\": %zu}", name,
@@ -195,6 +235,7 @@ void compare_roads(const char *name, const road_st &daemon, const char *bare_nam
     print_samples(name, samples_a[0]);
     printf(", ");
     print_samples(bare_name, samples_a[1]);
+    printf(", \"paired_ratio\": %.3f", get_paired_ratio(samples_a[0], samples_a[1]));
 }
 
 /* Megabytes a second from one end to the other. The sender runs beside the receiver, as the lines hold
@@ -213,14 +254,18 @@ int run_round_trip(char **argv)
 {
     const int pc_fd = atoi(argv[2]);
     const std::string request = from_hex(argv[3]);
-    const std::string response = from_hex(argv[4]);
+    const frame_list response = split_frames(argv[4]);
+    size_t response_length = 0;
+    for (const std::string &frame : response) {
+        response_length += frame.size();
+    }
     make_blocking(pc_fd);
     std::string path;
     const int bare_fd = open_pty(&path);
     const pid_t pid = start_bare_answerer(path, request.size(), response);
     printf("{");
-    compare_roads("daemon", {pc_fd, pc_fd, request, response.size()}, "bare",
-                  {bare_fd, bare_fd, request, response.size()}, atoi(argv[5]));
+    compare_roads("daemon", {pc_fd, pc_fd, request, response_length}, "bare",
+                  {bare_fd, bare_fd, request, response_length}, atoi(argv[5]));
     printf("}\n");
     end_child(pid);
     return 0;
