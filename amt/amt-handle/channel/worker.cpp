@@ -102,7 +102,7 @@ void amt_worker_stop(amt_worker_st *worker_ptr)
 
 void amt_worker_leave(amt_worker_st *worker_ptr)
 {
-    if (worker_ptr->m_id.exchange(0) != 0) {
+    if (worker_ptr->m_id.exchange(0) != 0 || worker_ptr->m_is_alive == 0) {
         return;
     }
     for (;;) {
