@@ -158,7 +158,8 @@ TEST(check_run, process_that_is_gone)
 {
     const temp_folder_c dir;
     /* The longest number that is read is as wide as the machine's long allows. */
-    for (const std::string &pid : {std::string("2147483647"), std::to_string(LONG_MAX / 10), std::string("-5")}) {
+    for (const std::string &pid :
+         {std::string("2147483647"), std::to_string(LONG_MAX / 10), std::string("-5")}) {
         const std::string pid_file = write_pid_file(dir, pid);
         const check_run_st run = check_run(pid_file, "some-daemon");
         expect_not_running(run);
