@@ -17,6 +17,20 @@ constexpr int32_t PAUSE_MS = 1000;
 /* Only a UART has a speed; the modem may also hang on a USB or a virtual tty. */
 constexpr char UART_PREFIX[] = "/dev/ttyS";
 
+/*
+ * Puts a new tty in an old one's place. The descriptor keeps its number: another thread may be about to read
+ * from it, and would read from a stranger that got the number after a close.
+ */
+void replace_tty(std::atomic<int> *fd_ptr, int fd)
+{
+    const int old_fd = *fd_ptr;
+    if (old_fd > 0 && dup3(fd, old_fd, O_CLOEXEC) == old_fd) {
+        close(fd);
+        return;
+    }
+    *fd_ptr = fd;
+}
+
 bool is_uart(const char *path)
 {
     return strncmp(path, UART_PREFIX, sizeof(UART_PREFIX) - 1) == 0;
@@ -32,10 +46,7 @@ int amt_tty_open(std::atomic<int> *fd_ptr, const char *path, int32_t attempts)
     if (status != PUB_ERR_NONE) {
         return status;
     }
-    const int old_fd = fd_ptr->exchange(fd);
-    if (old_fd > 0) {
-        close(old_fd);
-    }
+    replace_tty(fd_ptr, fd);
     return PUB_ERR_NONE;
 }
 

@@ -8,8 +8,8 @@ constexpr int32_t AMT_TTY_ATTEMPTS = 60;    /* PC port and modem data tty */
 constexpr int32_t AMT_TTY_AT_ATTEMPTS = 30; /* AT-mux tty */
 
 /*
- * Opens the tty read-write and makes it *fd_ptr's. A descriptor that was open stays in place until the new
- * one is there, because other threads read from it, and is closed then; on failure it is left as it is.
+ * Opens the tty read-write and makes it *fd_ptr's. A descriptor that was open keeps its number and gets the
+ * new tty once that is there, because other threads read from it; on failure it is left as it is.
  * Returns 0 or the error of pub_util_try_to_open_device.
  */
 int amt_tty_open(std::atomic<int> *fd_ptr, const char *path, int32_t attempts);

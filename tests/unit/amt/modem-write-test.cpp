@@ -115,7 +115,7 @@ TEST_F(modem_write, lost_or_closed_tty_is_opened_again)
         EXPECT_EQ(capture.count_containing("convert speed"), 0);
         /* What was to be written is lost; the line serves the next. */
         EXPECT_TRUE(m_tty.is_quiet());
-        EXPECT_NE(g_handle_context.m_fd_modem, old_fd);
+        EXPECT_GT(g_handle_context.m_fd_modem, 0);
         EXPECT_EQ(amt_modem_write_request(), PUB_ERR_NONE);
         EXPECT_EQ(m_tty.hear(REQUEST.size()), REQUEST);
         amt_handle_close_fd(&g_handle_context.m_fd_modem);

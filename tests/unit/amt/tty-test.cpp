@@ -56,13 +56,31 @@ TEST_F(tty, is_opened_for_both_directions)
     EXPECT_STREQ(text_a, "fro");
 }
 
-TEST_F(tty, opened_again_replaces_the_first)
+TEST_F(tty, opened_again_takes_the_place_of_the_first)
 {
     ASSERT_EQ(amt_tty_open(&m_fd, m_tty.path().c_str(), 1), PUB_ERR_NONE);
     const int first = m_fd;
-    ASSERT_EQ(amt_tty_open(&m_fd, m_tty.path().c_str(), 1), PUB_ERR_NONE);
-    EXPECT_NE(m_fd, first);
-    EXPECT_FALSE(is_open(first));
+    const modem_pty_c other_tty;
+    const int unused = dup(first); /* the number that a second descriptor would get, were one kept */
+    close(unused);
+    ASSERT_EQ(amt_tty_open(&m_fd, other_tty.path().c_str(), 1), PUB_ERR_NONE);
+    EXPECT_EQ(m_fd, first) << "another thread may be about to read from that number";
+    EXPECT_EQ(fcntl(m_fd, F_GETFD), FD_CLOEXEC);
+    EXPECT_EQ(write(m_fd, "to", 2), 2);
+    EXPECT_EQ(other_tty.hear(2), "to");
+    EXPECT_TRUE(m_tty.is_quiet());
+    EXPECT_FALSE(is_open(unused));
+}
+
+TEST_F(tty, opened_again_revives_a_closed_number)
+{
+    for (const int number : {0, -1, 900}) {
+        m_fd = number;
+        ASSERT_EQ(amt_tty_open(&m_fd, m_tty.path().c_str(), 1), PUB_ERR_NONE);
+        EXPECT_TRUE(is_open(m_fd));
+        EXPECT_EQ(m_fd == 900, number == 900);
+        amt_handle_close_fd(&m_fd);
+    }
 }
 
 TEST_F(tty, that_cannot_be_opened_leaves_the_first)
