@@ -88,6 +88,7 @@ def all_suites() -> list[Suite]:
         Suite("unit", "release", ctest("release"), {}),
         Suite("station", "", pytest("tests/station", "tests/scripts", "-n", "4"), {}),
         Suite("system", "release", system("release", SYSTEM_WORKERS), {}),
+        Suite("soak", "release", pytest("tests/soak"), {}),
     ]
     for preset in ("asan", "tsan"):
         suites.append(Suite(f"unit-{preset}", preset, ctest(preset), {}))
