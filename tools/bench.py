@@ -11,10 +11,14 @@ from pathlib import Path
 from typing import Any
 
 from simulator import Handset
+from simulator.inside.modem import Modem
+from simulator.inside.modem_table import IDENTITIES
 from station import wire
+from tools.bare_modem import bare_modem
 
 BUILD = Path("build/release")
 ROUNDS = "4000"
+EXCHANGE_ROUNDS = "2000"
 THROUGHPUT_BYTES = "40000000"
 
 # What is aimed at: the daemon's figure over the bare one's.
@@ -80,21 +84,26 @@ def bench_pass_through(handset: Handset) -> None:
 
 def bench_exchange() -> None:
     """A request of the app that the modem answers, against the bare exchange with that modem."""
-    with Handset("packet") as handset:
+    request, command = wire.Packet(7), b"AT^DTTEST=07\r"
+    answer = Modem().answer_line(command.decode())
+    imei = wire.Atom.raw(21, IDENTITIES["0"]["imei"].encode())
+    response = wire.Packet(8, (wire.Atom.integer(wire.RESULT_ATOM, 0), imei)).encode()
+    with Handset("packet") as handset, bare_modem() as bare:
         handset.wait_ready()
         app = handset.app.fileno()
-        request = wire.Packet(7, ()).encode()
-        handset.app.write(request)
-        answer = handset.app.read_until(bytes([0xBB, 8]))[:0] + handset.app.read_all()
-        length = len(answer) + 4
-        with Handset("pc") as other:
-            other.wait_ready()
-            text = b"AT^DTTEST=07\r"
-            line = other.bare_modem()
-            os.write(line, text)
-            bare = len(other.read_bare(line))
-            figures = run_link_bench(["exchange", str(app), request.hex(), str(length), str(line),
-                                      text.hex(), str(bare), "2000"], (app, line))
+        # Once by hand: what is timed below must be the whole answer, and the right one.
+        handset.app.write(request.encode())
+        if handset.app.read_exactly(len(response)) != response:
+            sys.exit("dev: the app did not get the modem's IMEI")
+        os.write(bare, command)
+        said = b""
+        while len(said) < len(answer):
+            said += os.read(bare, len(answer) - len(said))
+        if said != answer:
+            sys.exit("dev: the bare modem says something else than the handset's")
+        figures = run_link_bench(["exchange", str(app), request.encode().hex(),
+                                  str(len(response)), str(bare), command.hex(),
+                                  str(len(answer)), EXCHANGE_ROUNDS], (app, bare))
     head("Tunnel round trip on the app line, against the bare exchange with the modem", "bare")
     show("READIMEI through the tunnel", figures, "daemon", "bare", None)
 
@@ -138,6 +147,7 @@ def main() -> int:
         bench_round_trips(handset)
         bench_pass_through(handset)
         show_size(handset)
+    bench_exchange()
     print("\nLeft out, because a described pause is part of them: every write of a factory file"
           "\n(two pauses of 50 ms), power-off (2 s), the battery ADC (20 ms).")
     return 0
