@@ -15,3 +15,11 @@ if(VX_COVERAGE)
   add_compile_options(--coverage -fprofile-update=atomic -g -O0)
   add_link_options(--coverage)
 endif()
+
+# A program that ends by _exit writes its counts first.
+function(vx_count_at_exit target)
+  if(VX_COVERAGE)
+    target_sources(${target} PRIVATE ${CMAKE_SOURCE_DIR}/cmake/coverage-exit.cpp)
+    target_link_options(${target} PRIVATE -Wl,--wrap=_exit)
+  endif()
+endfunction()

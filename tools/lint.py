@@ -99,7 +99,7 @@ def is_shell(path: Path) -> bool:
 
 def check_format(files: list[str]) -> Verdict:
     """Is every C++ file as clang-format lays it out?"""
-    return plain(cpp_files(files, ".cpp", ".h"), ["clang-format", "--dry-run", "-Werror"])
+    return plain(of_kind(files, ".cpp", ".h"), ["clang-format", "--dry-run", "-Werror"])
 
 
 @lru_cache(maxsize=None)
