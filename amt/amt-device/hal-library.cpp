@@ -10,8 +10,11 @@ namespace {
 int fail_load(int line, const char *func)
 {
     const char *text = dlerror();
-    return amt_device_fail(g_amt_device_log, line, func, PUB_ERR_FILE, "call dlopen fail: - %s",
-                           text == nullptr ? "" : text);
+    const int status = amt_device_fail(g_amt_device_log, line, func, PUB_ERR_FILE, "call dlopen fail: - %s",
+                                       text == nullptr ? "" : text);
+    /* Lets go of the text now: at the thread's end that would happen inside a signal handler. */
+    dlerror();
+    return status;
 }
 
 } // namespace
