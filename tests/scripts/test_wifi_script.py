@@ -188,13 +188,16 @@ def test_reception_step_fails(bench: Bench, index: int) -> None:
     """A failing step ends the script, but for the disassociation and the rate set."""
     step = RX_STEPS[index]
     run = bench.run("12", "6", "11", failure=step, first_failure=index + 1)
+    lines = [RX_RATESET_LINE if done == "rateset 11b" else line
+             for done, line in zip(RX_STEPS, ok_lines(RX_STEPS))]
     if step in ("disassoc", "rateset 11b"):
         assert run.status == 0
         assert run.calls == RX_STEPS
-        assert len(run.lines) == 3 + len(RX_STEPS) - 1
+        assert run.lines[3:] == lines[:index] + lines[index + 1:]
         return
     assert run.status == 1
     assert run.calls == RX_STEPS[:index + 1]
+    assert run.lines[3:] == lines[:index]
 
 
 def test_stop_transmission(bench: Bench) -> None:
