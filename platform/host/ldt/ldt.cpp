@@ -77,7 +77,8 @@ STAND_IN_INTERFACE int32_t ldt_gpsCtrl(int32_t operation, int32_t index, int32_t
 {
     stand_in_answer_st answer;
     const int32_t status = stand_in_take_answer("ldt_gpsCtrl", &answer);
-    store(answer, 0, index + 1, svid_out);
+    /* Any index of a station is counted on, the largest too. */
+    store(answer, 0, static_cast<int32_t>(static_cast<uint32_t>(index) + 1), svid_out);
     store(answer, 1, PLAUSIBLE_CNR, cnr_out);
     char arguments_a[ARGUMENTS_SIZE];
     snprintf(arguments_a, sizeof(arguments_a), "%d, %d, %s, %s", operation, index, shown(svid_out),
