@@ -3,8 +3,6 @@
 import re
 import time
 
-import pytest
-
 from conftest import HandsetFactory
 from simulator import Handset
 from simulator.waiting import scaled
@@ -81,14 +79,13 @@ def test_emmc_information(pc: PcChannel) -> None:
 # connectivity, Bluetooth
 
 
-@pytest.mark.parametrize("number, function", [(0, "ldt_wifiCheck"), (1, "ldt_gpsCheck"),
-                                              (3, "ldt_btCheck")])
-def test_connectivity_check(pc: PcChannel, number: int, function: str) -> None:
-    pc.handset.answer(function, "0", "-3", "1")
-    trace = Trace(pc.handset)
-    for answer in (OK, ERROR, ERROR):
-        pc.at(f"AT^DDEVCONNCHK={number}", answer)
-    assert trace.calls() == [f"{function}() = {code}" for code in (0, -3, 1)]
+def test_connectivity_check(pc: PcChannel) -> None:
+    for number, function in ((0, "ldt_wifiCheck"), (1, "ldt_gpsCheck"), (3, "ldt_btCheck")):
+        pc.handset.answer(function, "0", "-3", "1")
+        trace = Trace(pc.handset)
+        for answer in (OK, ERROR, ERROR):
+            pc.at(f"AT^DDEVCONNCHK={number}", answer)
+        assert trace.calls() == [f"{function}() = {code}" for code in (0, -3, 1)]
 
 
 def test_connectivity_check_of_nothing(pc: PcChannel) -> None:
@@ -188,18 +185,18 @@ def test_wifi_transmission_takes_the_low_bits(pc: PcChannel) -> None:
                  "WIFI-TX-start start. channel:255; power:-1; rate:65535(will multi 100)")
 
 
-@pytest.mark.parametrize("switch, test, operands, calls", [
-    ("-1", "0", "1,6,540,15", ["ldt_wifiCtrl(1) = -1"]),
-    ("0", "-2", "1,6,540,15", ["ldt_wifiCtrl(1) = 0", "ldt_TxTest(1, 15, 540, 6) = -2"]),
-    ("0", "4", "0", ["ldt_TxTest(0, 0, 0, 0) = 4", "ldt_wifiCtrl(0) = 0"]),
-    ("6", "0", "0", ["ldt_TxTest(0, 0, 0, 0) = 0", "ldt_wifiCtrl(0) = 6"]),
-    ("0", "0", "2", []), ("0", "0", "-1,6,540,15", []), ("0", "0", "10", [])])
-def test_wifi_transmission_failures(make_handset: HandsetFactory, switch: str, test: str,
-                                    operands: str, calls: list[str]) -> None:
-    handset = make_handset("pc", answers={"ldt_wifiCtrl": switch, "ldt_TxTest": test})
-    trace = Trace(handset)
-    PcChannel(handset).at(f"AT^DWLTSD={operands}", ERROR)
-    assert trace.calls() == calls
+def test_wifi_transmission_failures(pc: PcChannel) -> None:
+    for switch, test, operands, calls in (
+            ("-1", "0", "1,6,540,15", ["ldt_wifiCtrl(1) = -1"]),
+            ("0", "-2", "1,6,540,15", ["ldt_wifiCtrl(1) = 0", "ldt_TxTest(1, 15, 540, 6) = -2"]),
+            ("0", "4", "0", ["ldt_TxTest(0, 0, 0, 0) = 4", "ldt_wifiCtrl(0) = 0"]),
+            ("6", "0", "0", ["ldt_TxTest(0, 0, 0, 0) = 0", "ldt_wifiCtrl(0) = 6"]),
+            ("0", "0", "2", []), ("0", "0", "-1,6,540,15", []), ("0", "0", "10", [])):
+        pc.handset.answer("ldt_wifiCtrl", switch)
+        pc.handset.answer("ldt_TxTest", test)
+        trace = Trace(pc.handset)
+        pc.at(f"AT^DWLTSD={operands}", ERROR)
+        assert trace.calls() == calls
 
 
 def test_wifi_transmission_without_an_operand(pc: PcChannel) -> None:
