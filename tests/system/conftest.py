@@ -32,7 +32,8 @@ class Workshop:
     """Makes handsets, keeps them in a node's stash for the reports, and takes them down."""
 
     def __init__(self, node: pytest.Item | pytest.Collector, build: "str | Path") -> None:
-        self._made = node.stash.setdefault(HANDSETS, [])
+        none: list[Handset] = []
+        self._made = node.stash.setdefault(HANDSETS, none)
         self._build = build
 
     def make(self, path: str = "pc", ready: bool = True, **options: Any) -> Handset:

@@ -157,7 +157,7 @@ def test_calibration(pc: PcChannel) -> None:
 
 def test_calibration_command_is_cut_at_99_characters(pc: PcChannel) -> None:
     before = pc.handset.text(DRIVER)
-    text = calibrated(pc, *[LOWEST] * 4, *calibration(*[LOWEST] * 4))
+    text = calibrated(pc, LOWEST, LOWEST, LOWEST, LOWEST, *calibration(*[LOWEST] * 4))
     assert pc.handset.text(DRIVER) == before
     cut = DRIVER[:99 - len(f'echo "{text}" > ')]
     assert cut == "/proc/driver/sarvo_ba"

@@ -92,6 +92,10 @@ def test_probe_inside_a_packet_at_any_place(pc: PcChannel) -> None:
     expect_served(pc)
 
 
+def wait_another_start(handset: Handset, before: int) -> None:
+    wait_until(lambda: handset.pid not in (0, before) or None, "another start")
+
+
 def test_probe_inside_an_atom(pc: PcChannel) -> None:
     handset = pc.handset
     handset.place(WIFI_FILE, "12:34\n")
@@ -106,7 +110,7 @@ def test_probe_inside_an_atom(pc: PcChannel) -> None:
         pc.send(READ_WIFI[:place] + PROBE + READ_WIFI[place:])
         pc.expect_acknowledgement()
         assert handset.wait_exit(ended) == -signal.SIGABRT
-        wait_until(lambda before=first: handset.pid not in (0, before) or None, "another start")
+        wait_another_start(handset, first)
         handset.wait_ready()
         expect_served(pc)
 

@@ -59,7 +59,8 @@ def _unescape(text: str) -> str:
 
 def _tokens(text: str) -> list[str]:
     """The words of a line; what is quoted is one word, and a # begins a comment."""
-    words, place = [], 0
+    words: list[str] = []
+    place = 0
     while True:
         while place < len(text) and text[place].isspace():
             place += 1

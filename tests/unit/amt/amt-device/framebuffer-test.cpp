@@ -30,7 +30,6 @@ using testing::IsEmpty;
 constexpr uint32_t WIDTH = 360;
 constexpr uint32_t HEIGHT = 400;
 constexpr uint32_t PAGE_STEP = WIDTH * HEIGHT * 4;
-constexpr uint32_t PAGE_SIZE = WIDTH * HEIGHT * 2;
 constexpr uint32_t MEMORY_SIZE = 2 * PAGE_STEP;
 
 struct screen_st
