@@ -12,6 +12,12 @@
 
 namespace {
 
+/*
+ * It only waits. The C library keeps the stacks of ended threads for the next ones up to a limit, beyond
+ * which the end of any thread frees some; small ones stay below it however many children end at once.
+ */
+constexpr size_t STACK_SIZE = 64 * 1024;
+
 void wait_for(pid_t child_pid)
 {
     while (waitpid(child_pid, nullptr, 0) < 0 && errno == EINTR) {
@@ -30,6 +36,7 @@ int start_reaper(pid_t child_pid)
     pthread_attr_t attributes;
     pthread_attr_init(&attributes);
     pthread_attr_setdetachstate(&attributes, PTHREAD_CREATE_DETACHED);
+    pthread_attr_setstacksize(&attributes, STACK_SIZE);
     pthread_t id;
     /* NOLINTNEXTLINE(performance-no-int-to-ptr): a number that travels as a pointer, never followed */
     void *argument = reinterpret_cast<void *>(static_cast<intptr_t>(child_pid));
