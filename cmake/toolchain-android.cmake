@@ -20,12 +20,4 @@ endif()
 # The daemon uses no C++ runtime that would have to be installed beside it.
 set(ANDROID_STL c++_static)
 
-# The platform's own libraries, which no NDK brings: where liblog.so, libcutils.so and libldt.so of the handset lie.
-if(NOT VX_PLATFORM_LIBS)
-  set(VX_PLATFORM_LIBS "$ENV{VX_PLATFORM_LIBS}")
-endif()
-if(VX_PLATFORM_LIBS)
-  set(CMAKE_EXE_LINKER_FLAGS_INIT "-L${VX_PLATFORM_LIBS}")
-endif()
-
 include("${VX_NDK_TOOLCHAIN}")
