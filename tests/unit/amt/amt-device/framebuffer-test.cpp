@@ -62,7 +62,9 @@ struct screen_st
         const off_t left = (WIDTH - AMT_PICTURE_WIDTH) / 2;
         const off_t top = (HEIGHT - AMT_PICTURE_HEIGHT) / 2;
         uint8_t byte = 0;
-        EXPECT_EQ(pread(m_fd, &byte, 1, off_t{y_offset} * WIDTH * 4 + (left + top * off_t{WIDTH}) * 2), 1);
+        EXPECT_EQ(
+            pread(m_fd, &byte, 1, static_cast<off_t>(y_offset) * WIDTH * 4 + (left + top * off_t{WIDTH}) * 2),
+            1);
         return byte;
     }
 
