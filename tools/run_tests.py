@@ -7,7 +7,7 @@ import subprocess
 import sys
 import time
 import xml.etree.ElementTree as ElementTree
-from dataclasses import dataclass
+from dataclasses import dataclass, field
 from pathlib import Path
 from typing import Callable
 
@@ -15,11 +15,11 @@ PROJECT = Path(__file__).resolve().parents[1]
 RESULTS = PROJECT / "build" / "test-results"
 
 # Most of a system test is waiting for a described pause, so more of them than cores run at once.
-SYSTEM_WORKERS = 4 * (os.cpu_count() or 1)
+SYSTEM_WORKERS = 6 * (os.cpu_count() or 1)
 
 # A sanitized daemon is several times slower, and so is a machine that runs several of them.
 SANITIZED_PATIENCE = "4"
-SANITIZED_WORKERS = 2 * (os.cpu_count() or 1)
+SANITIZED_WORKERS = 4 * (os.cpu_count() or 1)
 
 
 @dataclass
@@ -47,7 +47,10 @@ class Suite:
     name: str
     preset: str
     command: Callable[[Path], list[str]]
-    environment: dict[str, str]
+    environment: dict[str, str] = field(default_factory=dict)
+    target: str = "all"
+    # Run only when asked for by name.
+    is_extra: bool = False
 
 
 def read_count(report: Path) -> Count:
@@ -85,16 +88,17 @@ def system(preset: str, workers: int) -> Callable[[Path], list[str]]:
 def all_suites() -> list[Suite]:
     """Every suite, in the order in which they run."""
     suites = [
-        Suite("unit", "release", ctest("release"), {}),
-        Suite("station", "", pytest("tests/station", "tests/scripts", "-n", "4"), {}),
-        Suite("system", "release", system("release", SYSTEM_WORKERS), {}),
-        Suite("soak", "release", pytest("tests/soak"), {}),
+        Suite("unit", "release", ctest("release")),
+        Suite("station", "", pytest("tests/station", "tests/scripts", "-n", "4")),
+        Suite("system", "release", system("release", SYSTEM_WORKERS), target="handset"),
+        Suite("soak", "release", pytest("tests/soak"), target="handset"),
     ]
     for preset in ("asan", "tsan"):
-        suites.append(Suite(f"unit-{preset}", preset, ctest(preset), {}))
         suites.append(Suite(f"system-{preset}", preset, system(preset, SANITIZED_WORKERS),
-                            {"HANDSET_TIME_SCALE": SANITIZED_PATIENCE}))
-    suites.append(Suite("fuzz", "fuzz", pytest("tests/fuzz", "-n", "2"), {}))
+                            {"HANDSET_TIME_SCALE": SANITIZED_PATIENCE}, target="handset"))
+    suites.append(Suite("fuzz", "fuzz", pytest("tests/fuzz", "-n", "2")))
+    for preset in ("asan", "tsan"):
+        suites.append(Suite(f"unit-{preset}", preset, ctest(preset), is_extra=True))
     return suites
 
 
@@ -103,14 +107,15 @@ def say(text: str) -> None:
     print(f"\n== {text}", file=sys.stderr, flush=True)
 
 
-def build(preset: str) -> bool:
-    """Build a preset the way everybody does."""
-    return subprocess.run([str(PROJECT / "dev"), "build", preset], check=False).returncode == 0
+def build(preset: str, target: str) -> bool:
+    """Build a target of a preset the way everybody does."""
+    command = [str(PROJECT / "dev"), "build", preset, "--target", target]
+    return subprocess.run(command, check=False).returncode == 0
 
 
 def run(suite: Suite) -> Count:
     """Run one suite. A runner that ends badly without a failed test counts as one."""
-    if suite.preset and not build(suite.preset):
+    if suite.preset and not build(suite.preset, suite.target):
         return Count(failed=1)
     report = RESULTS / f"{suite.name}.xml"
     report.unlink(missing_ok=True)
@@ -133,14 +138,16 @@ def choose(names: list[str]) -> list[Suite]:
     for name in names:
         if name not in known:
             sys.exit(f"dev: no such suite: {name} (there are: {', '.join(known)})")
-    return [suite for suite in suites if not names or suite.name in names]
+    return [suite for suite in suites
+            if (suite.name in names if names else not suite.is_extra)]
 
 
 def main() -> int:
     """Run the chosen suites and print one line that counts them all."""
     parser = argparse.ArgumentParser(prog="./dev test", description="Run the tests.")
-    parser.add_argument("suite", nargs="*", help="only these: "
-                        + ", ".join(suite.name for suite in all_suites()))
+    parser.add_argument("suite", nargs="*", help="only these: " + ", ".join(
+        suite.name + (" (not run unless named)" if suite.is_extra else "")
+        for suite in all_suites()))
     suites = choose(parser.parse_args().suite)
     shutil.rmtree(RESULTS, ignore_errors=True)
     RESULTS.mkdir(parents=True)
