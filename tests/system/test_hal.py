@@ -131,8 +131,7 @@ def test_idle(make_handset: HandsetFactory, path: str) -> None:
     assert not is_loaded(channel.handset)
 
 
-@both_lines
-@pytest.mark.parametrize("status", [1, -1])
+@pytest.mark.parametrize("path, status", [("packet", 1), ("packet", -118), ("pc", -1)])
 def test_idle_fails(make_handset: HandsetFactory, path: str, status: int) -> None:
     channel = PATHS[path](make_handset(path, answers={"enter_idle": str(status)}))
     trace = HandlerTrace(channel.handset)
