@@ -16,7 +16,7 @@ namespace {
  * It only waits. The C library keeps the stacks of ended threads for the next ones up to a limit, beyond
  * which the end of any thread frees some; small ones stay below it however many children end at once.
  */
-constexpr size_t STACK_SIZE = 64 * 1024;
+constexpr size_t STACK_SIZE = size_t{64} * 1024;
 
 void wait_for(pid_t child_pid)
 {
