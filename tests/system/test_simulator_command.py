@@ -151,9 +151,10 @@ def test_the_app_port_follows_its_programs(up) -> None:
     """A program that closes the port is an app that ends; the next one is served."""
     up("--path", "packet")
     status = json.loads(output("status", "--json"))
-    for _ in range(5):
+    for visits in range(1, 6):
         assert talk(status["app"], wire.Packet(29).encode(), b"\x1e")
-    wait_for(lambda: output("log").count("pty disconnect: pts name") == 5)
+        # A port that is closed and opened within a moment may look as if it had stayed open.
+        wait_for(lambda: output("log").count("pty disconnect: pts name") == visits)
 
 
 def test_a_person_speaks_as_the_modem(up) -> None:
