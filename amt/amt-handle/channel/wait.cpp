@@ -30,13 +30,19 @@ int wait_for(int fd, bool is_to_write, int timeout_ms)
         errno = EBADF;
         return -1;
     }
-    fd_set fds;
-    FD_ZERO(&fds);
-    FD_SET(fd, &fds);
-    timeval timeout = {timeout_ms / 1000, (timeout_ms % 1000) * 1000L};
-    return wait_open_to_end([&] {
-        return select(fd + 1, is_to_write ? nullptr : &fds, is_to_write ? &fds : nullptr, nullptr, &timeout);
-    });
+    timeval left = {timeout_ms / 1000, (timeout_ms % 1000) * 1000L};
+    for (;;) {
+        fd_set fds;
+        FD_ZERO(&fds);
+        FD_SET(fd, &fds);
+        const int ready = wait_open_to_end([&] {
+            return select(fd + 1, is_to_write ? nullptr : &fds, is_to_write ? &fds : nullptr, nullptr, &left);
+        });
+        if (ready >= 0 || errno != EINTR) {
+            return ready;
+        }
+        pub_util_sleep_ms(0); /* a sanitizer holds the signal's handler back until such a call */
+    }
 }
 
 } // namespace

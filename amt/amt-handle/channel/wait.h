@@ -11,7 +11,10 @@
 /* read(2), taken up again when a signal has interrupted it. */
 ssize_t amt_wait_read(int fd, void *buf, size_t size);
 
-/* Waits until fd is readable. Returns what select(2) returns: 1, 0 after timeout_ms milliseconds, or -1. */
+/*
+ * Waits until fd is readable; a signal does not end the wait. Returns what select(2) returns: 1, 0 after
+ * timeout_ms milliseconds, or -1.
+ */
 int amt_wait_readable(int fd, int timeout_ms);
 
 /* Waits until fd is writable, as amt_wait_readable. */

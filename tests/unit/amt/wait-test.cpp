@@ -106,27 +106,66 @@ TEST_F(wait_on_pipe, read_takes_what_is_there)
     EXPECT_STREQ(text_a, "efcd");
 }
 
-TEST_F(wait_on_pipe, read_goes_on_after_a_signal)
+/* While this lives a signal comes every 20 ms, whose handler interrupts system calls. */
+class frequent_signal_c {
+public:
+    explicit frequent_signal_c(void (*handler)(int))
+    {
+        struct sigaction action = {};
+        action.sa_handler = handler;
+        EXPECT_EQ(sigaction(SIGALRM, &action, nullptr), 0);
+        const itimerval often = {{0, 20000}, {0, 20000}};
+        EXPECT_EQ(setitimer(ITIMER_REAL, &often, nullptr), 0);
+    }
+    ~frequent_signal_c()
+    {
+        const itimerval never = {};
+        setitimer(ITIMER_REAL, &never, nullptr);
+        signal(SIGALRM, SIG_DFL);
+    }
+    frequent_signal_c(const frequent_signal_c &) = delete;
+    frequent_signal_c &operator=(const frequent_signal_c &) = delete;
+};
+
+volatile sig_atomic_t g_signal_count = 0;
+int g_signal_fd = -1;
+
+void count_signal(int)
 {
-    static int g_fd = -1;
-    g_fd = m_fd_a[1];
-    struct sigaction action = {};
-    action.sa_handler = [](int) {
-        static int count = 0;
-        if (++count == 3) {
-            const ssize_t ignored = write(g_fd, "y", 1);
-            static_cast<void>(ignored);
-        }
-    };
-    ASSERT_EQ(sigaction(SIGALRM, &action, nullptr), 0); /* interrupts system calls */
-    const itimerval often = {{0, 20000}, {0, 20000}};
-    const itimerval never = {};
-    ASSERT_EQ(setitimer(ITIMER_REAL, &often, nullptr), 0);
+    g_signal_count = g_signal_count + 1;
+}
+
+void say_at_the_third_signal(int)
+{
+    count_signal(SIGALRM);
+    if (g_signal_count == 3) {
+        const ssize_t ignored = write(g_signal_fd, "y", 1);
+        static_cast<void>(ignored);
+    }
+}
+
+TEST_F(wait_on_pipe, goes_on_after_a_signal)
+{
+    g_signal_fd = m_fd_a[1];
+    g_signal_count = 0;
+    const frequent_signal_c signals(say_at_the_third_signal);
     char byte = 0;
     EXPECT_EQ(amt_wait_read(m_fd_a[0], &byte, 1), 1);
     EXPECT_EQ(byte, 'y');
-    setitimer(ITIMER_REAL, &never, nullptr);
-    signal(SIGALRM, SIG_DFL);
+    g_signal_count = 0;
+    EXPECT_EQ(amt_wait_readable(m_fd_a[0], 30000), 1);
+    EXPECT_GE(g_signal_count, 3);
+}
+
+TEST_F(wait_on_pipe, takes_its_time_whatever_signals_come)
+{
+    g_signal_count = 0;
+    const frequent_signal_c signals(count_signal);
+    const auto begin = steady_clock_t::now();
+    EXPECT_EQ(amt_wait_readable(m_fd_a[0], 150), 0);
+    EXPECT_GE(elapsed_ms(begin), 150);
+    EXPECT_LT(elapsed_ms(begin), 5000);
+    EXPECT_GE(g_signal_count, 3);
 }
 
 TEST_F(wait_on_pipe, keeps_whether_the_threads_end_is_deferred)

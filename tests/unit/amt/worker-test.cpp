@@ -218,6 +218,9 @@ TEST_F(worker, ended_by_a_foreign_signal_is_known_to_be_gone)
 
 TEST_F(worker, can_be_stopped_as_soon_as_it_is_started)
 {
+#ifdef __SANITIZE_THREAD__
+    GTEST_SKIP() << "the sanitizer may lose a signal in a thread's first moments";
+#endif
     for (int i = 0; i < 50; i++) {
         ASSERT_EQ(amt_worker_start(g_worker_ptr, sleep_for_ever), 0);
         amt_worker_stop(g_worker_ptr);
