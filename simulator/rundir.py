@@ -67,7 +67,9 @@ def has_owner(directory: Path) -> bool:
 
 def remove_tree(directory: Path) -> None:
     """Remove a directory, also where its content forbids it."""
-    def permit(_function: object, path: str, _error: object) -> None:
+    def permit(_function: object, path: str, error: tuple[object, BaseException, object]) -> None:
+        if isinstance(error[1], FileNotFoundError):
+            return  # somebody else sweeps here too
         os.chmod(os.path.dirname(path), 0o700)
         if os.path.isdir(path) and not os.path.islink(path):
             os.chmod(path, 0o700)

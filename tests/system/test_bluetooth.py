@@ -112,8 +112,9 @@ def test_child_fails(make_handset: HandsetFactory, path: str) -> None:
     for _ in range(3):
         mark = handset.log.mark()
         trace = HandlerTrace(handset)
-        assert channel.request(BT) == done(BT)
-        assert channel.read_packet() == refusal(BT)
+        # Which of the two processes is first is the scheduler's choice.
+        answers = [channel.request(BT), channel.read_packet()]
+        assert answers in ([done(BT), refusal(BT)], [refusal(BT), done(BT)])
         assert trace.calls() == [CALL.format(6)]
         wait_alone(handset)
         pid = handset.log.wait("BT-start start", after=mark).pid
