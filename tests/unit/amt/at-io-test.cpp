@@ -1,13 +1,9 @@
 #include "amt/amt-handle/channel/at-io.h"
 
-#include <atomic>
-#include <chrono>
 #include <errno.h>
 #include <fcntl.h>
 #include <stdio.h>
 #include <string.h>
-#include <sys/socket.h>
-#include <thread>
 #include <unistd.h>
 
 #include <gtest/gtest.h>
@@ -25,7 +21,6 @@ namespace {
 using texts_t = std::vector<std::string>;
 
 constexpr char SOURCE[] = "amt/amt-handle";
-constexpr char SILENCER[] = "disable_unsolicited_code";
 constexpr char SILENCE[] = "AT^DLKS=0\r";
 
 /* The modem's consent in the size of one read, so that nothing of what follows goes with it. */
@@ -294,133 +289,6 @@ TEST(at_read, a_tty_that_stays_lost_gives_the_error_of_its_opening)
     const lost_channel_c channel;
     g_amt_cfg.m_tty_at_mux_a[0] = '\0';
     EXPECT_EQ(read_some(100).m_status, PUB_ERR_PARAM);
-}
-
-/* What the silencing of a modem that answers with these chunks gives. */
-int silence(const texts_t &chunk_list)
-{
-    const modem_line_c line;
-    for (const std::string &chunk : chunk_list) {
-        line.answer(chunk);
-    }
-    const int status = disable_unsolicited_code(g_handle_context.m_fd_at);
-    EXPECT_EQ(line.commands(), texts_t{SILENCE});
-    EXPECT_EQ(line.unread_chunks(), 0U);
-    return status;
-}
-
-TEST(at_silence, ends_with_a_final_result)
-{
-    EXPECT_EQ(silence({"\r\nOK\r\n"}), PUB_ERR_NONE);
-    EXPECT_EQ(silence({"AT^DLKS=0\r", "\r\nOK\r\n"}), PUB_ERR_NONE);
-    EXPECT_EQ(silence({"noise\r\nOK\r\n"}), PUB_ERR_NONE);
-    EXPECT_EQ(silence({"\r\nERROR\r\n"}), PUB_ERR_FAIL);
-    EXPECT_EQ(silence({"\r\n+CME ERROR: "}), PUB_ERR_FAIL);
-    EXPECT_EQ(silence({"\r\n+CMS ERROR: 3\r\n"}), PUB_ERR_FAIL);
-    /* Within one piece the good result is looked for first. */
-    EXPECT_EQ(silence({"\r\nERROR\r\n\r\nOK\r\n"}), PUB_ERR_NONE);
-}
-
-TEST(at_silence, sees_no_result_across_pieces)
-{
-    EXPECT_EQ(silence({"\r\nO", "K\r\n", "OK\r\n", "\r\nOK", "\r\nERR", "OR\r\n",
-                       "\r\n+CME ERROR:", "\r\nERROR\r\n"}),
-              PUB_ERR_FAIL);
-    EXPECT_EQ(silence({"\r\nOK", "\r\n", "", "\r\nOK\r\n"}), PUB_ERR_NONE);
-}
-
-TEST(at_silence, logs_a_refusal)
-{
-    const log_capture_c capture;
-    errno = 0;
-    EXPECT_EQ(silence({"\r\nERROR\r\n"}), PUB_ERR_FAIL);
-    ASSERT_EQ(capture.texts().size(), 1U);
-    EXPECT_EQ(capture.count_containing("FUNC-disable_unsolicited_code(), error_code=-100"), 1);
-}
-
-TEST(at_silence, needs_a_descriptor)
-{
-    const log_capture_c capture;
-    errno = 0;
-    EXPECT_EQ(disable_unsolicited_code(0), PUB_ERR_PARAM);
-    EXPECT_EQ(disable_unsolicited_code(-1), PUB_ERR_PARAM);
-    EXPECT_EQ(without_line_numbers(capture), texts_t(2, fail_line(SILENCER, -101)));
-}
-
-TEST(at_silence, fails_when_the_tty_cannot_be_waited_for)
-{
-    const log_capture_c capture;
-    EXPECT_EQ(disable_unsolicited_code(1000000), PUB_ERR_FILE);
-    EXPECT_EQ(without_line_numbers(capture),
-              (texts_t{"sys call: select() failed! errno = 9", fail_line(SILENCER, -118, EBADF)}));
-}
-
-TEST(at_silence, fails_when_the_tty_cannot_be_written)
-{
-    const int fd = open("/dev/null", O_RDONLY | O_CLOEXEC);
-    const log_capture_c capture;
-    EXPECT_EQ(disable_unsolicited_code(fd), PUB_ERR_FILE);
-    EXPECT_EQ(without_line_numbers(capture),
-              (texts_t{"sys call: write() failed! errno = 9", fail_line(SILENCER, -118, EBADF)}));
-    close(fd);
-}
-
-TEST(at_silence, fails_after_a_short_write)
-{
-    const small_file_c file(4);
-    const log_capture_c capture;
-    errno = 0;
-    EXPECT_EQ(disable_unsolicited_code(file.fd()), PUB_ERR_INCOMPLETE);
-    EXPECT_EQ(
-        without_line_numbers(capture),
-        (texts_t{"WARNING !", "write not completed: to write(10) != written(4)", fail_line(SILENCER, -119)}));
-}
-
-TEST(at_silence, does_not_wait_for_ever_to_be_heard)
-{
-    int fd_a[2];
-    ASSERT_EQ(socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0, fd_a), 0);
-    const std::string block(4096, 'x');
-    while (write(fd_a[0], block.data(), block.size()) > 0) {
-    }
-    while (write(fd_a[0], block.data(), 1) > 0) {
-    }
-    const auto begin = std::chrono::steady_clock::now();
-    const log_capture_c capture;
-    EXPECT_EQ(disable_unsolicited_code(fd_a[0]), PUB_ERR_TIMEOUT);
-    EXPECT_GE(std::chrono::steady_clock::now() - begin, std::chrono::milliseconds(4900));
-    EXPECT_EQ(capture.texts().back(), "wait 5 seconds to write time out");
-    EXPECT_EQ(capture.count_containing("FUNC-disable_unsolicited_code(), error_code=-113"), 1);
-    close(fd_a[0]);
-    close(fd_a[1]);
-}
-
-TEST(at_silence, a_failing_read_is_no_end)
-{
-    const modem_line_c line;
-    const int fd = open("/dev/null", O_WRONLY | O_CLOEXEC);
-    ASSERT_GT(fd, 0);
-    std::atomic<int> is_heard{0};
-    std::thread repair([&] {
-        while (is_heard == 0) {
-            usleep(1000);
-        }
-        line.answer("\r\nOK\r\n");
-        dup2(g_handle_context.m_fd_at, fd);
-    });
-    const log_capture_c capture;
-    std::thread watch([&] {
-        while (!capture.has("sys call: read() failed! errno = 9")) {
-            usleep(1000);
-        }
-        is_heard = 1;
-    });
-    /* The result is that of the last read. */
-    EXPECT_EQ(disable_unsolicited_code(fd), PUB_ERR_NONE);
-    repair.join();
-    watch.join();
-    EXPECT_GE(capture.count_containing("FUNC-disable_unsolicited_code(), error_code=-118, errno=9"), 1);
-    close(fd);
 }
 
 } // namespace
