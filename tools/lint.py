@@ -68,8 +68,10 @@ def project_files(paths: Sequence[str]) -> list[str]:
     """The files of the project, those not yet added included, below PATHS."""
     listed = subprocess.run(
         ["git", "ls-files", "-z", "--cached", "--others", "--exclude-standard", "--", *paths],
-        cwd=PROJECT, check=True, capture_output=True, text=True).stdout
-    return sorted({name for name in listed.split("\0") if name and (PROJECT / name).is_file()
+        cwd=PROJECT, check=False, capture_output=True, text=True)
+    if listed.returncode != 0:
+        sys.exit(f"dev: git cannot tell which files there are: {listed.stderr.strip()}")
+    return sorted({name for name in listed.stdout.split("\0") if name and (PROJECT / name).is_file()
                    and not (PROJECT / name).is_symlink()})
 
 
