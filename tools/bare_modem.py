@@ -8,10 +8,10 @@ from contextlib import contextmanager
 from pathlib import Path
 from typing import Iterator
 
-from simulator.inside.attendance import Answerer
-from simulator.inside.lines import Line
-from simulator.inside.loop import Loop
-from simulator.inside.modem import Conversation, Modem
+from amt_simulator.inside.attendance import Answerer
+from amt_simulator.inside.lines import Line
+from amt_simulator.inside.loop import Loop
+from amt_simulator.inside.modem import Conversation, Modem
 
 UP = b"up\n"
 

@@ -10,10 +10,10 @@ import tempfile
 from pathlib import Path
 from typing import Any
 
-from simulator import Handset
-from simulator.inside.modem import Modem
-from simulator.inside.modem_table import IDENTITIES
-from station import wire
+from amt_simulator import Handset
+from amt_simulator.inside.modem import Modem
+from amt_simulator.inside.modem_table import IDENTITIES
+from amt_station import wire
 from tools.bare_modem import bare_modem
 
 BUILD = Path("build/release")

@@ -8,11 +8,11 @@ import time
 from dataclasses import dataclass, field
 from typing import Callable, Mapping
 
-from simulator import Handset
-from station.link import Link
-from station.operations import Value, operation_packet
-from station.requests import Channel
-from station.table import find_operation
+from amt_simulator import Handset
+from amt_station.link import Link
+from amt_station.operations import Value, operation_packet
+from amt_station.requests import Channel
+from amt_station.table import find_operation
 
 # How much more than at first the daemon may hold, however long it has worked.
 RESIDENT_BOUND_KIB = 512

@@ -12,9 +12,9 @@ import tty
 from pathlib import Path
 from typing import Callable, Sequence
 
-from station.decoder import Decoder, Frame, Item, Text
-from station.envelope import ACKNOWLEDGEMENT, encode_envelope
-from station.packet import Atom, Packet
+from amt_station.decoder import Decoder, Frame, Item, Text
+from amt_station.envelope import ACKNOWLEDGEMENT, encode_envelope
+from amt_station.packet import Atom, Packet
 
 ROOT = Path(__file__).resolve().parents[2]
 PATIENCE = 10.0
@@ -113,7 +113,7 @@ def error_packet(command: int, code: int = 1) -> bytes:
 
 def station_command(*arguments: str) -> list[str]:
     """The command line of ``amt-station``."""
-    return [sys.executable, "-m", "station", *arguments]
+    return [sys.executable, "-m", "amt_station", *arguments]
 
 
 def station_environment(**extra: str) -> dict[str, str]:

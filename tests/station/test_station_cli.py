@@ -11,10 +11,10 @@ import pytest
 from station_peer import (PATIENCE, ROOT, Peer, Run, answering, ok, replying, sequence,
                           station_command, station_environment)
 
-from station.decoder import Frame
-from station.envelope import ACKNOWLEDGEMENT, encode_envelope
-from station.link import Link
-from station.packet import Atom, Packet
+from amt_station.decoder import Frame
+from amt_station.envelope import ACKNOWLEDGEMENT, encode_envelope
+from amt_station.link import Link
+from amt_station.packet import Atom, Packet
 
 VERSION_ATOMS = (Atom.integer(19, 16), Atom.raw(18, b"\r1.2\n\n"))
 ONE_LINE = re.compile(r"\Aamt-station: [^\n]+\n\Z")

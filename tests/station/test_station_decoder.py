@@ -9,8 +9,8 @@ import pytest
 from hypothesis import given
 from hypothesis import strategies as st
 
-from station.envelope import MAGIC, wrap
-from station.wire import (ACKNOWLEDGEMENT, Acknowledgement, Atom, BareDecoder, ChecksumError,
+from amt_station.envelope import MAGIC, wrap
+from amt_station.wire import (ACKNOWLEDGEMENT, Acknowledgement, Atom, BareDecoder, ChecksumError,
                           Decoder, EnvelopeDecoder, Frame, Item, LengthError, Packet, Skipped,
                           StrayBytesError, Text, TruncatedError, encode_envelope)
 

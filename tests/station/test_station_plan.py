@@ -12,15 +12,15 @@ import pytest
 from station_peer import (PATIENCE, ROOT, Peer, Run, answering, error_packet, sequence,
                           station_command, station_environment)
 
-from station.decoder import Frame, Item
-from station.envelope import ACKNOWLEDGEMENT, encode_envelope
-from station.errors import UsageProblem
-from station.link import Link
-from station.packet import Atom, Packet
-from station.plan import Limit, Plan, load_plan
-from station.plan_run import StepResult, Verdict, exit_status, run_plan
-from station.report import junit_xml, summary
-from station.requests import Channel
+from amt_station.decoder import Frame, Item
+from amt_station.envelope import ACKNOWLEDGEMENT, encode_envelope
+from amt_station.errors import UsageProblem
+from amt_station.link import Link
+from amt_station.packet import Atom, Packet
+from amt_station.plan import Limit, Plan, load_plan
+from amt_station.plan_run import StepResult, Verdict, exit_status, run_plan
+from amt_station.report import junit_xml, summary
+from amt_station.requests import Channel
 
 ADC = '[[step]]\nname = "adc"\ncommand = "battery adc"\nlimits.adc = { min = 10, max = 20 }\n'
 

@@ -7,11 +7,11 @@ import re
 import pytest
 from station_peer import ROOT
 
-from station.at_commands import AT_COMMANDS
-from station.catalogue import command_names
-from station.protocol_doc import protocol_document
-from station.requests import Request
-from station.table import FAMILIES, REQUESTS, tunnel
+from amt_station.at_commands import AT_COMMANDS
+from amt_station.catalogue import command_names
+from amt_station.protocol_doc import protocol_document
+from amt_station.requests import Request
+from amt_station.table import FAMILIES, REQUESTS, tunnel
 
 DOCUMENT = protocol_document()
 
@@ -22,7 +22,7 @@ def section(title: str) -> str:
 
 def test_the_document_is_current() -> None:
     written = (ROOT / "docs" / "protocol.md").read_text(encoding="utf-8")
-    assert written == DOCUMENT, "run: python3 -m station.protocol_doc > docs/protocol.md"
+    assert written == DOCUMENT, "run: python3 -m amt_station.protocol_doc > docs/protocol.md"
 
 
 def test_no_mark_is_left() -> None:

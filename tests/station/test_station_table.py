@@ -7,13 +7,13 @@ from typing import Hashable
 
 import pytest
 
-from station.at_commands import AT_COMMANDS, FLUSH_COMMAND, known_refusal
-from station.catalogue import UNDEFINED, command_ids, command_name, command_names, parse_catalogue
-from station.errors import UsageProblem
-from station.operations import build_packet, operation_packet, read_answer, run_operation
-from station.packet import Atom, AtomType, Packet
-from station.requests import Channel, Field, Operation, Request
-from station.table import (FAMILIES, REQUESTS, display_name, find_command, find_operation,
+from amt_station.at_commands import AT_COMMANDS, FLUSH_COMMAND, known_refusal
+from amt_station.catalogue import UNDEFINED, command_ids, command_name, command_names, parse_catalogue
+from amt_station.errors import UsageProblem
+from amt_station.operations import build_packet, operation_packet, read_answer, run_operation
+from amt_station.packet import Atom, AtomType, Packet
+from amt_station.requests import Channel, Field, Operation, Request
+from amt_station.table import (FAMILIES, REQUESTS, display_name, find_command, find_operation,
                            operations, requests_by_id)
 
 # What the handset registers; everything else is passed on (PC line) or refused (app channel).

@@ -5,7 +5,7 @@ from typing import Any, Callable, Iterator
 
 import pytest
 
-from simulator import Handset
+from amt_simulator import Handset
 from support.channels import AppChannel, PcChannel
 
 HandsetFactory = Callable[..., Handset]

@@ -3,8 +3,8 @@
 import re
 
 from conftest import HandsetFactory
-from simulator import Handset
-from simulator.waiting import wait_until
+from amt_simulator import Handset
+from amt_simulator.waiting import wait_until
 from support.channels import AppChannel, integer, packet
 from support.trace import Trace, error_line
 from support.traffic import APP_IN, APP_OUT, dump

@@ -4,8 +4,8 @@ import re
 import time
 
 from conftest import HandsetFactory
-from simulator import Handset
-from simulator.waiting import scaled
+from amt_simulator import Handset
+from amt_simulator.waiting import scaled
 from support.channels import PcChannel, integer, packet
 from support.trace import Trace, error_line
 

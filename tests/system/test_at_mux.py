@@ -5,8 +5,8 @@ import re
 import pytest
 
 from conftest import HandsetFactory
-from simulator import Handset
-from simulator.waiting import scaled
+from amt_simulator import Handset
+from amt_simulator.waiting import scaled
 from support.channels import AppChannel, integer, packet, string
 from support.trace import Trace, error_line
 

@@ -3,7 +3,7 @@
 import re
 
 from conftest import HandsetFactory
-from simulator import Handset
+from amt_simulator import Handset
 from support.channels import PcChannel
 from support.traffic import MODEM_OUT, PC_IN, PcTrace, dump
 

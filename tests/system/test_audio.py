@@ -5,9 +5,9 @@ from pathlib import Path
 import pytest
 
 from conftest import HandsetFactory
-from simulator import Handset
-from simulator.waiting import wait_until
-from station import wire
+from amt_simulator import Handset
+from amt_simulator.waiting import wait_until
+from amt_station import wire
 from support.channels import AppChannel, flag, integer
 from support.handler import NO_ENTRY, HandlerTrace, device_error, done, refused
 from support.shell import break_shell

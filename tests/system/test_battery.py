@@ -3,7 +3,7 @@
 import pytest
 
 from conftest import HandsetFactory
-from station import wire
+from amt_station import wire
 from support.channels import AppChannel, PcChannel, integer
 from support.handler import (IS_DIRECTORY, NO_DEVICE, NO_ENTRY, NO_SPACE, HandlerTrace,
                              device_error, done, refusal, refused)

@@ -6,9 +6,9 @@ from typing import Callable, Union
 import pytest
 
 from conftest import HandsetFactory
-from simulator import Handset
-from simulator.waiting import wait_until
-from station import wire
+from amt_simulator import Handset
+from amt_simulator.waiting import wait_until
+from amt_station import wire
 from support.channels import AppChannel, PcChannel, packet
 from support.handler import HandlerTrace, device_error, done, refusal
 from support.held import HeldCall

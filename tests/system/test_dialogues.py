@@ -39,8 +39,8 @@ from typing import Callable
 import pytest
 
 from conftest import HandsetFactory
-from simulator import Handset, Line
-from station import wire
+from amt_simulator import Handset, Line
+from amt_station import wire
 from support.channels import AppChannel, Channel, PcChannel, integer, packet
 from support.dialogue import CHANNELS, Dialogue, DialogueError, Step, parse
 from support.modem_desk import FENCE, NOT_SERVED, refusal

@@ -1,8 +1,8 @@
 """How a packet of the PC line finds its handler: acknowledgement, answer, refusal, hand-over."""
 
 from conftest import HandsetFactory
-from simulator import Handset
-from station import wire
+from amt_simulator import Handset
+from amt_station import wire
 from support.channels import PcChannel, flag, integer, packet, string
 from support.trace import error_line
 from support.traffic import MODEM_OUT, PC_IN, PC_OUT, PcTrace, dump

@@ -7,9 +7,9 @@ from contextlib import suppress
 import pytest
 
 from conftest import HandsetFactory
-from simulator import Handset
-from simulator.errors import HandsetError
-from simulator.waiting import scaled, wait_until
+from amt_simulator import Handset
+from amt_simulator.errors import HandsetError
+from amt_simulator.waiting import scaled, wait_until
 from support.channels import AppChannel, PcChannel
 from support.trace import TAG, Trace
 

@@ -5,7 +5,7 @@ import re
 import pytest
 
 from conftest import HandsetFactory
-from simulator import Handset
+from amt_simulator import Handset
 from support.trace import TAG, error_line
 
 PROGRAM = "/system/bin/vx-kel-amt"

@@ -5,7 +5,7 @@ from typing import Callable, Union
 import pytest
 
 from conftest import HandsetFactory
-from simulator import Handset
+from amt_simulator import Handset
 from support.channels import AppChannel, PcChannel, integer, packet, raw
 from support.handler import HandlerTrace, done, gps_error, refusal, refused
 from support.trace import Wanted

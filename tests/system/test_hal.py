@@ -7,8 +7,8 @@ from typing import Callable, Union
 import pytest
 
 from conftest import HandsetFactory
-from simulator import Handset
-from station import wire
+from amt_simulator import Handset
+from amt_station import wire
 from support.channels import AppChannel, PcChannel, integer, packet, string
 from support.handler import NO_ENTRY, HandlerTrace, device_error, done, refusal, refused
 from support.trace import Wanted, error_line

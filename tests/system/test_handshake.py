@@ -6,8 +6,8 @@ import time
 import pytest
 
 from conftest import HandsetFactory
-from simulator import Handset
-from simulator.waiting import scaled
+from amt_simulator import Handset
+from amt_simulator.waiting import scaled
 from support.channels import PcChannel
 from support.trace import TAG, Trace
 

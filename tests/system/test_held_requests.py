@@ -1,8 +1,8 @@
 """Refused requests of the PC line: they stay, and are dispatched again with what comes next."""
 
-from simulator import Handset
-from simulator.waiting import wait_until
-from station import wire
+from amt_simulator import Handset
+from amt_simulator.waiting import wait_until
+from amt_station import wire
 from support.channels import PcChannel, flag, integer, packet, string
 from support.trace import TAG, error_line
 from support.traffic import PC_IN, PcTrace, dump

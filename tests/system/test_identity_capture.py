@@ -2,8 +2,8 @@
 
 import pytest
 
-from simulator import Handset
-from station import wire
+from amt_simulator import Handset
+from amt_station import wire
 from support.channels import PcChannel, integer, packet, string
 from support.trace import Trace, error_line
 

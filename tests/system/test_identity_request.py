@@ -2,7 +2,7 @@
 
 import pytest
 
-from station import wire
+from amt_station import wire
 from support.channels import AppChannel, PcChannel, flag, integer, packet, raw, string
 from support.trace import Trace, error_line
 

@@ -5,8 +5,8 @@ from typing import Callable, Mapping
 
 import pytest
 
-from simulator import Handset
-from simulator.root import Content
+from amt_simulator import Handset
+from amt_simulator.root import Content
 from support.trace import Trace, error_line
 
 BT_FOLDER = "/amt/BT"

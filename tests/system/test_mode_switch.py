@@ -5,8 +5,8 @@ import time
 import pytest
 
 from conftest import HandsetFactory
-from simulator import Handset
-from station import wire
+from amt_simulator import Handset
+from amt_station import wire
 from support.channels import AppChannel, PcChannel, integer, packet
 from support.modem_desk import ERRORS, MODEM_FAILED, NOT_SERVED, OK, ModemDesk, refusal
 from support.trace import Trace, error_line

@@ -3,7 +3,7 @@
 import pytest
 
 from conftest import HandsetFactory
-from station import wire
+from amt_station import wire
 from support.channels import AppChannel, integer, packet
 from support.modem_desk import ERRORS, NOT_SERVED, OK, ModemDesk, refusal
 from support.modem_kinds import KINDS, Kind

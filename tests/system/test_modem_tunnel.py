@@ -3,10 +3,10 @@
 import pytest
 
 from conftest import HandsetFactory
-from simulator import Handset
-from simulator.inside.modem import Modem
-from simulator.inside.modem_table import RESPONSES
-from station import wire
+from amt_simulator import Handset
+from amt_simulator.inside.modem import Modem
+from amt_simulator.inside.modem_table import RESPONSES
+from amt_station import wire
 from support.channels import AppChannel, flag, integer, packet, raw, string
 from support.modem_desk import NOT_SERVED, OK, ModemDesk, refusal, standing_still
 from support.registrations import APP_ROWS

@@ -5,7 +5,7 @@ import re
 import pytest
 
 from conftest import HandsetFactory
-from station import wire
+from amt_station import wire
 from support.channels import AppChannel, flag, integer, packet, raw, string
 from support.modem_desk import ERRORS, MODEM_FAILED, NOT_SERVED, OK, ModemDesk, refusal
 from support.trace import Trace, error_line

@@ -4,9 +4,9 @@ import random
 import re
 
 from conftest import HandsetFactory
-from simulator import Handset
-from simulator.waiting import wait_until
-from station import wire
+from amt_simulator import Handset
+from amt_simulator.waiting import wait_until
+from amt_station import wire
 from support.channels import PcChannel, integer, packet, raw
 from support.trace import TAG, error_line
 from support.traffic import MODEM_IN, MODEM_OUT, PC_IN, PcTrace, dump

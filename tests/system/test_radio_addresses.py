@@ -6,8 +6,8 @@ from typing import Callable, Union
 import pytest
 
 from conftest import HandsetFactory
-from simulator import Handset
-from station import wire
+from amt_simulator import Handset
+from amt_station import wire
 from support.channels import AppChannel, PcChannel, integer, raw, string
 from support.handler import (IS_DIRECTORY, NO_ENTRY, NO_SPACE, HandlerTrace, device_error, done,
                              refused)

@@ -8,10 +8,10 @@ from typing import Mapping, Sequence, Union
 import pytest
 
 from conftest import HandsetFactory
-from simulator import Handset
-from simulator.control import ProcessInfo
-from simulator.waiting import wait_until
-from station import wire
+from amt_simulator import Handset
+from amt_simulator.control import ProcessInfo
+from amt_simulator.waiting import wait_until
+from amt_station import wire
 from support.channels import AppChannel, PcChannel, flag, integer, raw, string
 from support.registrations import APP_ROWS, PC_ROWS
 

@@ -14,8 +14,8 @@ import pytest
 from PIL import Image
 
 from conftest import HandsetFactory
-from simulator import Handset, screen
-from simulator.waiting import scaled, wait_until
+from amt_simulator import Handset, screen
+from amt_simulator.waiting import scaled, wait_until
 from support.channels import AppChannel, PcChannel, integer, packet
 from support.handler import HandlerTrace, done
 from test_handshake import shake_hands

@@ -11,15 +11,15 @@ from typing import Callable, Iterator
 
 import pytest
 
-from simulator import Handset
-from simulator.rundir import BASE_VARIABLE, RunDirectory, remove_tree, sweep
+from amt_simulator import Handset
+from amt_simulator.rundir import BASE_VARIABLE, RunDirectory, remove_tree, sweep
 
 PROJECT = Path(__file__).resolve().parents[2]
 FAKE_DAEMON = Path(__file__).with_name("support") / "fake_daemon.py"
 LAUNCHER = """
 import json, sys, time
 from pathlib import Path
-from simulator import Handset
+from amt_simulator import Handset
 with Handset("pc", build=None, daemon=Path(sys.argv[1])) as handset:
     handset.wait_ready()
     print(json.dumps([str(handset.directory), handset.pid]), flush=True)

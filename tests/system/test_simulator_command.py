@@ -1,4 +1,4 @@
-"""The `handset` command: up in one process, everything else from others or at its prompt."""
+"""The `amt-handset` command: up in one process, everything else from others or at its prompt."""
 
 import json
 import os
@@ -13,11 +13,11 @@ from typing import Callable, Iterator
 
 import pytest
 
-from simulator.rundir import BASE_VARIABLE
-from station import wire
+from amt_simulator.rundir import BASE_VARIABLE
+from amt_station import wire
 
 PROJECT = Path(__file__).resolve().parents[2]
-COMMAND = [sys.executable, "-m", "simulator"]
+COMMAND = [sys.executable, "-m", "amt_simulator"]
 OK = b"\r\nOK\r\n"
 STATE = "/sys/class/android_usb/android0/state"
 

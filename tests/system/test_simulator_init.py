@@ -5,7 +5,7 @@ import threading
 
 import pytest
 
-from simulator import Handset, HandsetError, HandsetTimeout
+from amt_simulator import Handset, HandsetError, HandsetTimeout
 
 
 def test_the_daemon_is_started_again(fake: Handset) -> None:
@@ -120,7 +120,7 @@ def test_a_look_at_the_daemon(fake: Handset) -> None:
     assert info.threads[info.pid]["state"] in "SR"
     assert set(info.descriptors.values()) >= {"/dev/null", "/handset/stdout.txt"}
     assert info.children == [] and info.resident_kib > 1000
-    assert fake.inspect(1).command[-4:-2] == ["-m", "simulator.inside.supervisor"]
+    assert fake.inspect(1).command[-4:-2] == ["-m", "amt_simulator.inside.supervisor"]
     fake.set_restart(False)
     fake.stop()
     with pytest.raises(HandsetError, match="does not run"):

@@ -5,8 +5,8 @@ import time
 
 import pytest
 
-from simulator import Handset, HandsetError, HandsetTimeout
-from simulator.line import Line
+from amt_simulator import Handset, HandsetError, HandsetTimeout
+from amt_simulator.line import Line
 
 EVERY_BYTE = bytes(range(256))
 

@@ -7,8 +7,8 @@ from pathlib import Path
 
 import pytest
 
-from simulator import HandsetTimeout, Log
-from simulator.waiting import SCALE_VARIABLE, wait_until
+from amt_simulator import HandsetTimeout, Log
+from amt_simulator.waiting import SCALE_VARIABLE, wait_until
 
 LINES = """11-21 08:00:00.123 2 17 D vx-kel-amt: first: (data_len = 1) -- 0D
 11-21 08:00:00.124 2 18 D (null): fb open failed!\\n

@@ -2,10 +2,10 @@
 
 import pytest
 
-from simulator import Handset
-from simulator.inside import modem_table
-from simulator.inside.modem import Modem, Conversation
-from station import wire
+from amt_simulator import Handset
+from amt_simulator.inside import modem_table
+from amt_simulator.inside.modem import Modem, Conversation
+from amt_station import wire
 
 OK = b"\r\nOK\r\n"
 ERROR = b"\r\nERROR\r\n"

@@ -6,8 +6,8 @@ from pathlib import Path
 
 import pytest
 
-from simulator import Handset, HandsetError, HandsetTimeout
-from simulator.waiting import scaled
+from amt_simulator import Handset, HandsetError, HandsetTimeout
+from amt_simulator.waiting import scaled
 
 SHELL = "/bin/sh"
 DEVICE_MODES = {name: os.stat(f"/dev/{name}").st_mode for name in ("null", "zero", "tty")}

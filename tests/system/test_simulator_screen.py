@@ -5,7 +5,7 @@ from pathlib import Path
 import pytest
 from PIL import Image
 
-from simulator import Handset, HandsetError, screen
+from amt_simulator import Handset, HandsetError, screen
 
 RED, GREEN, BLUE = (255, 0, 0), (0, 255, 0), (0, 0, 255)
 RED16, GREEN16, BLUE16 = b"\x00\xf8", b"\xe0\x07", b"\x1f\x00"

@@ -2,7 +2,7 @@
 
 import pytest
 
-from simulator import Handset
+from amt_simulator import Handset
 
 STATE = "/sys/class/android_usb/android0/state"
 

@@ -5,9 +5,9 @@ import re
 import pytest
 
 from conftest import HandsetFactory
-from simulator import Handset
-from simulator.waiting import scaled
-from station.catalogue import command_name
+from amt_simulator import Handset
+from amt_simulator.waiting import scaled
+from amt_station.catalogue import command_name
 from support.channels import AppChannel, PcChannel, integer, packet
 from support.registrations import APP_ROWS, PC_ROWS
 from support.trace import TAG, Trace, error_line

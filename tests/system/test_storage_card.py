@@ -1,7 +1,7 @@
 """The memory card's capacity (137): a real file system, or none."""
 
 from conftest import HandsetFactory
-from simulator import Handset
+from amt_simulator import Handset
 from support.channels import AppChannel, integer
 from support.handler import IS_DIRECTORY, NO_ENTRY, HandlerTrace, device_error, done
 from support.trace import Wanted, error_line

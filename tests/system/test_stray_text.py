@@ -4,9 +4,9 @@ import random
 import re
 import signal
 
-from simulator import Handset
-from simulator.waiting import wait_until
-from station import wire
+from amt_simulator import Handset
+from amt_simulator.waiting import wait_until
+from amt_station import wire
 from support.channels import AppChannel, PcChannel, integer, packet, string
 from support.registrations import APP_ROWS
 from support.trace import TAG

@@ -6,7 +6,7 @@ from typing import Iterator
 import pytest
 
 from conftest import HandsetFactory
-from station import wire
+from amt_station import wire
 from support.channels import AppChannel, PcChannel, integer, packet, string
 from support.modem_desk import ERRORS, MODEM_FAILED, OK, ModemDesk, refusal
 from support.trace import Trace, Wanted, error_line

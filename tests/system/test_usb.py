@@ -5,7 +5,7 @@ import re
 import pytest
 
 from conftest import HandsetFactory
-from simulator import Handset
+from amt_simulator import Handset
 from support.channels import PcChannel
 from support.trace import Trace
 

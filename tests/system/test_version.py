@@ -7,8 +7,8 @@ from pathlib import Path
 import pytest
 
 from conftest import HandsetFactory
-from simulator import Handset
-from station import wire
+from amt_simulator import Handset
+from amt_station import wire
 from support.channels import PcChannel, integer, packet, raw
 from support.modem_desk import NOT_SERVED, OK, ModemDesk, refusal
 from support.trace import Trace, error_line

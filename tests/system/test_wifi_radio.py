@@ -5,7 +5,7 @@ from typing import Sequence
 import pytest
 
 from conftest import HandsetFactory
-from station import wire
+from amt_station import wire
 from support.channels import AppChannel, PcChannel, flag, integer, raw, string
 from support.handler import HandlerTrace, device_error, done, refusal, refused
 from support.trace import Wanted

@@ -5,12 +5,12 @@ import sys
 import time
 from pathlib import Path
 
-from simulator import Handset
-from simulator.errors import HandsetError
-from simulator.waiting import wait_until
-from station.link import Link
-from station.packet import Packet
-from station.requests import Channel
+from amt_simulator import Handset
+from amt_simulator.errors import HandsetError
+from amt_simulator.waiting import wait_until
+from amt_station.link import Link
+from amt_station.packet import Packet
+from amt_station.requests import Channel
 from tools.demo.stage import Stage
 
 IMEI = "490154203237518"

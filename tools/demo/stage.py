@@ -5,14 +5,14 @@ from dataclasses import dataclass, field
 from pathlib import Path
 from typing import Callable, Mapping
 
-from simulator import Handset, screen
-from station.decoder import Acknowledgement, Frame, Item, Text
-from station.errors import Refused, StationError
-from station.link import Link
-from station.operations import Value, operation_packet, read_answer
-from station.packet import Packet
-from station.render import printable
-from station.table import display_name, find_operation, requests_by_id
+from amt_simulator import Handset, screen
+from amt_station.decoder import Acknowledgement, Frame, Item, Text
+from amt_station.errors import Refused, StationError
+from amt_station.link import Link
+from amt_station.operations import Value, operation_packet, read_answer
+from amt_station.packet import Packet
+from amt_station.render import printable
+from amt_station.table import display_name, find_operation, requests_by_id
 
 WIDTHS = (26, 56)
 

@@ -1,7 +1,7 @@
 """The two channels of the daemon as a test speaks on them: packets and AT text, byte-exact."""
 
-from simulator import Handset, Line
-from station import wire
+from amt_simulator import Handset, Line
+from amt_station import wire
 
 RESULT = wire.RESULT_ATOM
 ENVELOPE_HEAD = 12

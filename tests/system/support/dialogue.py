@@ -5,8 +5,8 @@ from dataclasses import dataclass, field
 from pathlib import Path
 from typing import Callable
 
-from station import wire
-from station.catalogue import command_ids
+from amt_station import wire
+from amt_station.catalogue import command_ids
 
 TOKEN = re.compile(r'(?:[^\s"#]|"(?:[^"\\]|\\.)*")+')
 QUOTED = re.compile(r'"((?:[^"\\]|\\.)*)"')

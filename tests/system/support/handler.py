@@ -3,8 +3,8 @@
 import re
 from typing import Union
 
-from simulator import Handset
-from station import wire
+from amt_simulator import Handset
+from amt_station import wire
 from support.channels import AppChannel, PcChannel, integer, packet
 from support.trace import Trace, Wanted, error_line
 

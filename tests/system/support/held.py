@@ -3,8 +3,8 @@
 import os
 from typing import Callable
 
-from simulator import Handset
-from simulator.waiting import wait_until
+from amt_simulator import Handset
+from amt_simulator.waiting import wait_until
 
 
 class HeldCall:

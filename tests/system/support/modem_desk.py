@@ -4,9 +4,9 @@ import signal
 from contextlib import contextmanager
 from typing import Iterable, Iterator, Sequence
 
-from simulator import Handset
-from simulator.waiting import wait_until
-from station import wire
+from amt_simulator import Handset
+from amt_simulator.waiting import wait_until
+from amt_station import wire
 from support.channels import RESULT, AppChannel, integer, packet
 
 OK = b"\r\nOK\r\n"

@@ -2,7 +2,7 @@
 
 from dataclasses import dataclass
 
-from station import wire
+from amt_station import wire
 from support.channels import flag, integer, packet, raw, string
 from support.modem_desk import ERRORS, MODEM_FAILED, NOT_SERVED, OK, refusal
 

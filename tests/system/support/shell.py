@@ -3,7 +3,7 @@
 from contextlib import contextmanager
 from typing import Iterator
 
-from simulator import Handset
+from amt_simulator import Handset
 
 # system() runs /bin/sh, and a link of the root leads it to the PC's.
 BIN, SHELL, COUNT = "/bin", "/bin/sh", "/tmp/shell-failures"

@@ -3,7 +3,7 @@
 import re
 from typing import Any
 
-from simulator import Handset
+from amt_simulator import Handset
 
 TAG = "vx-kel-amt"
 # A text or a compiled expression; Any, because a list of both counts as a list of objects.

@@ -2,7 +2,7 @@
 
 import re
 
-from simulator import Handset
+from amt_simulator import Handset
 from support.trace import Trace
 
 DUMP_SIZE = 250

@@ -1,0 +1,39 @@
+"""Waiting for what happens in a handset: deadlines, never fixed pauses."""
+
+import os
+import time
+from typing import Callable, TypeVar
+
+from amt_simulator.errors import HandsetTimeout
+
+DEFAULT_SECONDS = 10.0
+SCALE_VARIABLE = "HANDSET_TIME_SCALE"
+STEP_SECONDS = 0.002
+
+Found = TypeVar("Found")
+
+
+def scaled(seconds: float) -> float:
+    """SECONDS as this machine and build need them: sanitizer runs ask for more by a variable."""
+    return seconds * float(os.environ.get(SCALE_VARIABLE, "1"))
+
+
+def deadline(seconds: float | None) -> float:
+    """The moment, on the monotonic clock, at which a wait of SECONDS (None: the usual) ends."""
+    return time.monotonic() + scaled(DEFAULT_SECONDS if seconds is None else seconds)
+
+
+def wait_until(attempt: Callable[[], Found | None], what: str, timeout: float | None = None,
+               explain: Callable[[], str] | None = None) -> Found:
+    """Repeat ATTEMPT until it gives something true; raise with WHAT and EXPLAIN's text if late."""
+    end = deadline(timeout)
+    while True:
+        # The clock is read first: what happened before the deadline counts.
+        late = time.monotonic() >= end
+        found = attempt()
+        if found:
+            return found
+        if late:
+            raise HandsetTimeout(f"waited in vain for {what}" +
+                                 (f"\n{explain()}" if explain else ""))
+        time.sleep(STEP_SECONDS)

@@ -1,0 +1,95 @@
+"""The typed commands, made from the request table."""
+
+from __future__ import annotations
+
+from typing import Any
+
+import click
+
+from amt_station import console
+from amt_station.cli_options import Settings, common_parameters
+from amt_station.cli_raw import show_exchange
+from amt_station.operations import check_channel, operation_packet, read_answer, run_operation
+from amt_station.render import exchange_json, value_line
+from amt_station.requests import Field, Operation, Request
+from amt_station.table import operations
+
+
+def _parameters(row: Request, operation: Operation) -> list[click.Parameter]:
+    parameters: list[click.Parameter] = []
+    for name in (*operation.takes, *operation.may_take):
+        parameters += _field_parameters(row.field(name))
+    return parameters
+
+
+def _field_parameters(field: Field) -> list[click.Parameter]:
+    # Values are parsed by the field itself, so that every way in has the same limits.
+    if field.positional:
+        return [click.Argument([field.name], metavar=field.name.upper())]
+    if field.flags:
+        return [click.Option([f"--{word}", field.name], flag_value=word,
+                             help=f"{field.name.capitalize()}: {word}")
+                for word in reversed(list(field.choices))]
+    metavar = "|".join(field.choices) or ("NUMBER" if field.numeric else "TEXT")
+    unit = f" ({field.unit})" if field.unit else ""
+    return [click.Option([f"--{field.name}", _variable(field)], metavar=metavar,
+                         help=field.meaning + unit)]
+
+
+def _variable(field: Field) -> str:
+    return field.name.replace("-", "_")
+
+
+def _run(row: Request, operation: Operation, given: dict[str, Any]) -> None:
+    settings = click.get_current_context().ensure_object(Settings)
+    fields = {_variable(field): field.name for field in row.fields}
+    values = {fields[variable]: value for variable, value in given.items() if value is not None}
+    # Everything that can be wrong with the request is found before the port is touched.
+    check_channel(row, operation, settings.chosen_channel)
+    operation_packet(row, operation, values)
+    with settings.open_link() as link, console.waiting(operation.name):
+        exchanges = run_operation(link, operation.path, values)
+    exchange = exchanges[-1]
+    if settings.json:
+        console.data_json({"ok": True, "command": operation.name, **exchange_json(exchange),
+                           "before": [exchange_json(before) for before in exchanges[:-1]]})
+        return
+    for value in read_answer(row.id, exchange.answer):
+        if value.name != "result":
+            console.data(value_line(value))
+    show_exchange(exchange)
+
+
+def _help(row: Request, operation: Operation) -> str:
+    where = " and ".join(channel.value for channel in operation.channels
+                         if row.service(channel) is not None)
+    notes = "".join(f"\n\n{note}" for note in row.notes)
+    return (f"{operation.summary.capitalize()}.\n\nRequest {row.id} ({row.name}), "
+            f"channels: {where}.{notes}")
+
+
+def _leaf(row: Request, operation: Operation) -> click.Command:
+    def callback(**given: Any) -> None:
+        _run(row, operation, given)
+
+    return click.Command(operation.path[-1], callback=callback, help=_help(row, operation),
+                         short_help=operation.summary,
+                         params=[*_parameters(row, operation), *common_parameters()])
+
+
+def add_typed_commands(root: click.Group) -> None:
+    """Hang every typed command into the tree of groups that its path names."""
+    for row, operation in operations():
+        group = root
+        for depth, word in enumerate(operation.path[:-1], start=1):
+            group = _subgroup(group, word, " ".join(operation.path[:depth]))
+        group.add_command(_leaf(row, operation))
+
+
+def _subgroup(parent: click.Group, word: str, title: str) -> click.Group:
+    existing = parent.commands.get(word)
+    if isinstance(existing, click.Group):
+        return existing
+    group = click.Group(word, help=f"Requests: {title}.")
+    parent.add_command(group)
+    return group

@@ -1,0 +1,94 @@
+"""What the packets that come back mean: whose answer they are, and whether it is a yes.
+
+On the PC line an error packet of the handset itself holds only result code 1, and its request
+stays in the handset's request buffer. Code 10 and what the modem answers leave nothing behind.
+"""
+
+from __future__ import annotations
+
+from amt_station.errors import Held, Refused
+from amt_station.exchange import Exchange, split_reply
+from amt_station.packet import Packet
+from amt_station.requests import Channel
+from amt_station.table import display_name, requests_by_id
+
+_REFUSED_CODE = 1
+
+# Text that is refused is answered as if it were a packet of id 255: with id 255 + 1 in one byte.
+_TEXT_ANSWER = 0
+
+
+def answer_ids(command: int) -> set[int]:
+    """The ids that an answer to ``command`` may have; an error packet always has the first."""
+    row = requests_by_id().get(command)
+    following = (command + 1) & 0xFF
+    return {following, row.answer_id} if row else {following}
+
+
+def is_refusal(packet: Packet, channel: Channel) -> bool:
+    """Whether this is an error packet of the handset itself, for whatever request it holds."""
+    return (channel is Channel.PC and len(packet.atoms) == 1
+            and packet.result == _REFUSED_CODE)
+
+
+def is_answer(request: Packet, packet: Packet, channel: Channel) -> bool:
+    """Whether ``packet`` ends the wait for an answer to ``request``."""
+    return packet.command in answer_ids(request.command) or is_refusal(packet, channel)
+
+
+def passed_on(request: Packet, channel: Channel) -> bool:
+    """Whether the handset hands the packet to its modem, whose own words then come back.
+
+    A modem that does not know the packet may answer with an AT error.
+    """
+    if channel is not Channel.PC:
+        return False
+    row = requests_by_id().get(request.command)
+    service = row.pc if row else None
+    if service is None or service.by == "modem":
+        return True
+    return any(request.get_int(atom) in values for atom, values in service.passes_on.items())
+
+
+def judge(exchange: Exchange) -> None:
+    """Raise ``Refused`` unless every answer of the exchange says yes."""
+    command = exchange.request.command
+    name = display_name(command)
+    if not exchange.answers:
+        raise Refused(f"the modem answered {name} with {split_reply(exchange.text)[1]}")
+    refusal = next((answer for answer in exchange.answers if answer.result), None)
+    if refusal is None:
+        return
+    held = _held(exchange, refusal)
+    if refusal.command in answer_ids(command):
+        raise Refused(f"{name} was refused with code {refusal.result}", code=refusal.result,
+                      response=refusal.command, held=held)
+    raise Refused(f"{name} was not looked at: {_still_holds(refusal)}", code=refusal.result,
+                  response=refusal.command, held=held)
+
+
+def refusal_of_text(text: str, refusal: Packet) -> Refused:
+    """The error for an AT text that was met with an error packet."""
+    if refusal.command == _TEXT_ANSWER:
+        return Refused(f"{text} was refused with code {refusal.result}", code=refusal.result,
+                       response=refusal.command, held=Held.TEXT)
+    return Refused(f"{text} was not looked at: {_still_holds(refusal)}", code=refusal.result,
+                   response=refusal.command, held=Held.PACKET)
+
+
+def _held(exchange: Exchange, refusal: Packet) -> Held:
+    completed = any(answer.result == 0 for answer in exchange.answers)
+    if completed or not is_refusal(refusal, exchange.channel):
+        return Held.NOTHING
+    if refusal.command == _TEXT_ANSWER:
+        return Held.TEXT
+    own = refusal.command in answer_ids(exchange.request.command)
+    if own and passed_on(exchange.request, exchange.channel):
+        return Held.UNKNOWN
+    return Held.PACKET
+
+
+def _still_holds(refusal: Packet) -> str:
+    what = ("an AT text" if refusal.command == _TEXT_ANSWER
+            else f"the request {display_name(refusal.command - 1)}")
+    return f"the handset still holds {what} and refused it again with code {refusal.result}"
