@@ -1,8 +1,8 @@
 #include <algorithm>
 
+#include "amt/amt-handle/at/at-operand.h"
 #include "amt/amt-handle/channel/context.h"
 #include "amt/amt-handle/channel/identity-slots.h"
-#include "amt/amt-handle/reader/at-operand.h"
 #include "amt/amt-handle/reader/dispatch.h"
 #include "amt/amt-handle/reader/identity-capture.h"
 #include "pub/error.h"

@@ -4,9 +4,9 @@
 #include <string.h>
 
 #include "amt/amt-command.h"
+#include "amt/amt-handle/at/at-operand.h"
 #include "amt/amt-handle/channel/context.h"
 #include "amt/amt-handle/channel/identity-slots.h"
-#include "amt/amt-handle/reader/at-operand.h"
 #include "amt/amt-handle/reader/dispatch.h"
 #include "amt/amt-log.h"
 #include "amt/amt-packet.h"

@@ -2,13 +2,13 @@
 
 #include <unistd.h>
 
+#include "amt/amt-handle/at/at-command.h"
+#include "amt/amt-handle/at/at-probe.h"
 #include "amt/amt-handle/channel/context.h"
 #include "amt/amt-handle/channel/process-end.h"
 #include "amt/amt-handle/channel/response.h"
 #include "amt/amt-handle/channel/service-process.h"
 #include "amt/amt-handle/channel/wait.h"
-#include "amt/amt-handle/reader/at-command.h"
-#include "amt/amt-handle/reader/at-probe.h"
 #include "amt/amt-handle/reader/dispatch.h"
 #include "amt/amt-handle/reader/identity-capture.h"
 #include "amt/amt-handle/reader/pc-handshake.h"

@@ -1,4 +1,4 @@
-#include "amt/amt-handle/reader/at-probe.h"
+#include "amt/amt-handle/at/at-probe.h"
 
 #include <string>
 

@@ -1,4 +1,4 @@
-#include "amt/amt-handle/reader/at-operand.h"
+#include "amt/amt-handle/at/at-operand.h"
 
 #include <algorithm>
 #include <stdio.h>

@@ -1,11 +1,11 @@
-#include "amt/amt-handle/reader/at-command.h"
+#include "amt/amt-handle/at/at-command.h"
 
 #include <string.h>
 
+#include "amt/amt-handle/at/at-factory.h"
+#include "amt/amt-handle/at/at-handset.h"
+#include "amt/amt-handle/at/at-radio.h"
 #include "amt/amt-handle/channel/context.h"
-#include "amt/amt-handle/reader/at-factory.h"
-#include "amt/amt-handle/reader/at-handset.h"
-#include "amt/amt-handle/reader/at-radio.h"
 #include "amt/amt-handle/reader/modem-write.h"
 #include "amt/amt-log.h"
 #include "pub/error.h"

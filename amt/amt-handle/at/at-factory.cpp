@@ -1,4 +1,4 @@
-#include "amt/amt-handle/reader/at-factory.h"
+#include "amt/amt-handle/at/at-factory.h"
 
 #include <errno.h>
 #include <stdint.h>
@@ -6,9 +6,9 @@
 #include <stdlib.h>
 #include <string.h>
 
+#include "amt/amt-handle/at/at-operand.h"
+#include "amt/amt-handle/at/at-reply.h"
 #include "amt/amt-handle/channel/handshake.h"
-#include "amt/amt-handle/reader/at-operand.h"
-#include "amt/amt-handle/reader/at-reply.h"
 #include "amt/amt-handle/request/factory-file.h"
 #include "amt/amt-handle/request/identity-store.h"
 #include "amt/amt-log.h"

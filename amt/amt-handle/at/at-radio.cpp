@@ -1,10 +1,10 @@
-#include "amt/amt-handle/reader/at-radio.h"
+#include "amt/amt-handle/at/at-radio.h"
 
 #include <stdint.h>
 #include <stdlib.h>
 
-#include "amt/amt-handle/reader/at-operand.h"
-#include "amt/amt-handle/reader/at-reply.h"
+#include "amt/amt-handle/at/at-operand.h"
+#include "amt/amt-handle/at/at-reply.h"
 #include "amt/amt-log.h"
 #include "platform/include/ldt.h"
 #include "pub/error.h"

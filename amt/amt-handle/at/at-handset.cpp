@@ -1,9 +1,9 @@
-#include "amt/amt-handle/reader/at-handset.h"
+#include "amt/amt-handle/at/at-handset.h"
 
 #include <stdint.h>
 
 #include "amt/amt-device/test-hal.h"
-#include "amt/amt-handle/reader/at-reply.h"
+#include "amt/amt-handle/at/at-reply.h"
 #include "amt/amt-handle/request/ap-version.h"
 #include "amt/amt-handle/request/power-off.h"
 #include "pub/error.h"
