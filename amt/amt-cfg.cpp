@@ -92,12 +92,12 @@ void store_setting(const char *name, const char *value)
 
 int parse_amt_cfg(const char *path)
 {
-    PUB_LOG_ENTRY(g_amt_cfg_log);
+    pub_log_entry(g_amt_cfg_log);
     FILE *stream = fopen(path, "r");
     if (stream == nullptr) {
-        PUB_LOG_SYS_CALL(g_amt_cfg_log, "fopen");
-        PUB_LOG_ERROR(g_amt_cfg_log, PUB_ERR_SYS_CALL);
-        PUB_LOG_ERROR(g_amt_cfg_log, PUB_ERR_FILE);
+        pub_log_sys_call(g_amt_cfg_log, "fopen");
+        pub_log_error(g_amt_cfg_log, PUB_ERR_SYS_CALL);
+        pub_log_error(g_amt_cfg_log, PUB_ERR_FILE);
         PUB_LOG(g_amt_cfg_log, "fail to open file: %s", path);
         return PUB_ERR_FILE;
     }
@@ -121,10 +121,10 @@ int parse_amt_cfg(const char *path)
 
 int amt_cfg_init(const char *path)
 {
-    PUB_LOG_ENTRY(g_amt_cfg_log);
+    pub_log_entry(g_amt_cfg_log);
     if (path == nullptr) {
-        PUB_LOG_ERROR(g_amt_cfg_log, PUB_ERR_PARAM);
-        PUB_LOG_FLAGS(g_amt_cfg_log, true);
+        pub_log_error(g_amt_cfg_log, PUB_ERR_PARAM);
+        pub_log_flags(g_amt_cfg_log, {true});
         return PUB_ERR_PARAM;
     }
     g_amt_cfg = {};

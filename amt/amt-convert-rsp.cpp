@@ -127,8 +127,8 @@ int check_step(int line, const char *func, const uint8_t **cursor, const uint8_t
     if (!is_target_absent(cursor) && packet != nullptr) {
         return PUB_ERR_NONE;
     }
-    pub_log_error(g_amt_convert_log, line, func, PUB_ERR_PARAM);
-    PUB_LOG_FLAGS(g_amt_convert_log, cursor == nullptr, is_target_absent(cursor), packet == nullptr, false);
+    pub_log_error(g_amt_convert_log, PUB_ERR_PARAM, func, line);
+    pub_log_flags(g_amt_convert_log, {cursor == nullptr, is_target_absent(cursor), packet == nullptr, false});
     return PUB_ERR_PARAM;
 }
 
@@ -157,13 +157,13 @@ int rsp_at_data_2_amt_data_atom_bool(const uint8_t **cursor, uint8_t *packet, ui
 int rsp_at_data_2_amt_data_atom_byte(const uint8_t **cursor, uint8_t *packet, uint32_t count, uint8_t atom_id)
 {
     if (is_target_absent(cursor) || packet == nullptr || count == 0) {
-        PUB_LOG_ERROR(g_amt_convert_log, PUB_ERR_PARAM);
-        PUB_LOG_FLAGS(g_amt_convert_log, cursor == nullptr, is_target_absent(cursor), packet == nullptr,
-                      count == 0, false);
+        pub_log_error(g_amt_convert_log, PUB_ERR_PARAM);
+        pub_log_flags(g_amt_convert_log,
+                      {cursor == nullptr, is_target_absent(cursor), packet == nullptr, count == 0, false});
         return PUB_ERR_PARAM;
     }
     if (!amt_packet_has_room(packet, count)) {
-        PUB_LOG_ERROR(g_amt_convert_log, PUB_ERR_FAIL);
+        pub_log_error(g_amt_convert_log, PUB_ERR_FAIL);
         PUB_LOG(g_amt_convert_log, "atom of %u bytes does not fit the packet", count);
         return PUB_ERR_FAIL;
     }
@@ -174,11 +174,11 @@ int rsp_at_data_2_amt_data_atom_byte(const uint8_t **cursor, uint8_t *packet, ui
 
 int amt_convert_rsp_at_data_2_amt_data(const uint8_t *block, uint32_t len, uint8_t *packet, uint32_t capacity)
 {
-    PUB_LOG_ENTRY(g_amt_convert_log);
+    pub_log_entry(g_amt_convert_log);
     if (block == nullptr || len == 0 || packet == nullptr || capacity != AMT_PACKET_SIZE) {
-        PUB_LOG_ERROR(g_amt_convert_log, PUB_ERR_PARAM);
-        PUB_LOG_FLAGS(g_amt_convert_log, block == nullptr, len == 0, packet == nullptr,
-                      capacity != AMT_PACKET_SIZE);
+        pub_log_error(g_amt_convert_log, PUB_ERR_PARAM);
+        pub_log_flags(g_amt_convert_log,
+                      {block == nullptr, len == 0, packet == nullptr, capacity != AMT_PACKET_SIZE});
         return PUB_ERR_PARAM;
     }
     /* The fields may claim more than the block has: what lies behind it reads as zero bytes, to the end of

@@ -61,16 +61,16 @@ bool append(const block_st &block, const uint8_t *data, uint32_t n)
 
 /* A malformed packet ends the conversion: says why, in the name of the function that uses it. */
 #define REFUSE(...)                                                                                          \
-    (PUB_LOG_ERROR(g_amt_convert_log, PUB_ERR_FAIL), PUB_LOG(g_amt_convert_log, __VA_ARGS__), PUB_ERR_FAIL)
+    (pub_log_error(g_amt_convert_log, PUB_ERR_FAIL), PUB_LOG(g_amt_convert_log, __VA_ARGS__), PUB_ERR_FAIL)
 
 int amt_convert_req_amt_data_2_at_data(const uint8_t *packet, uint8_t *out, uint32_t capacity,
                                        uint32_t *out_len)
 {
-    PUB_LOG_ENTRY(g_amt_convert_log);
+    pub_log_entry(g_amt_convert_log);
     if (packet == nullptr || out == nullptr || capacity == 0 || out_len == nullptr) {
-        PUB_LOG_ERROR(g_amt_convert_log, PUB_ERR_PARAM);
-        PUB_LOG_FLAGS(g_amt_convert_log, packet == nullptr, out == nullptr, capacity == 0,
-                      out_len == nullptr);
+        pub_log_error(g_amt_convert_log, PUB_ERR_PARAM);
+        pub_log_flags(g_amt_convert_log,
+                      {packet == nullptr, out == nullptr, capacity == 0, out_len == nullptr});
         return PUB_ERR_PARAM;
     }
     amt_packet_clear(out, capacity);
@@ -120,10 +120,10 @@ int amt_convert_req_amt_data_2_at_data(const uint8_t *packet, uint8_t *out, uint
 
 int amt_convert_pc_2_app(amt_buf_st *buf_ptr)
 {
-    PUB_LOG_ENTRY(g_amt_convert_log);
+    pub_log_entry(g_amt_convert_log);
     if (buf_ptr == nullptr || buf_ptr->m_buf_len == 0) {
-        PUB_LOG_ERROR(g_amt_convert_log, PUB_ERR_PARAM);
-        PUB_LOG_FLAGS(g_amt_convert_log, buf_ptr == nullptr, buf_ptr != nullptr && buf_ptr->m_buf_len == 0);
+        pub_log_error(g_amt_convert_log, PUB_ERR_PARAM);
+        pub_log_flags(g_amt_convert_log, {buf_ptr == nullptr, buf_ptr != nullptr && buf_ptr->m_buf_len == 0});
         return PUB_ERR_PARAM;
     }
     uint8_t *data = buf_ptr->m_buf_a;
@@ -140,17 +140,17 @@ int amt_convert_pc_2_app(amt_buf_st *buf_ptr)
 
 int amt_convert_app_2_pc(amt_buf_st *buf_ptr)
 {
-    PUB_LOG_ENTRY(g_amt_convert_log);
+    pub_log_entry(g_amt_convert_log);
     if (buf_ptr == nullptr) {
-        PUB_LOG_ERROR(g_amt_convert_log, PUB_ERR_PARAM);
-        PUB_LOG_FLAGS(g_amt_convert_log, true);
+        pub_log_error(g_amt_convert_log, PUB_ERR_PARAM);
+        pub_log_flags(g_amt_convert_log, {true});
         return PUB_ERR_PARAM;
     }
     uint8_t *data = buf_ptr->m_buf_a;
     const uint32_t length = buf_ptr->m_buf_len != 0 ? buf_ptr->m_buf_len : amt_packet_get_length(data);
     if (length == 0 || length > sizeof(buf_ptr->m_buf_a) - AMT_ENVELOPE_OVERHEAD) {
-        PUB_LOG_ERROR(g_amt_convert_log, PUB_ERR_PARAM);
-        PUB_LOG_FLAGS(g_amt_convert_log, true);
+        pub_log_error(g_amt_convert_log, PUB_ERR_PARAM);
+        pub_log_flags(g_amt_convert_log, {true});
         return PUB_ERR_PARAM;
     }
     memmove(data + AMT_ENVELOPE_HEAD_SIZE, data, length);

@@ -60,7 +60,7 @@ int operate(int32_t operation)
 
 int amt_gps_control(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    PUB_LOG_ENTRY(g_amt_gps_log);
+    pub_log_entry(g_amt_gps_log);
     if (AMT_CHECK_REQUEST(g_amt_gps_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
@@ -81,7 +81,7 @@ int amt_gps_test(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 
 int amt_gps_read_result(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    PUB_LOG_ENTRY(g_amt_gps_log);
+    pub_log_entry(g_amt_gps_log);
     if (AMT_CHECK_REQUEST(g_amt_gps_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         amt_device_run("echo gps read result:invalid param > /data/local/wifi/gps_get_result.txt");
         return PUB_ERR_PARAM;

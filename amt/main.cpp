@@ -125,7 +125,7 @@ void log_banner()
 
 void amt_deinit_resource()
 {
-    PUB_LOG_ENTRY(g_amt_main_log);
+    pub_log_entry(g_amt_main_log);
     amt_handle_deinit();
 }
 
@@ -217,7 +217,7 @@ int start(int mode)
 [[noreturn]] void end_by_fatal_error(int error_code)
 {
     PUB_LOG(g_amt_main_log, "FATAL ERROR!!!");
-    pub_log_error(g_amt_main_log, FATAL_LINE, "main", error_code);
+    pub_log_error(g_amt_main_log, error_code, "main", FATAL_LINE);
     amt_process_end_begin(error_code);
     amt_deinit_resource();
     amt_process_end_finish();

@@ -37,7 +37,7 @@ int32_t level_to_write(int32_t requested)
 
 int amt_device_lcd_brightness(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    PUB_LOG_ENTRY(g_amt_device_log);
+    pub_log_entry(g_amt_device_log);
     if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
@@ -55,7 +55,7 @@ int amt_device_lcd_brightness(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st 
 
 int amt_device_button_backlight(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    PUB_LOG_ENTRY(g_amt_device_log);
+    pub_log_entry(g_amt_device_log);
     if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }

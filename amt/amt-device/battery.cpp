@@ -51,8 +51,8 @@ void hand_to_driver(int32_t a, int32_t b, int32_t c, int32_t d)
     const int result = system(command_a);
     PUB_LOG(g_amt_device_log, "%s", command_a);
     if (result < 0) {
-        PUB_LOG_SYS_CALL(g_amt_device_log, "system");
-        pub_log_error(g_amt_device_log, __LINE__, CHECK_HANDLER, PUB_ERR_SYS_CALL);
+        pub_log_sys_call(g_amt_device_log, "system");
+        pub_log_error(g_amt_device_log, PUB_ERR_SYS_CALL, CHECK_HANDLER);
     }
 }
 
@@ -88,7 +88,7 @@ int build_check_rsp(const amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 
 int amt_device_battery_voltage(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    PUB_LOG_ENTRY(g_amt_device_log);
+    pub_log_entry(g_amt_device_log);
     if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
@@ -105,7 +105,7 @@ int amt_device_battery_voltage(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st
 
 int amt_device_battery_voltage_check(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    PUB_LOG_ENTRY(g_amt_device_log);
+    pub_log_entry(g_amt_device_log);
     if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }

@@ -40,7 +40,7 @@ int select_preview(int32_t camera)
 {
     const int fd = open_camera();
     if (fd < 0) {
-        pub_log_error(g_amt_device_log, __LINE__, PREVIEW_HANDLER, PUB_ERR_FAIL);
+        pub_log_error(g_amt_device_log, PUB_ERR_FAIL, PREVIEW_HANDLER);
         return PUB_ERR_FAIL;
     }
     int32_t value = camera;
@@ -101,13 +101,13 @@ void log_control_id(int32_t control_id)
 
 int amt_device_camera(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    PUB_LOG_ENTRY(g_amt_device_log);
+    pub_log_entry(g_amt_device_log);
     if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
     const uint8_t command_id = amt_packet_get_cmd(req_ptr->m_buf_a);
     if (command_id != AMT_CAMERA_PREVIEW_CMD && command_id != AMT_SECOND_CAMERA_PREVIEW_CMD) {
-        PUB_LOG_ERROR(g_amt_device_log, PUB_ERR_FAIL);
+        pub_log_error(g_amt_device_log, PUB_ERR_FAIL);
         return PUB_ERR_FAIL;
     }
     const int result = select_preview(command_id == AMT_CAMERA_PREVIEW_CMD ? PREVIEW_MAIN : PREVIEW_SECOND);
@@ -119,7 +119,7 @@ int amt_device_camera(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr
 
 int amt_device_camera_control(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    PUB_LOG_ENTRY(g_amt_device_log);
+    pub_log_entry(g_amt_device_log);
     if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }

@@ -15,7 +15,7 @@ constexpr uint32_t TEXT_SIZE = 4352;
 int amt_device_fail(const pub_log_source_st &source, int line, const char *func, int code, const char *format,
                     ...)
 {
-    pub_log_error(source, line, func, code);
+    pub_log_error(source, code, func, line);
     char text_a[TEXT_SIZE];
     va_list args;
     va_start(args, format);
@@ -27,7 +27,7 @@ int amt_device_fail(const pub_log_source_st &source, int line, const char *func,
 
 int amt_device_fail_call(int line, const char *func, const char *call)
 {
-    pub_log_error(g_amt_device_log, line, func, PUB_ERR_FAIL);
-    PUB_LOG_SYS_CALL(g_amt_device_log, call);
+    pub_log_error(g_amt_device_log, PUB_ERR_FAIL, func, line);
+    pub_log_sys_call(g_amt_device_log, call);
     return PUB_ERR_FAIL;
 }

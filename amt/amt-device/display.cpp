@@ -6,7 +6,7 @@
 
 int amt_device_lcd_color(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    PUB_LOG_ENTRY(g_amt_device_log);
+    pub_log_entry(g_amt_device_log);
     if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }

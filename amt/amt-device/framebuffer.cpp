@@ -29,10 +29,12 @@ framebuffer_st g_framebuffer = {-1, nullptr, {}, {}};
 /* Counts, for the life of the process, how often the display layer has been set up: once is enough. */
 int32_t g_layer_enabled_count = 0;
 
-/* The display's records have always been written without a tag, and with a line end. */
+/* Who reads the display's records looks for them without a tag. */
+constexpr pub_log_source_st g_display_log{nullptr, ""};
+
 int fail(const char *text)
 {
-    pub_log_print(nullptr, "%s", text);
+    PUB_LOG(g_display_log, "%s", text);
     return -1;
 }
 

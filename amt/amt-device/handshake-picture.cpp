@@ -14,7 +14,7 @@ namespace {
 constexpr uint32_t SHOW_DELAY_MS = 3000;
 
 /* The picture's own records carry this tag. */
-constexpr char PICTURE_TAG[] = "CHARGE_ONLY_MODE";
+constexpr pub_log_source_st g_picture_log{"CHARGE_ONLY_MODE", ""};
 
 /* The unpacked picture, kept as long as the process lives; null when it is not ready. */
 uint8_t *g_pixel_ptr = nullptr;
@@ -23,11 +23,11 @@ int unpack_picture()
 {
     uint8_t *pixel_ptr = static_cast<uint8_t *>(malloc(AMT_PICTURE_SIZE));
     if (pixel_ptr == nullptr) {
-        pub_log_print(PICTURE_TAG, "Out of memory\n");
+        PUB_LOG(g_picture_log, "Out of memory\n");
         return -1;
     }
     if (amt_picture_unpack(g_handshake_picture_a, g_handshake_picture_length, pixel_ptr) != 0) {
-        pub_log_print(PICTURE_TAG, "Unexpected inflate error\n");
+        PUB_LOG(g_picture_log, "Unexpected inflate error\n");
         free(pixel_ptr);
         return -1;
     }

@@ -44,7 +44,7 @@ int call_hal(int line, const char *func, const char *name, int32_t *answer_ptr, 
 
 int amt_make_ue_enter_idle()
 {
-    PUB_LOG_ENTRY(g_amt_device_log);
+    pub_log_entry(g_amt_device_log);
     int32_t answer = 0;
     const int result =
         call_hal<amt_misc_hal_enter_idle_func>(__LINE__, __func__, AMT_MISC_HAL_ENTER_IDLE, &answer);
@@ -85,7 +85,7 @@ int amt_boot_dl_fin_read(int32_t *verdict_ptr)
 
 int amt_read_dev_info(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    PUB_LOG_ENTRY(g_amt_device_log);
+    pub_log_entry(g_amt_device_log);
     if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
@@ -105,7 +105,7 @@ int amt_read_dev_info(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr
 
 int amt_enter_idle(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    PUB_LOG_ENTRY(g_amt_device_log);
+    pub_log_entry(g_amt_device_log);
     if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
@@ -119,7 +119,7 @@ int amt_enter_idle(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 
 int amt_device_emmc_info(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    PUB_LOG_ENTRY(g_amt_device_log);
+    pub_log_entry(g_amt_device_log);
     if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }

@@ -85,8 +85,8 @@ int set_serial_dev_attr(int fd)
 {
     termios attr = {};
     if (tcgetattr(fd, &attr) != 0) {
-        PUB_LOG_SYS_CALL(g_amt_handle_log, "tcgetattr");
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_SYS_CALL);
+        pub_log_sys_call(g_amt_handle_log, "tcgetattr");
+        pub_log_error(g_amt_handle_log, PUB_ERR_SYS_CALL);
         return PUB_ERR_SYS_CALL;
     }
     attr.c_cflag &= ~static_cast<tcflag_t>(CBAUD | CBAUDEX);
@@ -94,8 +94,8 @@ int set_serial_dev_attr(int fd)
     attr.c_iflag &= ~static_cast<tcflag_t>(INLCR | ICRNL | IXON);
     attr.c_oflag &= ~static_cast<tcflag_t>(OPOST);
     if (tcsetattr(fd, TCSANOW, &attr) != 0) {
-        PUB_LOG_SYS_CALL(g_amt_handle_log, "tcsetattr");
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_SYS_CALL);
+        pub_log_sys_call(g_amt_handle_log, "tcsetattr");
+        pub_log_error(g_amt_handle_log, PUB_ERR_SYS_CALL);
         return PUB_ERR_SYS_CALL;
     }
     return PUB_ERR_NONE;
@@ -118,7 +118,7 @@ int start_pc_worker(amt_worker_st *worker_ptr, void (*loop)())
         return PUB_ERR_NONE;
     }
     errno = error;
-    PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FILE);
+    pub_log_error(g_amt_handle_log, PUB_ERR_FILE);
     PUB_LOG(g_amt_handle_log, "pthread_create(): %d - %s", error, strerror(error));
     return PUB_ERR_FILE;
 }
@@ -147,7 +147,7 @@ int open_pc_path()
 
 int init_for_amt_1_4()
 {
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     if (g_usb_activate != 0) {
         amt_handshake_start_usb_enum_timer();
     }
@@ -184,7 +184,7 @@ int open_packet_path()
     const int error = amt_worker_start(&g_handle_context.m_app_reader, amt_handle_read_app_loop);
     if (error != 0) {
         errno = error;
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FILE);
+        pub_log_error(g_amt_handle_log, PUB_ERR_FILE);
         PUB_LOG(g_amt_handle_log, "pthread_create() fail: %d", error);
         return PUB_ERR_FILE;
     }
@@ -200,7 +200,7 @@ void close_pty()
 
 int init_for_amt_2_3()
 {
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     const int status = open_packet_path();
     if (status != PUB_ERR_NONE) {
         amt_worker_stop(&g_handle_context.m_app_reader);
@@ -215,7 +215,7 @@ int init_for_amt_2_3()
 
 int amt_handle_init(int normal_mode)
 {
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     amt_service_process_mark();
     g_handle_state.m_amt_mode = AMT_MODE_1;
     g_handshake_state.m_is_property_set = 0;
@@ -238,7 +238,7 @@ int amt_handle_deinit()
     if (g_is_deinit_done.exchange(1) != 0) {
         return PUB_ERR_NONE;
     }
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     amt_worker_stop(&g_handle_context.m_modem_reader);
     amt_worker_stop(&g_handle_context.m_pc_reader);
     amt_worker_stop(&g_handle_context.m_usb_monitor);

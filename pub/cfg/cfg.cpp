@@ -3,7 +3,7 @@
 #include <string.h>
 
 #include "pub/error.h"
-#include "pub/log/log.h"
+#include "pub/pub-log.h"
 
 namespace {
 
@@ -28,9 +28,9 @@ void cut_blanks(const char *start, char *end)
 int pub_cfg_get_line(FILE *stream, char *buf, uint32_t capacity, uint32_t *length_ptr, int *is_eof_ptr)
 {
     if (stream == nullptr || buf == nullptr || length_ptr == nullptr || is_eof_ptr == nullptr) {
-        PUB_LOG_ERROR(g_pub_cfg_log, PUB_ERR_PARAM);
-        PUB_LOG_FLAGS(g_pub_cfg_log, stream == nullptr, buf == nullptr, length_ptr == nullptr,
-                      is_eof_ptr == nullptr);
+        pub_log_error(g_pub_cfg_log, PUB_ERR_PARAM);
+        pub_log_flags(g_pub_cfg_log,
+                      {stream == nullptr, buf == nullptr, length_ptr == nullptr, is_eof_ptr == nullptr});
         return PUB_ERR_PARAM;
     }
     *is_eof_ptr = 0;
@@ -58,8 +58,8 @@ int pub_cfg_get_line(FILE *stream, char *buf, uint32_t capacity, uint32_t *lengt
 int pub_cfg_get_param_and_value(char *line, char **key_ptr, char **value_ptr)
 {
     if (line == nullptr || key_ptr == nullptr || value_ptr == nullptr) {
-        PUB_LOG_ERROR(g_pub_cfg_log, PUB_ERR_PARAM);
-        PUB_LOG_FLAGS(g_pub_cfg_log, line == nullptr, key_ptr == nullptr, value_ptr == nullptr);
+        pub_log_error(g_pub_cfg_log, PUB_ERR_PARAM);
+        pub_log_flags(g_pub_cfg_log, {line == nullptr, key_ptr == nullptr, value_ptr == nullptr});
         return PUB_ERR_PARAM;
     }
     char *key = skip_blanks(line);

@@ -1,13 +1,9 @@
 #include "pub/log/log.h"
 
 #include <errno.h>
-#include <stdarg.h>
-#include <stdio.h>
 
 namespace {
 
-/* Holds the longest text there is: a whole 4096-byte receive area after its title. */
-constexpr uint32_t TEXT_SIZE = 4608;
 constexpr uint32_t FLAG_TEXT_SIZE = 32;
 
 /* Set while this thread is inside the platform's log, whose locks a signal handler must not meet again. */
@@ -29,24 +25,12 @@ void pub_log_end()
     t_is_logging = false;
 }
 
-void pub_log_print(const char *tag, const char *format, ...)
-{
-    const int saved_errno = errno;
-    char text_a[TEXT_SIZE];
-    va_list args;
-    va_start(args, format);
-    vsnprintf(text_a, sizeof(text_a), format, args);
-    va_end(args);
-    pub_log_guarded([&] { __android_log_print(ANDROID_LOG_DEBUG, tag, "%s", text_a); });
-    errno = saved_errno;
-}
-
 void pub_log_entry(const pub_log_source_st &source, const char *func)
 {
     PUB_LOG(source, "%s()", func);
 }
 
-void pub_log_error(const pub_log_source_st &source, int line, const char *func, int error_code)
+void pub_log_error(const pub_log_source_st &source, int error_code, const char *func, int line)
 {
     PUB_LOG(source, "FILE-%s, LINE-%d, FUNC-%s(), error_code=%d, errno=%d", source.m_name_ptr, line, func,
             error_code, errno);

@@ -6,7 +6,7 @@
 #include <termios.h>
 
 #include "pub/error.h"
-#include "pub/log/log.h"
+#include "pub/pub-log.h"
 
 namespace {
 
@@ -38,10 +38,10 @@ const serial_speed_st *find_speed(int32_t speed)
 
 int pub_util_try_to_open_device(int *fd_ptr, const char *path, int flags, int32_t attempts, int32_t pause_ms)
 {
-    PUB_LOG_ENTRY(g_pub_util_log);
+    pub_log_entry(g_pub_util_log);
     if (fd_ptr == nullptr || path == nullptr || *path == '\0') {
-        PUB_LOG_ERROR(g_pub_util_log, PUB_ERR_PARAM);
-        PUB_LOG_FLAGS(g_pub_util_log, fd_ptr == nullptr, path == nullptr, path != nullptr && *path == '\0');
+        pub_log_error(g_pub_util_log, PUB_ERR_PARAM);
+        pub_log_flags(g_pub_util_log, {fd_ptr == nullptr, path == nullptr, path != nullptr && *path == '\0'});
         return PUB_ERR_PARAM;
     }
     /*
@@ -66,7 +66,7 @@ int pub_util_try_to_open_device(int *fd_ptr, const char *path, int flags, int32_
             return PUB_ERR_NONE;
         }
         const int open_errno = errno;
-        PUB_LOG_ERROR(g_pub_util_log, PUB_ERR_FILE);
+        pub_log_error(g_pub_util_log, PUB_ERR_FILE);
         PUB_LOG(g_pub_util_log, "open device \"%s\" fail: %d - %s", path, errno, strerror(errno));
         pub_util_sleep_ms(pause);
         if (attempt >= attempts) {
@@ -76,23 +76,23 @@ int pub_util_try_to_open_device(int *fd_ptr, const char *path, int flags, int32_
         PUB_LOG(g_pub_util_log, "(%ld/%ld)try to open device \"%s\"", static_cast<long>(attempt),
                 static_cast<long>(attempts), path);
     }
-    PUB_LOG_ERROR(g_pub_util_log, PUB_ERR_FILE);
+    pub_log_error(g_pub_util_log, PUB_ERR_FILE);
     PUB_LOG(g_pub_util_log, "open device \"%s\" fail: %d - %s", path, errno, strerror(errno));
     return PUB_ERR_FILE;
 }
 
 int pub_util_set_serial_dev_attr(int fd, int32_t speed)
 {
-    PUB_LOG_ENTRY(g_pub_util_log);
+    pub_log_entry(g_pub_util_log);
     if (fd < 0) {
-        PUB_LOG_ERROR(g_pub_util_log, PUB_ERR_PARAM);
+        pub_log_error(g_pub_util_log, PUB_ERR_PARAM);
         return PUB_ERR_PARAM;
     }
     termios attr = {};
     const int get_result = tcgetattr(fd, &attr);
     if (get_result != 0) {
-        PUB_LOG_SYS_CALL(g_pub_util_log, "tcgetattr");
-        PUB_LOG_ERROR(g_pub_util_log, PUB_ERR_SYS_CALL);
+        pub_log_sys_call(g_pub_util_log, "tcgetattr");
+        pub_log_error(g_pub_util_log, PUB_ERR_SYS_CALL);
     }
     const serial_speed_st *row = find_speed(speed);
     PUB_LOG(g_pub_util_log, "convert speed %ld -> %s", static_cast<long>(speed), row->m_name_ptr);
@@ -107,8 +107,8 @@ int pub_util_set_serial_dev_attr(int fd, int32_t speed)
     attr.c_lflag = 0;
     attr.c_cflag |= CRTSCTS;
     if (tcsetattr(fd, TCSANOW, &attr) != 0) {
-        PUB_LOG_SYS_CALL(g_pub_util_log, "tcsetattr");
-        PUB_LOG_ERROR(g_pub_util_log, PUB_ERR_SYS_CALL);
+        pub_log_sys_call(g_pub_util_log, "tcsetattr");
+        pub_log_error(g_pub_util_log, PUB_ERR_SYS_CALL);
         return PUB_ERR_SYS_CALL;
     }
     return PUB_ERR_NONE;
@@ -116,17 +116,17 @@ int pub_util_set_serial_dev_attr(int fd, int32_t speed)
 
 int pub_util_set_fd_mode(int fd, int is_nonblock)
 {
-    PUB_LOG_ENTRY(g_pub_util_log);
+    pub_log_entry(g_pub_util_log);
     if (fd < 0) {
-        PUB_LOG_ERROR(g_pub_util_log, PUB_ERR_PARAM);
+        pub_log_error(g_pub_util_log, PUB_ERR_PARAM);
         return PUB_ERR_PARAM;
     }
     PUB_LOG(g_pub_util_log, "pub_util_set_fd_mode fd[%d] is_nonblock_mode[%d]", fd, is_nonblock);
     const int old_flags = fcntl(fd, F_GETFL);
     const int new_flags = is_nonblock != 0 ? old_flags | O_NONBLOCK : old_flags & ~O_NONBLOCK;
     if (old_flags < 0 || fcntl(fd, F_SETFL, new_flags) < 0) {
-        PUB_LOG_SYS_CALL(g_pub_util_log, "fcntl");
-        PUB_LOG_ERROR(g_pub_util_log, PUB_ERR_FILE);
+        pub_log_sys_call(g_pub_util_log, "fcntl");
+        pub_log_error(g_pub_util_log, PUB_ERR_FILE);
         return PUB_ERR_FILE;
     }
     PUB_LOG(g_pub_util_log, "pub_util_set_fd_mode return ERR_NONE");

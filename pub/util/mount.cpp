@@ -6,7 +6,7 @@
 
 #include "pub/cfg/cfg.h"
 #include "pub/error.h"
-#include "pub/log/log.h"
+#include "pub/pub-log.h"
 
 namespace {
 
@@ -39,34 +39,34 @@ void store_kib(uint32_t *out_ptr, uint64_t block_size, uint64_t blocks)
 int pub_util_get_mount_fs_info(const char *mount_point, uint32_t *total_ptr, uint32_t *used_ptr,
                                uint32_t *available_ptr)
 {
-    PUB_LOG_ENTRY(g_pub_util_log);
+    pub_log_entry(g_pub_util_log);
     const bool has_no_output = total_ptr == nullptr && used_ptr == nullptr && available_ptr == nullptr;
     if (mount_point == nullptr || *mount_point == '\0' || has_no_output) {
-        PUB_LOG_ERROR(g_pub_util_log, PUB_ERR_PARAM);
-        PUB_LOG_FLAGS(g_pub_util_log, mount_point == nullptr, mount_point != nullptr && *mount_point == '\0',
-                      has_no_output);
+        pub_log_error(g_pub_util_log, PUB_ERR_PARAM);
+        pub_log_flags(g_pub_util_log, {mount_point == nullptr, mount_point != nullptr && *mount_point == '\0',
+                                       has_no_output});
         return PUB_ERR_PARAM;
     }
 
     bool is_mounted = false;
     FILE *mounts = fopen("/proc/mounts", "re");
     if (mounts == nullptr) {
-        PUB_LOG_SYS_CALL(g_pub_util_log, "fopen");
-        PUB_LOG_ERROR(g_pub_util_log, PUB_ERR_SYS_CALL);
+        pub_log_sys_call(g_pub_util_log, "fopen");
+        pub_log_error(g_pub_util_log, PUB_ERR_SYS_CALL);
     } else {
         is_mounted = is_listed(mounts, mount_point);
         fclose(mounts);
     }
     if (!is_mounted) {
-        PUB_LOG_ERROR(g_pub_util_log, PUB_ERR_NOT_FOUND);
+        pub_log_error(g_pub_util_log, PUB_ERR_NOT_FOUND);
         PUB_LOG(g_pub_util_log, "file system \"%s\" has not been mounted", mount_point);
         return PUB_ERR_NOT_FOUND;
     }
 
     struct statfs64 info = {};
     if (statfs64(mount_point, &info) != 0) {
-        PUB_LOG_SYS_CALL(g_pub_util_log, "statfs");
-        PUB_LOG_ERROR(g_pub_util_log, PUB_ERR_SYS_CALL);
+        pub_log_sys_call(g_pub_util_log, "statfs");
+        pub_log_error(g_pub_util_log, PUB_ERR_SYS_CALL);
         return PUB_ERR_FILE;
     }
     const uint64_t block_size = static_cast<uint64_t>(info.f_bsize);

@@ -8,7 +8,7 @@
 #include <unistd.h>
 
 #include "pub/error.h"
-#include "pub/log/log.h"
+#include "pub/pub-log.h"
 
 namespace {
 
@@ -33,7 +33,7 @@ FILE *open_file(const char *path, const char *func, int line)
 {
     FILE *file = fopen(path, "re");
     if (file == nullptr) {
-        pub_log_error(g_pub_util_log, line, func, PUB_ERR_FILE);
+        pub_log_error(g_pub_util_log, PUB_ERR_FILE, func, line);
         PUB_LOG(g_pub_util_log, "Open file \"%s\" fail: %d - %s", path, errno, strerror(errno));
     }
     return file;
@@ -72,7 +72,7 @@ long read_pid_file(const char *pid_file)
     errno = 0; /* text that is no number sets none */
     const int scanned = fscanf(file, "%18ld", &pid);
     if (scanned != 1) {
-        pub_log_error(g_pub_util_log, __LINE__, CHECK_RUN, PUB_ERR_FILE);
+        pub_log_error(g_pub_util_log, PUB_ERR_FILE, CHECK_RUN);
         PUB_LOG(g_pub_util_log, "fscanf() return: %d; %d - %s", scanned, errno, strerror(errno));
         pid = 0;
     } else {
@@ -103,13 +103,13 @@ bool is_program(long pid, const char *name)
 int pub_util_get_pid_and_check_run(const char *pid_file, const char *name, int32_t *is_run_ptr,
                                    int32_t *pid_ptr)
 {
-    PUB_LOG_ENTRY(g_pub_util_log);
+    pub_log_entry(g_pub_util_log);
     if (pid_file == nullptr || is_empty(pid_file) || name == nullptr || is_empty(name) ||
         is_run_ptr == nullptr || pid_ptr == nullptr)
     {
-        PUB_LOG_ERROR(g_pub_util_log, PUB_ERR_PARAM);
-        PUB_LOG_FLAGS(g_pub_util_log, pid_file == nullptr, is_empty(pid_file), name == nullptr,
-                      is_empty(name), is_run_ptr == nullptr, pid_ptr == nullptr);
+        pub_log_error(g_pub_util_log, PUB_ERR_PARAM);
+        pub_log_flags(g_pub_util_log, {pid_file == nullptr, is_empty(pid_file), name == nullptr,
+                                       is_empty(name), is_run_ptr == nullptr, pid_ptr == nullptr});
         return PUB_ERR_PARAM;
     }
     PUB_LOG(g_pub_util_log, "pub_util_get_pid_and_check_run pid_file_ptr[%s] name_ptr[%s]", pid_file, name);
@@ -127,10 +127,10 @@ int pub_util_get_pid_and_check_run(const char *pid_file, const char *name, int32
 
 int pub_util_create_pid_file(const char *name)
 {
-    PUB_LOG_ENTRY(g_pub_util_log);
+    pub_log_entry(g_pub_util_log);
     if (name == nullptr) {
-        PUB_LOG_ERROR(g_pub_util_log, PUB_ERR_PARAM);
-        PUB_LOG_FLAGS(g_pub_util_log, true);
+        pub_log_error(g_pub_util_log, PUB_ERR_PARAM);
+        pub_log_flags(g_pub_util_log, {true});
         return PUB_ERR_PARAM;
     }
     const int pid = static_cast<int>(getpid());
@@ -145,10 +145,10 @@ int pub_util_create_pid_file(const char *name)
 
 int pub_util_get_cmd_line(int32_t pid, char *buf, uint32_t capacity)
 {
-    PUB_LOG_ENTRY(g_pub_util_log);
+    pub_log_entry(g_pub_util_log);
     if (buf == nullptr || capacity == 0) {
-        PUB_LOG_ERROR(g_pub_util_log, PUB_ERR_PARAM);
-        PUB_LOG_FLAGS(g_pub_util_log, buf == nullptr, capacity == 0);
+        pub_log_error(g_pub_util_log, PUB_ERR_PARAM);
+        pub_log_flags(g_pub_util_log, {buf == nullptr, capacity == 0});
         return PUB_ERR_PARAM;
     }
     memset(buf, 0, capacity);
@@ -161,8 +161,8 @@ int pub_util_get_cmd_line(int32_t pid, char *buf, uint32_t capacity)
     errno = 0; /* an empty command line sets none */
     const int scanned = scan_word(file, buf, capacity);
     if (scanned != 1) {
-        PUB_LOG_SYS_CALL(g_pub_util_log, "fscanf");
-        PUB_LOG_ERROR(g_pub_util_log, PUB_ERR_SYS_CALL);
+        pub_log_sys_call(g_pub_util_log, "fscanf");
+        pub_log_error(g_pub_util_log, PUB_ERR_SYS_CALL);
     }
     fclose(file);
     return scanned == 1 ? PUB_ERR_NONE : PUB_ERR_FILE;
@@ -170,10 +170,10 @@ int pub_util_get_cmd_line(int32_t pid, char *buf, uint32_t capacity)
 
 int pub_util_get_process_path(char *buf, uint32_t capacity)
 {
-    PUB_LOG_ENTRY(g_pub_util_log);
+    pub_log_entry(g_pub_util_log);
     if (buf == nullptr || capacity == 0) {
-        PUB_LOG_ERROR(g_pub_util_log, PUB_ERR_PARAM);
-        PUB_LOG_FLAGS(g_pub_util_log, buf == nullptr, capacity == 0);
+        pub_log_error(g_pub_util_log, PUB_ERR_PARAM);
+        pub_log_flags(g_pub_util_log, {buf == nullptr, capacity == 0});
         return PUB_ERR_PARAM;
     }
     const int ret_val = pub_util_get_cmd_line(static_cast<int32_t>(getpid()), buf, capacity);
@@ -189,18 +189,18 @@ int pub_util_get_process_path(char *buf, uint32_t capacity)
 
 int pub_util_raise_process_priority()
 {
-    PUB_LOG_ENTRY(g_pub_util_log);
+    pub_log_entry(g_pub_util_log);
     const int maximum = sched_get_priority_max(SCHED_FIFO);
     if (maximum < 0) {
-        PUB_LOG_SYS_CALL(g_pub_util_log, "sched_get_priority_max");
-        PUB_LOG_ERROR(g_pub_util_log, PUB_ERR_SYS_CALL);
+        pub_log_sys_call(g_pub_util_log, "sched_get_priority_max");
+        pub_log_error(g_pub_util_log, PUB_ERR_SYS_CALL);
         return PUB_ERR_SYS_CALL;
     }
     sched_param param = {};
     param.sched_priority = maximum - PRIORITY_BELOW_MAXIMUM;
     if (sched_setscheduler(getpid(), SCHED_FIFO, &param) < 0) {
-        PUB_LOG_SYS_CALL(g_pub_util_log, "sched_setscheduler");
-        PUB_LOG_ERROR(g_pub_util_log, PUB_ERR_SYS_CALL);
+        pub_log_sys_call(g_pub_util_log, "sched_setscheduler");
+        pub_log_error(g_pub_util_log, PUB_ERR_SYS_CALL);
         return PUB_ERR_SYS_CALL;
     }
     return PUB_ERR_NONE;

@@ -8,7 +8,7 @@
 #include <unistd.h>
 
 #include "pub/error.h"
-#include "pub/log/log.h"
+#include "pub/pub-log.h"
 #include "pub/util/util.h"
 
 namespace {
@@ -89,10 +89,10 @@ void pub_util_sleep_ms(uint32_t ms)
 
 int pub_util_kill_thread(pthread_t *thread_ptr)
 {
-    PUB_LOG_ENTRY(g_pub_util_log);
+    pub_log_entry(g_pub_util_log);
     if (thread_ptr == nullptr) {
-        PUB_LOG_ERROR(g_pub_util_log, PUB_ERR_PARAM);
-        PUB_LOG_FLAGS(g_pub_util_log, true);
+        pub_log_error(g_pub_util_log, PUB_ERR_PARAM);
+        pub_log_flags(g_pub_util_log, {true});
         return PUB_ERR_PARAM;
     }
     if (*thread_ptr == 0 || pthread_kill(*thread_ptr, 0) == ESRCH) {
@@ -101,7 +101,7 @@ int pub_util_kill_thread(pthread_t *thread_ptr)
     const int error_number = pthread_kill(*thread_ptr, SIGUSR1);
     if (error_number != 0) {
         errno = error_number; /* the call only returns it */
-        PUB_LOG_ERROR(g_pub_util_log, PUB_ERR_FILE);
+        pub_log_error(g_pub_util_log, PUB_ERR_FILE);
         PUB_LOG(g_pub_util_log, "pthread_kill(): %d - %s", error_number, strerror(error_number));
         return error_number;
     }
@@ -113,8 +113,8 @@ int pub_util_kill_thread(pthread_t *thread_ptr)
 void pub_util_handle_thread_signal(int signal_number)
 {
     if (signal_number != SIGUSR1) {
-        PUB_LOG_ENTRY(g_pub_util_log);
-        PUB_LOG_ERROR(g_pub_util_log, PUB_ERR_PARAM);
+        pub_log_entry(g_pub_util_log);
+        pub_log_error(g_pub_util_log, PUB_ERR_PARAM);
         PUB_LOG(g_pub_util_log, "unknown signal: %d", signal_number);
         return;
     }
@@ -128,7 +128,7 @@ void pub_util_handle_thread_signal(int signal_number)
     /* The farewell is work, too: a second signal must not end the thread in the middle of it. */
     t_is_deferred = 1;
     t_is_forbidden = 1;
-    PUB_LOG_ENTRY(g_pub_util_log);
+    pub_log_entry(g_pub_util_log);
     PUB_LOG(g_pub_util_log, "thread %d will be end", static_cast<int>(gettid()));
     pthread_exit(nullptr);
 }

@@ -37,7 +37,7 @@ constexpr at_command_st g_at_command_a[] = {
 int handle_amt_pc_req_at()
 {
     if (g_handle_context.m_req.m_buf_len == 0) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
+        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
         return PUB_ERR_PARAM;
     }
     const auto *const request = reinterpret_cast<const char *>(g_handle_context.m_req.m_buf_a);

@@ -25,7 +25,7 @@ constexpr int PERMISSION_READ = 2;
 
 int fail_param(const char *func, int line, const char *text)
 {
-    pub_log_error(g_amt_handle_log, line, func, PUB_ERR_PARAM);
+    pub_log_error(g_amt_handle_log, PUB_ERR_PARAM, func, line);
     PUB_LOG(g_amt_handle_log, "%s", text);
     return PUB_ERR_PARAM;
 }
@@ -39,14 +39,14 @@ int read_bt_address(char *word)
     }
     FILE *const file = fopen(path, "r");
     if (file == nullptr) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FILE);
+        pub_log_error(g_amt_handle_log, PUB_ERR_FILE);
         PUB_LOG(g_amt_handle_log, "open(\"%s\") fail: %d - %s", path, errno, strerror(errno));
         return PUB_ERR_FILE;
     }
     const bool is_read = fscanf(file, "%99s", word) == 1;
     fclose(file);
     if (!is_read) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
         PUB_LOG(g_amt_handle_log, "read not completed");
         return PUB_ERR_FAIL;
     }
@@ -60,7 +60,7 @@ int put_bt_address(const char *path, const char *address)
         PUB_LOG(g_amt_handle_log, "write BT address: %s", address);
         return PUB_ERR_NONE;
     }
-    PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FILE);
+    pub_log_error(g_amt_handle_log, PUB_ERR_FILE);
     if (step == amt_factory_step_en::OPEN_FAILED) {
         PUB_LOG(g_amt_handle_log, "open(\"%s\") fail: %d - %s", path, errno, strerror(errno));
         return PUB_ERR_FILE;
@@ -84,7 +84,7 @@ int reply_pcba_sn()
 {
     char sn_a[AMT_PCBA_SN_SIZE] = {};
     if (amt_read_pcba_sn(sn_a) != PUB_ERR_NONE) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
         PUB_LOG(g_amt_handle_log, "read error.");
         return amt_at_reply_error();
     }
@@ -99,7 +99,7 @@ int write_pcba_sn(const char *sn)
     char sn_a[AMT_PCBA_SN_SIZE];
     snprintf(sn_a, sizeof(sn_a), "%s", sn);
     if (amt_write_pcba_sn(sn_a, AMT_PCBA_SN_FILE) != PUB_ERR_NONE) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
         PUB_LOG(g_amt_handle_log, "write error.");
         return amt_at_reply_error();
     }
@@ -122,7 +122,7 @@ int amt_at_write_bt_address(const char *operands)
     char address_a[ADDRESS_SIZE];
     amt_at_copy_quoted(operands, address_a, sizeof(address_a));
     if (address_a[0] == '\0') {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
+        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
         return PUB_ERR_PARAM;
     }
     return write_bt_address(address_a) == PUB_ERR_NONE ? amt_at_reply_ok() : amt_at_reply_cme();
@@ -159,7 +159,7 @@ int amt_at_control_pcba(const char *operands)
     if (type == PCBA_WRITE) {
         return write_pcba_sn(amt_at_operands_next(&list));
     }
-    PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
+    pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
     PUB_LOG(g_amt_handle_log, "unknown operation type: %u", static_cast<unsigned>(type));
     return amt_at_reply_error();
 }

@@ -17,15 +17,15 @@ constexpr char LINE_END[] = "\r\n";
 int handle_amt_get_at_para(const char *prefix, char *out, uint32_t *length_ptr)
 {
     if (prefix == nullptr || out == nullptr || length_ptr == nullptr) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
-        PUB_LOG_FLAGS(g_amt_handle_log, prefix == nullptr, out == nullptr, length_ptr == nullptr);
+        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
+        pub_log_flags(g_amt_handle_log, {prefix == nullptr, out == nullptr, length_ptr == nullptr});
         return PUB_ERR_PARAM;
     }
     *length_ptr = 0;
     const auto *const text = reinterpret_cast<const char *>(g_handle_context.m_req.m_buf_a);
     const char *start = strstr(text, prefix);
     if (start == nullptr) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
         PUB_LOG(g_amt_handle_log, "at cmd[%s] do not include (%s).", text, prefix);
         return PUB_ERR_FAIL;
     }

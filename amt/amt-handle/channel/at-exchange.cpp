@@ -113,7 +113,7 @@ int amt_at_exchange(const amt_at_exchange_st &exchange, void *context)
         status = wait_final(exchange, context);
     }
     if (status != PUB_ERR_NONE) {
-        pub_log_error(g_amt_handle_log, __LINE__, exchange.m_name_ptr, status);
+        pub_log_error(g_amt_handle_log, status, exchange.m_name_ptr);
     }
     return status;
 }

@@ -90,7 +90,7 @@ int reread_after_reopen(char *buf, uint32_t length, ssize_t *count_ptr)
 /* The error line of the switch-off, which always names the public operation. */
 int fail_switch_off(int line, int error_code)
 {
-    pub_log_error(g_amt_handle_log, line, "disable_unsolicited_code", error_code);
+    pub_log_error(g_amt_handle_log, error_code, "disable_unsolicited_code", line);
     return error_code;
 }
 
@@ -103,12 +103,12 @@ int send_switch_off(int fd)
         return status;
     }
     if (ready < 0) {
-        PUB_LOG_SYS_CALL(g_amt_handle_log, "select");
+        pub_log_sys_call(g_amt_handle_log, "select");
         return fail_switch_off(__LINE__, PUB_ERR_FILE);
     }
     const ssize_t written = write(fd, UNSOLICITED_OFF, sizeof(UNSOLICITED_OFF) - 1);
     if (written < 0) {
-        PUB_LOG_SYS_CALL(g_amt_handle_log, "write");
+        pub_log_sys_call(g_amt_handle_log, "write");
         return fail_switch_off(__LINE__, PUB_ERR_FILE);
     }
     if (written != static_cast<ssize_t>(sizeof(UNSOLICITED_OFF) - 1)) {
@@ -124,7 +124,7 @@ int read_answer_piece(int fd, char *answer)
 {
     const ssize_t count = amt_wait_read(fd, answer, ANSWER_ROOM);
     if (count < 0) {
-        PUB_LOG_SYS_CALL(g_amt_handle_log, "read");
+        pub_log_sys_call(g_amt_handle_log, "read");
         fail_switch_off(__LINE__, PUB_ERR_FILE);
     }
     if (count <= 0) {
@@ -157,7 +157,7 @@ int wait_for_answer_piece(int fd, char *answer)
     if (ready == 0) {
         return report_time_out(start);
     }
-    PUB_LOG_SYS_CALL(g_amt_handle_log, "select");
+    pub_log_sys_call(g_amt_handle_log, "select");
     const int status = fail_switch_off(__LINE__, PUB_ERR_FILE);
     pub_util_sleep_ms(LOST_TTY_PAUSE_MS);
     return status;
@@ -179,11 +179,11 @@ bool holds_error_result(const char *answer)
 int write_at(const char *text, uint32_t length)
 {
     if (text == nullptr || length == 0) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
-        PUB_LOG_FLAGS(g_amt_handle_log, text == nullptr, length == 0);
+        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
+        pub_log_flags(g_amt_handle_log, {text == nullptr, length == 0});
         return PUB_ERR_PARAM;
     }
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     pub_print("[%s:L%d]write_at: %s\n", PROGRAM, WRITE_AT_LINE, text);
     const ssize_t written = write_once(text, length);
     int status = written < 0 ? get_transfer_error(true) : PUB_ERR_NONE;
@@ -194,7 +194,7 @@ int write_at(const char *text, uint32_t length)
         status = rewrite_after_reopen(text, length);
     }
     if (status != PUB_ERR_NONE) {
-        PUB_LOG_ERROR(g_amt_handle_log, status);
+        pub_log_error(g_amt_handle_log, status);
         return status;
     }
     PUB_LOG(g_amt_handle_log, "send ==> %.1023s", text);
@@ -204,8 +204,8 @@ int write_at(const char *text, uint32_t length)
 int read_at(char *buf, uint32_t length, int32_t *count_ptr)
 {
     if (buf == nullptr || length == 0 || count_ptr == nullptr) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
-        PUB_LOG_FLAGS(g_amt_handle_log, buf == nullptr, length == 0, count_ptr == nullptr);
+        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
+        pub_log_flags(g_amt_handle_log, {buf == nullptr, length == 0, count_ptr == nullptr});
         return PUB_ERR_PARAM;
     }
     pub_print("[%s]read_at\n", PROGRAM);
@@ -227,7 +227,7 @@ int read_at(char *buf, uint32_t length, int32_t *count_ptr)
         *count_ptr = static_cast<int32_t>(count);
     }
     if (status != PUB_ERR_NONE) {
-        PUB_LOG_ERROR(g_amt_handle_log, status);
+        pub_log_error(g_amt_handle_log, status);
         return status;
     }
     PUB_LOG(g_amt_handle_log, "receive <== %.1023s", buf);

@@ -94,11 +94,11 @@ int amt_write_content_to_file_sync(const char *digit)
         PUB_LOG(g_amt_handle_log, "Writed to file(%s) success.flag: %s.", PERMISSION_FILE, digit);
         return PUB_ERR_NONE;
     case amt_factory_step_en::OPEN_FAILED:
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FILE);
+        pub_log_error(g_amt_handle_log, PUB_ERR_FILE);
         PUB_LOG(g_amt_handle_log, "open(\"%s\") fail: %d - %s", PERMISSION_FILE, errno, strerror(errno));
         break;
     case amt_factory_step_en::WRITE_FAILED:
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FILE);
+        pub_log_error(g_amt_handle_log, PUB_ERR_FILE);
         PUB_LOG(g_amt_handle_log, "fputs fail: %d - %s", errno, strerror(errno));
         break;
     }
@@ -108,7 +108,7 @@ int amt_write_content_to_file_sync(const char *digit)
 int write_permission(int op_type, int *flag_ptr)
 {
     if (amt_write_content_to_file_sync(op_type == OP_PERMIT ? "1" : "0") != PUB_ERR_NONE) {
-        pub_log_error(g_amt_handle_log, __LINE__, "handle_amt_damt1_operation", PUB_ERR_FAIL);
+        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL, "handle_amt_damt1_operation");
         PUB_LOG(g_amt_handle_log, "write error to do-not-permit-handshake file.");
         return PUB_ERR_FAIL;
     }
@@ -178,7 +178,7 @@ int handle_amt_damt1_operation(int op_type, int *flag_ptr)
         return write_permission(op_type, flag_ptr);
     }
     if (op_type != OP_READ) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
+        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
         PUB_LOG(g_amt_handle_log, "unknown operation type: %u", static_cast<unsigned>(op_type));
         return PUB_ERR_PARAM;
     }

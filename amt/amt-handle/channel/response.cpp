@@ -34,8 +34,8 @@ int check_sender(int line, const char *func, uint32_t channel, const amt_buf_st 
     if (!is_no_channel(channel) && rsp_ptr != nullptr) {
         return PUB_ERR_NONE;
     }
-    pub_log_error(g_amt_handle_log, line, func, PUB_ERR_PARAM);
-    PUB_LOG_FLAGS(g_amt_handle_log, is_no_channel(channel), rsp_ptr == nullptr);
+    pub_log_error(g_amt_handle_log, PUB_ERR_PARAM, func, line);
+    pub_log_flags(g_amt_handle_log, {is_no_channel(channel), rsp_ptr == nullptr});
     return PUB_ERR_PARAM;
 }
 
@@ -51,12 +51,12 @@ int write_rsp(int fd, const amt_buf_st *rsp_ptr)
 {
     const ssize_t written = write(fd, rsp_ptr->m_buf_a, rsp_ptr->m_buf_len);
     if (written < 0) {
-        PUB_LOG_SYS_CALL(g_amt_handle_log, "write");
-        pub_log_error(g_amt_handle_log, __LINE__, "amt_handle_send_rsp", PUB_ERR_FILE);
+        pub_log_sys_call(g_amt_handle_log, "write");
+        pub_log_error(g_amt_handle_log, PUB_ERR_FILE, "amt_handle_send_rsp");
         return PUB_ERR_FILE;
     }
     if (written != static_cast<ssize_t>(rsp_ptr->m_buf_len)) {
-        pub_log_error(g_amt_handle_log, __LINE__, "amt_handle_send_rsp", PUB_ERR_INCOMPLETE);
+        pub_log_error(g_amt_handle_log, PUB_ERR_INCOMPLETE, "amt_handle_send_rsp");
         PUB_LOG(g_amt_handle_log, "WARNING !");
         PUB_LOG(g_amt_handle_log, "write not completed: to write(%u) != written(%zd)", rsp_ptr->m_buf_len,
                 written);
@@ -76,12 +76,12 @@ int amt_handle_send_rsp(uint32_t channel, amt_buf_st *rsp_ptr)
         rsp_ptr->m_buf_len = amt_packet_get_length(rsp_ptr->m_buf_a);
     }
     if (rsp_ptr->m_buf_len == 0 || rsp_ptr->m_buf_len > sizeof(rsp_ptr->m_buf_a)) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
+        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
         return PUB_ERR_PARAM;
     }
     const int fd = get_fd(channel);
     if (fd <= 0) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
         PUB_LOG(g_amt_handle_log, "invalid fd");
         return PUB_ERR_FAIL;
     }
@@ -115,8 +115,8 @@ int amt_handle_send_rsp_err(uint32_t channel, amt_buf_st *rsp_ptr, uint8_t rsp_i
 int amt_handle_send_pre_rsp_for_pc(uint32_t channel, amt_buf_st *rsp_ptr)
 {
     if (channel != AMT_CHANNEL_PC || rsp_ptr == nullptr) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
-        PUB_LOG_FLAGS(g_amt_handle_log, channel != AMT_CHANNEL_PC, rsp_ptr == nullptr);
+        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
+        pub_log_flags(g_amt_handle_log, {channel != AMT_CHANNEL_PC, rsp_ptr == nullptr});
         return PUB_ERR_PARAM;
     }
     amt_handle_clear_buf(rsp_ptr);
@@ -139,8 +139,8 @@ int amt_handle_check_request(const pub_log_source_st &source, int line, const ch
     if (!is_channel_none && req_ptr != nullptr && !is_req_empty && rsp_ptr != nullptr) {
         return PUB_ERR_NONE;
     }
-    pub_log_error(source, line, func, PUB_ERR_PARAM);
-    PUB_LOG_FLAGS(source, is_channel_none, req_ptr == nullptr, is_req_empty, rsp_ptr == nullptr);
+    pub_log_error(source, PUB_ERR_PARAM, func, line);
+    pub_log_flags(source, {is_channel_none, req_ptr == nullptr, is_req_empty, rsp_ptr == nullptr});
     return PUB_ERR_PARAM;
 }
 

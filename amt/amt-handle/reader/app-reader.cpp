@@ -33,8 +33,8 @@ bool reopen_pty()
 void give_up_pty()
 {
     pub_pty_st *const pty_ptr = &g_handle_context.m_pty;
-    PUB_LOG_SYS_CALL(g_amt_handle_log, "read");
-    pub_log_error(g_amt_handle_log, __LINE__, "amt_handle_read_app_loop", PUB_ERR_SYS_CALL);
+    pub_log_sys_call(g_amt_handle_log, "read");
+    pub_log_error(g_amt_handle_log, PUB_ERR_SYS_CALL, "amt_handle_read_app_loop");
     PUB_LOG(g_amt_handle_log, "pty disconnect: pts name(%s), pts mapping name(%s), thread id(%d), PTM fd(%d)",
             pty_ptr->m_pts_name_a, pty_ptr->m_pts_mapping_name_a, static_cast<int>(gettid()),
             pty_ptr->m_ptm_fd);
@@ -78,7 +78,7 @@ void amt_handle_read_app_loop()
 {
     amt_handle_clear_buf(&g_handle_context.m_req);
     amt_handle_clear_buf(&g_handle_context.m_rsp_app);
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     while (read_and_serve()) {
         if (!amt_service_process_is_own()) {
             _exit(0);

@@ -21,13 +21,13 @@ uint32_t read_command_id(const amt_buf_st *req_ptr)
 int call_app_handler(uint32_t id)
 {
     if (id >= AMT_HANDLE_FUNC_COUNT) {
-        pub_log_error(g_amt_handle_log, __LINE__, "handle_amt_app_req", PUB_ERR_FAIL);
+        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL, "handle_amt_app_req");
         PUB_LOG(g_amt_handle_log, "unknown AMT request id: %u", id);
         return PUB_ERR_FAIL;
     }
     const amt_handle_func handler = g_handle_context.m_handle_app_func_a[id];
     if (handler == nullptr) {
-        pub_log_error(g_amt_handle_log, __LINE__, "handle_amt_app_req", PUB_ERR_FAIL);
+        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL, "handle_amt_app_req");
         PUB_LOG(g_amt_handle_log, "unregistered AMT request id: %u", id);
         return PUB_ERR_FAIL;
     }
@@ -62,10 +62,10 @@ uint32_t unwrap_pc_request()
 
 void handle_amt_app_req()
 {
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     if (g_handle_context.m_req.m_buf_len == 0) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
-        PUB_LOG_FLAGS(g_amt_handle_log, false, false, true, false);
+        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
+        pub_log_flags(g_amt_handle_log, {false, false, true, false});
         return;
     }
     const uint32_t id = read_command_id(&g_handle_context.m_req);

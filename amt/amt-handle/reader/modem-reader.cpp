@@ -110,7 +110,7 @@ bool read_and_pass()
 void amt_handle_read_modem_loop()
 {
     amt_handle_clear_buf(&g_handle_context.m_modem);
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     while (is_line_open() && read_and_pass()) {
         if (!amt_service_process_is_own()) {
             _exit(0);

@@ -25,7 +25,7 @@ bool serve_request()
 {
     amt_buf_st *const req_ptr = &g_handle_context.m_req;
     if (req_ptr->m_buf_len == 0) {
-        pub_log_error(g_amt_handle_log, __LINE__, "amt_handle_read_pc_loop", PUB_ERR_PARAM);
+        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM, "amt_handle_read_pc_loop");
         return false;
     }
     uint32_t id = AMT_ID_NO_PACKET;
@@ -52,7 +52,7 @@ bool read_and_serve()
     const ssize_t count =
         amt_wait_read(fd, req_ptr->m_buf_a + req_ptr->m_buf_len, AMT_HELD_SIZE - req_ptr->m_buf_len);
     if (count < 0) {
-        PUB_LOG_SYS_CALL(g_amt_handle_log, "read");
+        pub_log_sys_call(g_amt_handle_log, "read");
         return false;
     }
     if (count == 0) {
@@ -79,7 +79,7 @@ void amt_handle_read_pc_loop()
 {
     amt_handle_clear_buf(&g_handle_context.m_req);
     amt_handle_clear_buf(&g_handle_context.m_rsp_pc);
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     while (is_line_open() && read_and_serve()) {
         if (!amt_service_process_is_own()) {
             _exit(0);

@@ -177,7 +177,7 @@ void register_table(int table, const registration_st *row_ptr, const registratio
 int amt_handle_reg_handle_func(int table, uint32_t id, amt_handle_func handler)
 {
     if (id >= AMT_HANDLE_FUNC_COUNT) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
+        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
         return PUB_ERR_PARAM;
     }
     const bool is_pc = table == AMT_TABLE_PC;

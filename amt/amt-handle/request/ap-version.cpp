@@ -61,7 +61,7 @@ bool read_property(const char *key, char *value, const char *unset)
 /* The failure of a property that the text starts with. */
 int fail_property(int line, const char *key)
 {
-    pub_log_error(g_amt_handle_log, line, "get_ap_sw_version", PUB_ERR_FAIL);
+    pub_log_error(g_amt_handle_log, PUB_ERR_FAIL, "get_ap_sw_version", line);
     PUB_LOG(g_amt_handle_log, "read %s error", key);
     return PUB_ERR_FAIL;
 }
@@ -152,9 +152,9 @@ void put_text(const version_text_st &version, char *buf, uint32_t *length_ptr)
 
 int get_ap_sw_version(char *buf, uint32_t *length_ptr)
 {
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     if (buf == nullptr || length_ptr == nullptr) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
+        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
         PUB_LOG(g_amt_handle_log, " %d, %d", buf == nullptr, length_ptr == nullptr);
         return PUB_ERR_PARAM;
     }
@@ -174,11 +174,11 @@ int get_ap_sw_version(char *buf, uint32_t *length_ptr)
 
 int amt_read_emmc_info(char *buf)
 {
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     buf[0] = '\0';
     FILE *const stream = fopen(EMMC_INFO_FILE, "r");
     if (stream == nullptr) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
         PUB_LOG(g_amt_handle_log, "open %s fail", EMMC_INFO_FILE);
         return PUB_ERR_FAIL;
     }
@@ -187,7 +187,7 @@ int amt_read_emmc_info(char *buf)
     fclose(stream);
     if (!is_read) {
         errno = read_errno;
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
         PUB_LOG(g_amt_handle_log, "read fail");
         return PUB_ERR_FAIL;
     }
@@ -201,11 +201,11 @@ int amt_read_emmc_info(char *buf)
 
 int amt_read_cm_info(char *buf)
 {
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     buf[0] = '\0';
     FILE *const stream = fopen(CARRIER_FILE, "r");
     if (stream == nullptr) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
         PUB_LOG(g_amt_handle_log, "open cm file %s fail", CARRIER_FILE);
         return PUB_ERR_FAIL;
     }
@@ -216,7 +216,7 @@ int amt_read_cm_info(char *buf)
     }
     fclose(stream);
     if (!is_found) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
         return PUB_ERR_FAIL;
     }
     /* The path in this line is not the file's; log readers know it so. */

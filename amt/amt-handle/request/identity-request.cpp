@@ -28,7 +28,7 @@ static constexpr const char *ADB_FILE = "/amt/usb_serial";
 /* The last lines of a failed request: they name the handler, not the step that failed. */
 static int fail_request(int line, const char *func, const char *text)
 {
-    pub_log_error(g_amt_handle_log, line, func, PUB_ERR_FAIL);
+    pub_log_error(g_amt_handle_log, PUB_ERR_FAIL, func, line);
     PUB_LOG(g_amt_handle_log, "%s", text);
     return PUB_ERR_FAIL;
 }
@@ -42,7 +42,7 @@ static int send_result(uint32_t channel, amt_buf_st *rsp_ptr)
 
 int amt_handle_board_pcba_ctrl(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     if (AMT_CHECK_REQUEST(g_amt_handle_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
@@ -70,7 +70,7 @@ int amt_handle_board_pcba_ctrl(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st
         PUB_LOG(g_amt_handle_log, "Writed to file success.pcba-sn: %s.", sn_a);
         break;
     default:
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
+        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
         PUB_LOG(g_amt_handle_log, "unknown operation type: %u", operation);
         return PUB_ERR_PARAM;
     }
@@ -126,7 +126,7 @@ static int write_adb_serial(const char *func, const amt_buf_st *req_ptr)
 
 int amt_handle_adb_serial_no(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     if (AMT_CHECK_REQUEST(g_amt_handle_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
@@ -141,7 +141,7 @@ int amt_handle_adb_serial_no(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *
         ret_val = write_adb_serial(__func__, req_ptr);
         break;
     default:
-        PUB_LOG_ERROR(g_amt_handle_log, ret_val);
+        pub_log_error(g_amt_handle_log, ret_val);
         PUB_LOG(g_amt_handle_log, "unknown operation: %d", operation);
         break;
     }

@@ -43,7 +43,7 @@ constexpr identity_file_st g_identity_file_a[] = {
 /* The open line is one text for readers and writers, under the name of the operation that failed. */
 static int fail_open(int line, const char *func, const char *path)
 {
-    pub_log_error(g_amt_handle_log, line, func, PUB_ERR_FILE);
+    pub_log_error(g_amt_handle_log, PUB_ERR_FILE, func, line);
     PUB_LOG(g_amt_handle_log, "open(\"%s\") fail: %d - %s", path, errno, strerror(errno));
     return PUB_ERR_FILE;
 }
@@ -55,7 +55,7 @@ static int read_first_line(int line, const char *func, const char *path, char *l
     case amt_line_step_en::OPEN_FAILED:
         return fail_open(line, func, path);
     case amt_line_step_en::READ_FAILED:
-        pub_log_error(g_amt_handle_log, line, func, PUB_ERR_FILE);
+        pub_log_error(g_amt_handle_log, PUB_ERR_FILE, func, line);
         PUB_LOG(g_amt_handle_log, "read fail: %d - %s", errno, strerror(errno));
         return PUB_ERR_FILE;
     case amt_line_step_en::DONE:
@@ -66,10 +66,10 @@ static int read_first_line(int line, const char *func, const char *path, char *l
 
 int amt_write_pcba_sn(const char *text, const char *path)
 {
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     if (text == nullptr || text[0] == '\0') {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
-        PUB_LOG_FLAGS(g_amt_handle_log, text == nullptr, text != nullptr);
+        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
+        pub_log_flags(g_amt_handle_log, {text == nullptr, text != nullptr});
         return PUB_ERR_PARAM;
     }
     int ret_val = PUB_ERR_NONE;
@@ -78,7 +78,7 @@ int amt_write_pcba_sn(const char *text, const char *path)
         return fail_open(__LINE__, __func__, path);
     case amt_factory_step_en::WRITE_FAILED:
         ret_val = PUB_ERR_FILE;
-        PUB_LOG_ERROR(g_amt_handle_log, ret_val);
+        pub_log_error(g_amt_handle_log, ret_val);
         PUB_LOG(g_amt_handle_log, "fputs fail: %d - %s", errno, strerror(errno));
         break;
     case amt_factory_step_en::DONE:
@@ -91,7 +91,7 @@ int amt_write_pcba_sn(const char *text, const char *path)
 
 int amt_read_pcba_sn(char *buf)
 {
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     memset(buf, 0, AMT_PCBA_SN_SIZE);
     char line_a[AMT_LINE_SIZE];
     const int ret_val = read_first_line(__LINE__, __func__, AMT_PCBA_SN_FILE, line_a);
@@ -105,10 +105,10 @@ int amt_read_pcba_sn(char *buf)
 
 int amt_read_data_from_file(char *buf, uint32_t size, const char *path)
 {
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     if (buf == nullptr || size == 0 || path == nullptr) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
-        PUB_LOG_FLAGS(g_amt_handle_log, buf == nullptr, size == 0, path == nullptr);
+        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
+        pub_log_flags(g_amt_handle_log, {buf == nullptr, size == 0, path == nullptr});
         return PUB_ERR_PARAM;
     }
     memset(buf, 0, size);
@@ -134,11 +134,11 @@ static const identity_file_st *find_identity_file(int kind)
 
 int handle_amt_imei_and_sn_save_file(int kind)
 {
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     const identity_file_st *const file_ptr = find_identity_file(kind);
     if (file_ptr == nullptr) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
-        PUB_LOG_FLAGS(g_amt_handle_log, true);
+        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
+        pub_log_flags(g_amt_handle_log, {true});
         return PUB_ERR_PARAM;
     }
     char text_a[AMT_IDENTITY_TEXT_SIZE];
@@ -152,7 +152,7 @@ int handle_amt_imei_and_sn_save_file(int kind)
     PUB_LOG(g_amt_handle_log, "save %s to file. channel:%d; content:%s;", file_ptr->m_name_ptr, channel,
             text_a);
     if (ret_val != PUB_ERR_NONE) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
         PUB_LOG(g_amt_handle_log, "write %s error.", file_ptr->m_name_ptr);
         return PUB_ERR_FAIL;
     }
@@ -162,13 +162,13 @@ int handle_amt_imei_and_sn_save_file(int kind)
 
 const char *get_bt_addr_file()
 {
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     for (const char *const path : {AMT_BT_ADDRESS_FILE, BT_ADDRESS_FILE_2}) {
         if (access(path, F_OK) == 0) {
             return path;
         }
     }
-    PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FILE);
+    pub_log_error(g_amt_handle_log, PUB_ERR_FILE);
     PUB_LOG(g_amt_handle_log, "can not access file \"%s\" or \"%s\"", AMT_BT_ADDRESS_FILE, BT_ADDRESS_FILE_2);
     return nullptr;
 }
@@ -184,10 +184,10 @@ static void run_on_folder(const char *verb, const char *path)
 
 int amt_make_folder(const char *path)
 {
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     if (path == nullptr) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
-        PUB_LOG_FLAGS(g_amt_handle_log, true);
+        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
+        pub_log_flags(g_amt_handle_log, {true});
         return PUB_ERR_PARAM;
     }
     if (access(path, F_OK) == 0) {
@@ -196,7 +196,7 @@ int amt_make_folder(const char *path)
     }
     PUB_LOG(g_amt_handle_log, "amt_make_folder: %s does not exist.\r\n", path);
     if (mkdir(path, FOLDER_MODE) != 0) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FILE);
+        pub_log_error(g_amt_handle_log, PUB_ERR_FILE);
         PUB_LOG(g_amt_handle_log, "amt_make_folder mkdir(%s) faild errno[%d] strerror[%s]", path, errno,
                 strerror(errno));
         return PUB_ERR_FILE;
@@ -209,16 +209,16 @@ int amt_make_folder(const char *path)
 
 int amt_read_wifi_address(char *buf)
 {
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     buf[0] = '\0';
     char line_a[AMT_LINE_SIZE];
     switch (amt_line_file_read(AMT_WIFI_ADDRESS_FILE, line_a)) {
     case amt_line_step_en::OPEN_FAILED:
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
         PUB_LOG(g_amt_handle_log, "open %s fail", AMT_WIFI_ADDRESS_FILE);
         return PUB_ERR_FAIL;
     case amt_line_step_en::READ_FAILED:
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
         PUB_LOG(g_amt_handle_log, "read fail");
         return PUB_ERR_FAIL;
     case amt_line_step_en::DONE:
@@ -233,22 +233,22 @@ int amt_read_wifi_address(char *buf)
 
 int amt_write_wifi_address(const char *text)
 {
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     if (text == nullptr || text[0] == '\0') {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
-        PUB_LOG_FLAGS(g_amt_handle_log, text == nullptr, text != nullptr);
+        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
+        pub_log_flags(g_amt_handle_log, {text == nullptr, text != nullptr});
         return PUB_ERR_PARAM;
     }
     int ret_val = PUB_ERR_NONE;
     switch (amt_factory_file_put(AMT_WIFI_ADDRESS_FILE, text, "\n")) {
     case amt_factory_step_en::OPEN_FAILED:
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
         PUB_LOG(g_amt_handle_log, "open %s fail", AMT_WIFI_ADDRESS_FILE);
         return PUB_ERR_FAIL;
     case amt_factory_step_en::WRITE_FAILED:
         ret_val = PUB_ERR_FILE;
-        PUB_LOG_ERROR(g_amt_handle_log, ret_val);
-        PUB_LOG_SYS_CALL(g_amt_handle_log, "fputs");
+        pub_log_error(g_amt_handle_log, ret_val);
+        pub_log_sys_call(g_amt_handle_log, "fputs");
         break;
     case amt_factory_step_en::DONE:
         /* The station's log readers know this text, and it is about this file in spite of its words. */

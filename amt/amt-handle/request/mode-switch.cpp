@@ -81,8 +81,8 @@ int check_presence(int line, const char *func, uint32_t channel, const amt_buf_s
     if (channel != AMT_CHANNEL_NONE && req_ptr != nullptr && rsp_ptr != nullptr) {
         return PUB_ERR_NONE;
     }
-    pub_log_error(g_amt_handle_log, line, func, PUB_ERR_PARAM);
-    PUB_LOG_FLAGS(g_amt_handle_log, channel == AMT_CHANNEL_NONE, req_ptr == nullptr, rsp_ptr == nullptr);
+    pub_log_error(g_amt_handle_log, PUB_ERR_PARAM, func, line);
+    pub_log_flags(g_amt_handle_log, {channel == AMT_CHANNEL_NONE, req_ptr == nullptr, rsp_ptr == nullptr});
     return PUB_ERR_PARAM;
 }
 
@@ -90,7 +90,7 @@ int check_presence(int line, const char *func, uint32_t channel, const amt_buf_s
 
 int amt_change_band(int32_t band)
 {
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     PUB_LOG(g_amt_handle_log, "amt_change_band band:%" PRId32, band);
     amt_at_set_command("AT^DMPCHN=%" PRId32 "\r", band);
     return amt_at_exchange(g_band_exchange, nullptr);
@@ -160,7 +160,7 @@ int amt_handle_power_off(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_
 
 int amt_modem_boot_dl_fin_read(uint32_t channel, amt_buf_st *, amt_buf_st *rsp_ptr)
 {
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     PUB_LOG(g_amt_handle_log, "amt_modem_boot_dl_fin_read.");
     amt_reply_start(rsp_ptr, RSP_BOOT_DOWNLOAD);
     int32_t flag = BOOT_DOWNLOAD_UNKNOWN;
@@ -168,7 +168,7 @@ int amt_modem_boot_dl_fin_read(uint32_t channel, amt_buf_st *, amt_buf_st *rsp_p
     PUB_LOG(g_amt_handle_log, "amt_modem_boot_dl_fin_read finished. flag:%" PRId32 "; ret_val:%d.", flag,
             status);
     if (status != PUB_ERR_NONE) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
         PUB_LOG(g_amt_handle_log, "read error");
         return PUB_ERR_FAIL;
     }

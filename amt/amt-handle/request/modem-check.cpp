@@ -66,7 +66,7 @@ int ask_value(const check_st &check, check_value_st *value_ptr)
         amt_at_get_value(check.m_prefix_ptr, VALUE_LIMIT, value_ptr->m_text_a, &value_ptr->m_length);
     PUB_LOG(g_amt_handle_log, "%s %s=%s", name, check.m_value_name_ptr, value_ptr->m_text_a);
     if (value_ptr->m_status != PUB_ERR_NONE) {
-        pub_log_error(g_amt_handle_log, __LINE__, name, value_ptr->m_status);
+        pub_log_error(g_amt_handle_log, value_ptr->m_status, name);
     }
     return PUB_ERR_NONE;
 }

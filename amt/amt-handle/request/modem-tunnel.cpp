@@ -107,12 +107,12 @@ int amt_modem_handle_req(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_
                                                               AMT_PACKET_SIZE, &g_raw.m_buf_len);
         status != PUB_ERR_NONE)
     {
-        PUB_LOG_ERROR(g_amt_handle_log, status);
+        pub_log_error(g_amt_handle_log, status);
         return status;
     }
     const uint32_t needed = static_cast<uint32_t>(COMMAND.size()) + 2 + 2 * g_raw.m_buf_len;
     if (needed > AMT_AT_AREA_SIZE - 1) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
         PUB_LOG(g_amt_handle_log, "(%ld + %ld * 2 + 2) < %d", static_cast<long>(COMMAND.size()),
                 static_cast<long>(g_raw.m_buf_len), static_cast<int>(AMT_AT_AREA_SIZE));
         return PUB_ERR_FAIL;

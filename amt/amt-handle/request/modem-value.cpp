@@ -70,7 +70,7 @@ int ask_text(const text_request_st &request, char *value)
         status = PUB_ERR_FAIL;
     }
     if (status != PUB_ERR_NONE) {
-        pub_log_error(g_amt_handle_log, __LINE__, request.m_exchange.m_name_ptr, status);
+        pub_log_error(g_amt_handle_log, status, request.m_exchange.m_name_ptr);
     }
     return status;
 }
@@ -91,13 +91,13 @@ int read_temperature(uint32_t *temperature_ptr)
 {
     FILE *const stream = fopen(TEMPERATURE_FILE, "r");
     if (stream == nullptr) {
-        pub_log_error(g_amt_handle_log, __LINE__, TEMPERATURE_HANDLER, PUB_ERR_FILE);
+        pub_log_error(g_amt_handle_log, PUB_ERR_FILE, TEMPERATURE_HANDLER);
         PUB_LOG(g_amt_handle_log, "fopen error: errno=%d", errno);
         return PUB_ERR_FILE;
     }
     const int count = amt_number_scan_unsigned(stream, temperature_ptr);
     if (count != 1) {
-        pub_log_error(g_amt_handle_log, __LINE__, TEMPERATURE_HANDLER, PUB_ERR_FILE);
+        pub_log_error(g_amt_handle_log, PUB_ERR_FILE, TEMPERATURE_HANDLER);
         PUB_LOG(g_amt_handle_log, "fscanf error: errno=%d", errno);
     }
     fclose(stream);
@@ -144,7 +144,7 @@ int amt_channel_switch(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_pt
     /* Exactly this much is sent: a channel of one digit with its carriage return, a longer one without. */
     constexpr uint32_t command_length = 12;
 
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     if (const int status = amt_handle_check_modem(); status != PUB_ERR_NONE) {
         return status;
     }
@@ -153,17 +153,17 @@ int amt_channel_switch(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_pt
     snprintf(text_a, sizeof(text_a), "AT^DMPCHN=%" PRId32 "\r",
              amt_packet_get_int(req_ptr->m_buf_a, ATOM_CHANNEL));
     if (const int status = write_at(text_a, command_length); status != PUB_ERR_NONE) {
-        PUB_LOG_ERROR(g_amt_handle_log, status);
+        pub_log_error(g_amt_handle_log, status);
         return status;
     }
     memset(text_a, 0, sizeof(text_a));
     int32_t count = 0;
     if (const int status = read_at(text_a, text_size, &count); status != PUB_ERR_NONE) {
-        PUB_LOG_ERROR(g_amt_handle_log, status);
+        pub_log_error(g_amt_handle_log, status);
         return status;
     }
     if (memmem(text_a, text_size, "OK", strlen("OK")) == nullptr) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
         PUB_LOG(g_amt_handle_log, "%s", text_a);
         return PUB_ERR_FAIL;
     }

@@ -61,7 +61,7 @@ int amt_nvram_copy(FILE *source, FILE *destination, const char *address)
 /* Every failure here is one of amt_write_wifi_to_nvram_file, and is logged under its name. */
 static void log_failure(int line, const char *action, const char *path)
 {
-    pub_log_error(g_amt_handle_log, line, "amt_write_wifi_to_nvram_file", PUB_ERR_FAIL);
+    pub_log_error(g_amt_handle_log, PUB_ERR_FAIL, "amt_write_wifi_to_nvram_file", line);
     PUB_LOG(g_amt_handle_log, "%s  %s fail", action, path);
 }
 
@@ -103,8 +103,8 @@ static int copy_and_check(FILE *source, FILE *destination, const char *address)
     if (fflush(destination) == 0 && ferror(destination) == 0) {
         return ret_val;
     }
-    pub_log_error(g_amt_handle_log, __LINE__, "amt_write_wifi_to_nvram_file", PUB_ERR_FAIL);
-    PUB_LOG_SYS_CALL(g_amt_handle_log, "fputs");
+    pub_log_error(g_amt_handle_log, PUB_ERR_FAIL, "amt_write_wifi_to_nvram_file");
+    pub_log_sys_call(g_amt_handle_log, "fputs");
     return PUB_ERR_FAIL;
 }
 
@@ -154,7 +154,7 @@ static void open_driver_file_to_all()
 
 int amt_write_wifi_to_nvram_file()
 {
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     char address_a[ADDRESS_SIZE];
     const int address_ret = read_stored_address(address_a);
     FILE *source = nullptr;

@@ -16,7 +16,7 @@ void amt_power_off_handset()
 {
     pub_util_sleep_ms(ANSWER_PAUSE_MS);
     if (reboot(RB_POWER_OFF) != 0) {
-        PUB_LOG_SYS_CALL(g_amt_handle_log, "reboot");
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_SYS_CALL);
+        pub_log_sys_call(g_amt_handle_log, "reboot");
+        pub_log_error(g_amt_handle_log, PUB_ERR_SYS_CALL);
     }
 }

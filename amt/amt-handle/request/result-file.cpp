@@ -27,7 +27,7 @@ FILE *open_file(const char *func, const char *path, const char *mode)
 {
     FILE *const stream = fopen(path, mode);
     if (stream == nullptr) {
-        pub_log_error(g_amt_handle_log, __LINE__, func, AMT_RESULT_FILE_ERR_ACCESS);
+        pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_ACCESS, func);
         log_failure("open file", path);
     }
     return stream;
@@ -54,7 +54,7 @@ int check_index(const char *func, int32_t index, int32_t count)
     if (index < count) {
         return PUB_ERR_NONE;
     }
-    pub_log_error(g_amt_handle_log, __LINE__, func, AMT_RESULT_FILE_ERR_ITEM);
+    pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_ITEM, func);
     PUB_LOG(g_amt_handle_log, "item index error: %d\n", index);
     return AMT_RESULT_FILE_ERR_ITEM;
 }
@@ -65,17 +65,17 @@ int save_result(const char *func, const char *path, int32_t count, int32_t index
         return AMT_RESULT_FILE_ERR_ITEM;
     }
     if (access(FOLDER, R_OK | W_OK) != 0) {
-        pub_log_error(g_amt_handle_log, __LINE__, func, AMT_RESULT_FILE_ERR_ACCESS);
+        pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_ACCESS, func);
         PUB_LOG(g_amt_handle_log, "Save fail: Directory access deny\n");
         return AMT_RESULT_FILE_ERR_ACCESS;
     }
     if (access(path, F_OK) != 0 && initTestFile(path, count) != PUB_ERR_NONE) {
-        pub_log_error(g_amt_handle_log, __LINE__, func, AMT_RESULT_FILE_ERR_WRITE);
+        pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_WRITE, func);
         PUB_LOG(g_amt_handle_log, "Save fail: init result file error\n");
         return AMT_RESULT_FILE_ERR_WRITE;
     }
     if (updateTestItem(path, index, verdict) != PUB_ERR_NONE) {
-        pub_log_error(g_amt_handle_log, __LINE__, func, AMT_RESULT_FILE_ERR_ITEM);
+        pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_ITEM, func);
         PUB_LOG(g_amt_handle_log, "Save fail: update result error\n");
         return AMT_RESULT_FILE_ERR_ITEM;
     }
@@ -86,7 +86,7 @@ int save_result(const char *func, const char *path, int32_t count, int32_t index
 int read_item(FILE *stream, int32_t index)
 {
     if (seek_item(stream, index) != 0) {
-        pub_log_error(g_amt_handle_log, __LINE__, "readProductResult", AMT_RESULT_FILE_ERR_ACCESS);
+        pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_ACCESS, "readProductResult");
         PUB_LOG(g_amt_handle_log, "call fseek failure. errorr: %d - %s", errno, strerror(errno));
         return AMT_RESULT_FILE_ERR_ACCESS;
     }
@@ -96,7 +96,7 @@ int read_item(FILE *stream, int32_t index)
         return atoi(text_a);
     }
     if (ferror(stream) != 0) {
-        pub_log_error(g_amt_handle_log, __LINE__, "readProductResult", AMT_RESULT_FILE_ERR_ACCESS);
+        pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_ACCESS, "readProductResult");
         PUB_LOG(g_amt_handle_log, "call fgets error. errorr: %d - %s", errno, strerror(errno));
         return AMT_RESULT_FILE_ERR_ACCESS;
     }
@@ -107,9 +107,9 @@ int read_item(FILE *stream, int32_t index)
 
 int initTestFile(const char *path, int32_t count)
 {
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     if (count > COUNT_MAX) {
-        PUB_LOG_ERROR(g_amt_handle_log, AMT_RESULT_FILE_ERR_ACCESS);
+        pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_ACCESS);
         PUB_LOG(g_amt_handle_log, "test item error: %d\n", count);
         return AMT_RESULT_FILE_ERR_ACCESS;
     }
@@ -127,7 +127,7 @@ int initTestFile(const char *path, int32_t count)
 
 int updateTestItem(const char *path, int32_t index, int32_t verdict)
 {
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     FILE *const stream = open_file(__func__, path, "r+");
     if (stream == nullptr) {
         return AMT_RESULT_FILE_ERR_ACCESS;
@@ -139,7 +139,7 @@ int updateTestItem(const char *path, int32_t index, int32_t verdict)
     if (is_written) {
         PUB_LOG(g_amt_handle_log, "write item [%d], result= %c\n", index, digit);
     } else {
-        PUB_LOG_ERROR(g_amt_handle_log, AMT_RESULT_FILE_ERR_WRITE);
+        pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_WRITE);
     }
     fclose(stream);
     return is_written ? PUB_ERR_NONE : AMT_RESULT_FILE_ERR_WRITE;
@@ -147,31 +147,31 @@ int updateTestItem(const char *path, int32_t index, int32_t verdict)
 
 int saveAmtResult(int32_t index, int32_t verdict)
 {
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     return save_result(__func__, AMT_RESULT_FILE, AMT_RESULT_COUNT, index, verdict);
 }
 
 int saveProductResult(int32_t index, int32_t verdict)
 {
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     return save_result(__func__, AMT_PRODUCT_FILE, AMT_PRODUCT_COUNT, index, verdict);
 }
 
 int readProductResult(int32_t index)
 {
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     if (check_index(__func__, index, AMT_PRODUCT_COUNT) != PUB_ERR_NONE) {
         return AMT_RESULT_FILE_ERR_ITEM;
     }
     if (access(FOLDER, R_OK) != 0) {
-        PUB_LOG_ERROR(g_amt_handle_log, AMT_RESULT_FILE_ERR_ACCESS);
+        pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_ACCESS);
         log_failure("access folder", FOLDER);
         return AMT_RESULT_FILE_ERR_ACCESS;
     }
     if (access(AMT_PRODUCT_FILE, F_OK) != 0) {
         log_failure("access file", AMT_PRODUCT_FILE);
         if (initTestFile(AMT_PRODUCT_FILE, AMT_PRODUCT_COUNT) != PUB_ERR_NONE) {
-            PUB_LOG_ERROR(g_amt_handle_log, AMT_RESULT_FILE_ERR_WRITE);
+            pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_WRITE);
             PUB_LOG(g_amt_handle_log, "initTestFile fail: init result file error\n");
             return AMT_RESULT_FILE_ERR_WRITE;
         }

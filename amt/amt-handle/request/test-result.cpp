@@ -128,7 +128,7 @@ int amt_modem_read_test_result(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st
 
 int amt_modem_write_pc_test_result(uint32_t, amt_buf_st *req_ptr, amt_buf_st *)
 {
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     const int32_t station_num = amt_packet_get_int(req_ptr->m_buf_a, ATOM_STATION);
     const int32_t verdict = amt_packet_get_int(req_ptr->m_buf_a, ATOM_VERDICT);
     PUB_LOG(g_amt_handle_log, "amt_modem_write_pc_test_result station_num=%d,station_result=%d", station_num,
@@ -152,7 +152,7 @@ int amt_item_write_test_result(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st
     if (saveProductResult(static_cast<int32_t>(static_cast<uint32_t>(station_num) - 1U), verdict) !=
         PUB_ERR_NONE) {
         status = PUB_ERR_INCOMPLETE;
-        PUB_LOG_ERROR(g_amt_handle_log, status);
+        pub_log_error(g_amt_handle_log, status);
         pub_print("[%s:L%d] write fail station_num: %d, station_result: %d\n", PROGRAM, __LINE__, station_num,
                   verdict);
     }
@@ -175,7 +175,7 @@ int amt_item_read_test_result(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st 
             verdict);
     const int status = verdict < 0 || verdict > VERDICT_MAX ? PUB_ERR_NOT_FOUND : PUB_ERR_NONE;
     if (status != PUB_ERR_NONE) {
-        PUB_LOG_ERROR(g_amt_handle_log, status);
+        pub_log_error(g_amt_handle_log, status);
     }
     PUB_LOG(g_amt_handle_log, "amt_item_read_test_result read_item ret_val[%d]", status);
     if (status != PUB_ERR_NONE) {

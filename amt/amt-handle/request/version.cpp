@@ -82,7 +82,7 @@ void add_version(amt_buf_st *rsp_ptr, const void *version, uint32_t length)
 
 void log_unknown_type(int line, const char *func, int32_t type)
 {
-    pub_log_error(g_amt_handle_log, line, func, PUB_ERR_FAIL);
+    pub_log_error(g_amt_handle_log, PUB_ERR_FAIL, func, line);
     PUB_LOG(g_amt_handle_log, "unknown version type: 0x%02x", static_cast<unsigned int>(type));
 }
 
@@ -114,12 +114,12 @@ int handle_amt_req_version(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rs
 
 int handle_amt_req_l1_hls_version(uint32_t channel, int32_t type, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     const bool is_none = channel == AMT_CHANNEL_NONE;
     const bool is_type_bad = type != AMT_L1_MODULE && type != AMT_HLS_MODULE;
     const bool is_req_empty = req_ptr != nullptr && req_ptr->m_buf_len == 0;
     if (is_none || is_type_bad || req_ptr == nullptr || is_req_empty || rsp_ptr == nullptr) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
+        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
         PUB_LOG(g_amt_handle_log, "%d, module_en:%d, %d, %d, %d", is_none, type, req_ptr == nullptr,
                 is_req_empty, rsp_ptr == nullptr);
         return PUB_ERR_PARAM;
@@ -127,7 +127,7 @@ int handle_amt_req_l1_hls_version(uint32_t channel, int32_t type, amt_buf_st *re
     uint8_t version_a[AMT_MODEM_VERSION_SIZE];
     uint32_t length = 0;
     if (get_l1_hls_version(type, version_a, &length) != PUB_ERR_NONE) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_FAIL);
+        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
         PUB_LOG(g_amt_handle_log, "get version failure for type: 0x%02x", static_cast<unsigned int>(type));
         return PUB_ERR_FAIL;
     }
@@ -165,15 +165,15 @@ int handle_amt_pc_req_version(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st 
 
 int set_ap_sw_version_rsp(amt_buf_st *rsp_ptr)
 {
-    PUB_LOG_ENTRY(g_amt_handle_log);
+    pub_log_entry(g_amt_handle_log);
     if (rsp_ptr == nullptr) {
-        PUB_LOG_ERROR(g_amt_handle_log, PUB_ERR_PARAM);
+        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
         return PUB_ERR_PARAM;
     }
     char version_a[AMT_AP_VERSION_SIZE] = {};
     uint32_t length = 0;
     if (const int status = get_ap_sw_version(version_a, &length); status != PUB_ERR_NONE) {
-        PUB_LOG_ERROR(g_amt_handle_log, status);
+        pub_log_error(g_amt_handle_log, status);
         PUB_LOG(g_amt_handle_log, "failed to get ap's sw version");
         return status;
     }

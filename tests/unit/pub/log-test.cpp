@@ -1,4 +1,4 @@
-#include "pub/log/log.h"
+#include "pub/pub-log.h"
 
 #include <errno.h>
 #include <numeric>
@@ -21,7 +21,7 @@ volatile sig_atomic_t g_alarm_count = 0;
 
 void log_on_alarm(int)
 {
-    PUB_LOG_ENTRY(g_test_log);
+    pub_log_entry(g_test_log);
     g_alarm_count = g_alarm_count + 1;
 }
 
@@ -60,7 +60,7 @@ TEST(log, record_has_debug_priority_and_the_source_s_tag)
 TEST(log, null_tag_and_percent_signs_in_arguments)
 {
     const log_capture_c capture;
-    pub_log_print(nullptr, "%s", "100 %s %n");
+    PUB_LOG((pub_log_source_st{nullptr, ""}), "%s", "100 %s %n");
     ASSERT_EQ(capture.records().size(), 1U);
     EXPECT_EQ(capture.records()[0].m_tag, "(null)");
     EXPECT_EQ(capture.records()[0].m_text, "100 %s %n");
@@ -69,7 +69,7 @@ TEST(log, null_tag_and_percent_signs_in_arguments)
 TEST(log, entry_names_the_function)
 {
     const log_capture_c capture;
-    PUB_LOG_ENTRY(g_test_log);
+    pub_log_entry(g_test_log);
     EXPECT_THAT(capture.texts(), testing::ElementsAre("TestBody()"));
 }
 
@@ -77,7 +77,7 @@ TEST(log, error_line)
 {
     const log_capture_c capture;
     errno = EIO;
-    PUB_LOG_ERROR(g_test_log, -118);
+    pub_log_error(g_test_log, -118);
     const std::string line = std::to_string(__LINE__ - 1);
     EXPECT_THAT(capture.texts(), testing::ElementsAre("FILE-some/source, LINE-" + line +
                                                       ", FUNC-TestBody(), error_code=-118, errno=5"));
@@ -87,16 +87,16 @@ TEST(log, system_call_line)
 {
     const log_capture_c capture;
     errno = ENOENT;
-    PUB_LOG_SYS_CALL(g_test_log, "fopen");
+    pub_log_sys_call(g_test_log, "fopen");
     EXPECT_THAT(capture.texts(), testing::ElementsAre("sys call: fopen() failed! errno = 2"));
 }
 
 TEST(log, flags_line)
 {
     const log_capture_c capture;
-    PUB_LOG_FLAGS(g_test_log, true);
-    PUB_LOG_FLAGS(g_test_log, false, true, false);
-    PUB_LOG_FLAGS(g_test_log, true, true, true, true, true, true, true, true);
+    pub_log_flags(g_test_log, {true});
+    pub_log_flags(g_test_log, {false, true, false});
+    pub_log_flags(g_test_log, {true, true, true, true, true, true, true, true});
     EXPECT_THAT(capture.texts(), testing::ElementsAre("1", "0, 1, 0", "1, 1, 1, 1, 1, 1, 1, 1"));
 }
 
@@ -125,15 +125,15 @@ TEST(log, errno_survives_every_operation)
     errno = EXDEV;
     PUB_LOG(g_test_log, "text");
     EXPECT_EQ(errno, EXDEV);
-    PUB_LOG_ENTRY(g_test_log);
+    pub_log_entry(g_test_log);
     EXPECT_EQ(errno, EXDEV);
-    PUB_LOG_FLAGS(g_test_log, true, false);
+    pub_log_flags(g_test_log, {true, false});
     EXPECT_EQ(errno, EXDEV);
     pub_log_dump(g_test_log, "title", data_a, sizeof(data_a));
     EXPECT_EQ(errno, EXDEV);
-    PUB_LOG_SYS_CALL(g_test_log, "read");
+    pub_log_sys_call(g_test_log, "read");
     EXPECT_EQ(errno, EXDEV);
-    PUB_LOG_ERROR(g_test_log, -1);
+    pub_log_error(g_test_log, -1);
     EXPECT_EQ(errno, EXDEV);
     EXPECT_THAT(capture.texts()[4], testing::EndsWith("errno = 18"));
     EXPECT_THAT(capture.texts()[5], testing::EndsWith("errno=18"));

@@ -54,7 +54,7 @@ std::string figures_of_new_mount(const std::string &mount_point, const std::stri
             return NOT_POSSIBLE;
         }
         const std::string result = figures(mount_point);
-        pub_log_print("", "%s", result.c_str());
+        PUB_LOG((pub_log_source_st{"", ""}), "%s", result.c_str());
         return 0;
     });
     return run.m_is_complete && run.m_result == 0 ? run.m_text_list.back() : "";

@@ -418,7 +418,8 @@ TEST(priority, is_real_time_four_below_the_highest)
         const int status = pub_util_raise_process_priority();
         sched_param param = {};
         sched_getparam(0, &param);
-        pub_log_print("", "policy %d priority %d", sched_getscheduler(0), param.sched_priority);
+        PUB_LOG((pub_log_source_st{"", ""}), "policy %d priority %d", sched_getscheduler(0),
+                param.sched_priority);
         return status;
     });
     ASSERT_TRUE(run.m_is_complete);
