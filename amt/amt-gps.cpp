@@ -1,5 +1,6 @@
 #include "amt/amt-gps.h"
 
+#include "amt/amt-atom.h"
 #include "amt/amt-command.h"
 #include "amt/amt-convert.h"
 #include "amt/amt-device/command.h"
@@ -15,9 +16,6 @@ namespace {
 
 constexpr char CONTROL_HANDLER[] = "amt_gps_control";
 
-constexpr uint8_t ATOM_OPERATION = 140;
-constexpr uint8_t ATOM_SATELLITE = 141;
-constexpr uint8_t ATOM_CARRIER_TO_NOISE = 144;
 constexpr int32_t OPERATION_STOP = 0;
 constexpr int32_t OPERATION_CHECK = 2;
 
@@ -64,7 +62,7 @@ int amt_gps_control(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
     if (AMT_CHECK_REQUEST(g_amt_gps_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
-    const int32_t operation = amt_packet_get_int(req_ptr->m_buf_a, ATOM_OPERATION);
+    const int32_t operation = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_GPS_OPERATION);
     PUB_LOG(g_amt_gps_log, "amt_gps_control is_start:%d", operation);
     const int result = operate(operation);
     return result == PUB_ERR_NONE ? amt_handle_send_rsp_ok(channel, rsp_ptr, AMT_GPS_CONTROL_RSPCMD) : result;
@@ -86,7 +84,7 @@ int amt_gps_read_result(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_p
         amt_device_run("echo gps read result:invalid param > /data/local/wifi/gps_get_result.txt");
         return PUB_ERR_PARAM;
     }
-    const int32_t index = amt_packet_get_int(req_ptr->m_buf_a, ATOM_SATELLITE);
+    const int32_t index = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_GPS_SATELLITE);
     PUB_LOG(g_amt_gps_log, "GPS-READ-SIGNAL start. index:%d", index);
     int32_t svid = 0;
     int32_t cnr = 0;
@@ -96,8 +94,8 @@ int amt_gps_read_result(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_p
         return PUB_ERR_FAIL;
     }
     amt_reply_start(rsp_ptr, AMT_GPS_READ_RESULT_RSPCMD);
-    amt_packet_add_int(rsp_ptr->m_buf_a, ATOM_CARRIER_TO_NOISE, cnr);
-    amt_packet_add_int(rsp_ptr->m_buf_a, ATOM_SATELLITE, svid);
+    amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_GPS_CARRIER_TO_NOISE, cnr);
+    amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_GPS_SATELLITE, svid);
     amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_RESULT, 0);
     const int result = channel == AMT_CHANNEL_PC ? amt_convert_app_2_pc(rsp_ptr) : PUB_ERR_NONE;
     amt_handle_send_rsp(channel, rsp_ptr);

@@ -7,9 +7,9 @@
 #include <string.h>
 #include <unistd.h>
 
+#include "amt/amt-atom.h"
 #include "amt/amt-cfg.h"
 #include "amt/amt-command.h"
-#include "amt/amt-device/device-atom.h"
 #include "amt/amt-device/device-fail.h"
 #include "amt/amt-device/hal-library.h"
 #include "amt/amt-handle/channel/response.h"
@@ -25,7 +25,6 @@ namespace {
 
 constexpr char PLAYER_PID_FILE[] = "/tmp/" PLAYER_NAME ".pid";
 constexpr uint32_t COMMAND_SIZE = 100;
-constexpr uint8_t ATOM_LOOP_TYPE = 30;
 constexpr char AUDIO_HANDLER[] = "amt_device_audio";
 
 /* Each missing one has its line. */
@@ -99,7 +98,7 @@ int amt_device_audio_loop(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp
         return PUB_ERR_PARAM;
     }
     const int32_t enable = amt_packet_get_bool(req_ptr->m_buf_a, AMT_ATOM_SWITCH) == 1 ? 1 : 0;
-    const int32_t type = amt_packet_get_int(req_ptr->m_buf_a, ATOM_LOOP_TYPE);
+    const int32_t type = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_LOOP_TYPE);
     amt_hal_entry_st entry = {};
     if (AMT_HAL_LOAD(AUDIO_LOOP_HAL_LIBRARY, AUDIO_LOOP_HAL_CODEC_LOOP_TEST, &entry) != PUB_ERR_NONE) {
         return PUB_ERR_FILE;

@@ -1,7 +1,7 @@
 #include "amt/amt-device/backlight.h"
 
+#include "amt/amt-atom.h"
 #include "amt/amt-command.h"
-#include "amt/amt-device/device-atom.h"
 #include "amt/amt-device/device-file.h"
 #include "amt/amt-handle/channel/response.h"
 #include "amt/amt-packet.h"
@@ -11,7 +11,6 @@ namespace {
 
 constexpr char LCD_FILE[] = "/sys/class/leds/lcd-backlight/brightness";
 constexpr char BUTTON_FILE[] = "/sys/class/leds/button-backlight/brightness";
-constexpr uint8_t ATOM_LEVEL = 26;
 constexpr uint32_t LEVEL_MAX = 255;
 constexpr int32_t LEVEL_UNKNOWN = -1;
 constexpr int32_t LEVEL_DEFAULT = 200;
@@ -44,7 +43,7 @@ int amt_device_lcd_brightness(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st 
     if (src_lcd_brightness < 0) {
         AMT_DEVICE_READ_INT(LCD_FILE, &src_lcd_brightness);
     }
-    const int32_t requested = amt_packet_get_int(req_ptr->m_buf_a, ATOM_LEVEL);
+    const int32_t requested = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_LCD_LEVEL);
     PUB_LOG(g_amt_device_log, "amt_device_lcd_brightness lcd_brightness: %d", requested);
     PUB_LOG(g_amt_device_log, "amt_device_lcd_brightness src_lcd_brightness: %d", src_lcd_brightness);
     if (AMT_DEVICE_WRITE_INT(LCD_FILE, level_to_write(requested)) == PUB_ERR_NONE) {

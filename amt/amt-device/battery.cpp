@@ -3,6 +3,7 @@
 #include <stdio.h>
 #include <stdlib.h>
 
+#include "amt/amt-atom.h"
 #include "amt/amt-command.h"
 #include "amt/amt-device/battery-adc.h"
 #include "amt/amt-device/device-fail.h"
@@ -15,29 +16,19 @@
 namespace {
 
 constexpr char VOLTAGE_FILE[] = "/sys/class/power_supply/battery/voltage_now";
-constexpr uint8_t ATOM_VOLTAGE = 5;
-constexpr uint8_t ATOM_ADC = 151;
-constexpr uint8_t ATOM_CALIBRATION_A = 146;
-constexpr uint8_t ATOM_CALIBRATION_B = 147;
-constexpr uint8_t ATOM_CALIBRATION_C = 148;
-constexpr uint8_t ATOM_CALIBRATION_D = 149;
-
-/* The two ADC requests have no names in the catalogue. */
-constexpr uint8_t READ_ADC_ID = 224;
-constexpr uint8_t CALIBRATE_ID = 226;
 
 constexpr uint32_t COMMAND_SIZE = 100;
 constexpr char CHECK_HANDLER[] = "amt_device_battery_voltage_check";
 
 int build_adc_rsp(amt_buf_st *rsp_ptr)
 {
-    amt_reply_start(rsp_ptr, READ_ADC_ID + 1);
+    amt_reply_start(rsp_ptr, AMT_READ_ADC_RSPCMD);
     uint32_t value = 0;
     const int result = amt_read_adc(&value);
     if (result != PUB_ERR_NONE) {
         return result;
     }
-    amt_packet_add_int(rsp_ptr->m_buf_a, ATOM_ADC, static_cast<int32_t>(value));
+    amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_BATTERY_ADC, static_cast<int32_t>(value));
     amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_RESULT, 0);
     return PUB_ERR_NONE;
 }
@@ -58,11 +49,11 @@ void hand_to_driver(int32_t a, int32_t b, int32_t c, int32_t d)
 
 int build_calibration_rsp(const amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    amt_reply_start(rsp_ptr, CALIBRATE_ID + 1);
-    const int32_t a = amt_packet_get_int(req_ptr->m_buf_a, ATOM_CALIBRATION_A);
-    const int32_t b = amt_packet_get_int(req_ptr->m_buf_a, ATOM_CALIBRATION_B);
-    const int32_t c = amt_packet_get_int(req_ptr->m_buf_a, ATOM_CALIBRATION_C);
-    const int32_t d = amt_packet_get_int(req_ptr->m_buf_a, ATOM_CALIBRATION_D);
+    amt_reply_start(rsp_ptr, AMT_CALIBRATE_ADC_RSPCMD);
+    const int32_t a = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_ADC_CALIBRATION_A);
+    const int32_t b = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_ADC_CALIBRATION_B);
+    const int32_t c = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_ADC_CALIBRATION_C);
+    const int32_t d = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_ADC_CALIBRATION_D);
     const int result = amt_write_adc_diff_value(a, b, c, d);
     if (result != PUB_ERR_NONE) {
         return result;
@@ -75,10 +66,10 @@ int build_calibration_rsp(const amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 int build_check_rsp(const amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
     const uint8_t command_id = amt_packet_get_cmd(req_ptr->m_buf_a);
-    if (command_id == READ_ADC_ID) {
+    if (command_id == AMT_READ_ADC_CMD) {
         return build_adc_rsp(rsp_ptr);
     }
-    if (command_id == CALIBRATE_ID) {
+    if (command_id == AMT_CALIBRATE_ADC_CMD) {
         return build_calibration_rsp(req_ptr, rsp_ptr);
     }
     return AMT_DEVICE_FAIL(CHECK_HANDLER, PUB_ERR_FAIL, "Invalid command id[%d]", command_id);
@@ -98,7 +89,7 @@ int amt_device_battery_voltage(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st
     }
     PUB_LOG(g_amt_device_log, "battery_voltage: %d", voltage);
     amt_reply_start(rsp_ptr, AMT_READ_BATTERY_RSPCMD);
-    amt_packet_add_int(rsp_ptr->m_buf_a, ATOM_VOLTAGE, voltage);
+    amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_BATTERY_VOLTAGE, voltage);
     amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_RESULT, 0);
     return amt_handle_send_rsp(channel, rsp_ptr);
 }

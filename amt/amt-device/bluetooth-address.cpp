@@ -2,6 +2,7 @@
 #include <stdio.h>
 #include <string.h>
 
+#include "amt/amt-atom.h"
 #include "amt/amt-command.h"
 #include "amt/amt-device/bluetooth.h"
 #include "amt/amt-device/command.h"
@@ -23,8 +24,6 @@ constexpr char ADDRESS_FILE[] = BT_FOLDER "/BT_Address.txt";
 constexpr char PROTECT_COMMAND[] = "chmod -R 555 " BT_FOLDER;
 constexpr char HANDLER[] = "amt_device_bt_address";
 
-constexpr uint8_t ATOM_OPERATION = 110;
-constexpr uint8_t ATOM_ADDRESS = 111;
 constexpr int32_t OPERATION_READ = 1;
 constexpr int32_t OPERATION_WRITE = 2;
 constexpr int32_t OPERATION_CHECK = 3;
@@ -58,7 +57,7 @@ int read_address(amt_buf_st *rsp_ptr)
         return AMT_DEVICE_FAIL(HANDLER, PUB_ERR_FAIL, "read not completed");
     }
     PUB_LOG(g_amt_device_log, "read BT address: %s", address_a);
-    amt_packet_add_string(rsp_ptr->m_buf_a, ATOM_ADDRESS, address_a);
+    amt_packet_add_string(rsp_ptr->m_buf_a, AMT_ATOM_BT_ADDRESS, address_a);
     return PUB_ERR_NONE;
 }
 
@@ -81,7 +80,7 @@ int finish_write(amt_factory_step_en step, bool is_address, const char *address)
 int write_address(const amt_buf_st *req_ptr)
 {
     char address_a[ADDRESS_SIZE];
-    const uint32_t length = amt_device_get_text(req_ptr, ATOM_ADDRESS, address_a, sizeof(address_a));
+    const uint32_t length = amt_device_get_text(req_ptr, AMT_ATOM_BT_ADDRESS, address_a, sizeof(address_a));
     const bool is_address = length != 0 && length == strlen(address_a);
     const amt_factory_step_en step =
         amt_factory_file_put(ADDRESS_FILE, is_address ? address_a : "", is_address ? "\n" : "");
@@ -123,7 +122,7 @@ int amt_device_bt_address(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp
         return PUB_ERR_PARAM;
     }
     amt_reply_start(rsp_ptr, AMT_BLUETOOTH_ADDRESS_RSPCMD);
-    const int32_t operation = amt_packet_get_int(req_ptr->m_buf_a, ATOM_OPERATION);
+    const int32_t operation = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_BT_OPERATION);
     PUB_LOG(g_amt_device_log, "amt_device_bt_address op_type:%d", operation);
     const int result = operate(operation, req_ptr, rsp_ptr);
     if (result != PUB_ERR_NONE) {

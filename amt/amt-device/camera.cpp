@@ -5,6 +5,7 @@
 #include <sys/ioctl.h>
 #include <unistd.h>
 
+#include "amt/amt-atom.h"
 #include "amt/amt-command.h"
 #include "amt/amt-device/device-fail.h"
 #include "amt/amt-handle/channel/response.h"
@@ -15,8 +16,6 @@
 
 namespace {
 
-constexpr uint8_t ATOM_CONTROL_ID = 112;
-constexpr uint8_t ATOM_CONTROL_RESULT = 113;
 constexpr int32_t CONTROL_FIRST = 1;
 constexpr int32_t CONTROL_SECOND = 2;
 constexpr int32_t TEST_INPUT = 1;
@@ -123,7 +122,7 @@ int amt_device_camera_control(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st 
     if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
-    const int32_t control_id = amt_packet_get_int(req_ptr->m_buf_a, ATOM_CONTROL_ID);
+    const int32_t control_id = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_CAMERA_CONTROL);
     log_control_id(control_id);
     if (control_id != CONTROL_FIRST && control_id != CONTROL_SECOND) {
         return AMT_DEVICE_FAIL(__func__, PUB_ERR_FAIL, "invalid control_id: %d", control_id);
@@ -134,6 +133,6 @@ int amt_device_camera_control(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st 
         return result;
     }
     amt_reply_start(rsp_ptr, AMT_CAMERA_CONTROL_RSPCMD);
-    amt_packet_add_int(rsp_ptr->m_buf_a, ATOM_CONTROL_RESULT, verdict);
+    amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_CAMERA_RESULT, verdict);
     return amt_reply_finish_ok(channel, rsp_ptr);
 }

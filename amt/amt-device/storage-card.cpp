@@ -1,5 +1,6 @@
 #include "amt/amt-device/storage-card.h"
 
+#include "amt/amt-atom.h"
 #include "amt/amt-command.h"
 #include "amt/amt-device/device-file.h"
 #include "amt/amt-handle/channel/response.h"
@@ -14,7 +15,6 @@ constexpr char SETTING_FILE[] = "/data/etc/storage.config";
 constexpr int32_t SETTING_CARD_FIRST = 1;
 constexpr char CARD_FIRST_PATH[] = "/storage/sdcard0";
 constexpr char CARD_SECOND_PATH[] = "/storage/sdcard1";
-constexpr uint8_t ATOM_CAPACITY = 55;
 
 const char *external_card_path(int32_t setting)
 {
@@ -53,7 +53,7 @@ int amt_device_tf_card(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_pt
     PUB_LOG(g_amt_device_log, "tf card capability: %ld KB", static_cast<long>(capacity));
 
     amt_reply_start(rsp_ptr, AMT_READCAPABILITY_CARD_RSPCMD);
-    amt_packet_add_int(rsp_ptr->m_buf_a, ATOM_CAPACITY, static_cast<int32_t>(capacity));
+    amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_CARD_CAPACITY, static_cast<int32_t>(capacity));
     amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_RESULT, 0);
     return amt_handle_send_rsp(channel, rsp_ptr);
 }

@@ -1,5 +1,6 @@
 #include "amt/amt-device/test-hal.h"
 
+#include "amt/amt-atom.h"
 #include "amt/amt-command.h"
 #include "amt/amt-device/device-fail.h"
 #include "amt/amt-device/hal-library.h"
@@ -12,15 +13,9 @@
 
 namespace {
 
-constexpr uint8_t ATOM_DEVICE_INFO = 200;
-constexpr uint8_t ATOM_EMMC_INFO = 205;
-
 /* The text fills a packet but for its frame. */
 constexpr int32_t DEVICE_INFO_CAPACITY = 4055;
 constexpr uint32_t EMMC_INFO_SIZE = 100;
-
-/* It has no name in the catalogue. */
-constexpr uint8_t EMMC_INFO_ID = 246;
 
 /*
  * Loads the HAL for this one call: logs, calls the entry and stores its answer. Returns 0 when the call was
@@ -98,7 +93,7 @@ int amt_read_dev_info(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr
         return result != PUB_ERR_NONE ? result : answer;
     }
     PUB_LOG(g_amt_device_log, "create_devinfo return OK. %s", text_a);
-    amt_packet_add_string(rsp_ptr->m_buf_a, ATOM_DEVICE_INFO, text_a);
+    amt_packet_add_string(rsp_ptr->m_buf_a, AMT_ATOM_DEVICE_INFO, text_a);
     amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_RESULT, 0);
     return amt_handle_send_rsp(channel, rsp_ptr);
 }
@@ -123,12 +118,12 @@ int amt_device_emmc_info(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_
     if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
-    amt_reply_start(rsp_ptr, EMMC_INFO_ID + 1);
+    amt_reply_start(rsp_ptr, AMT_READ_EMMC_INFO_RSPCMD);
     char text_a[EMMC_INFO_SIZE] = {};
     if (amt_read_emmc_info(text_a) != PUB_ERR_NONE) {
         return AMT_DEVICE_FAIL(__func__, PUB_ERR_FAIL, "read error");
     }
     PUB_LOG(g_amt_device_log, "read emmc_info: %s", text_a);
-    amt_packet_add_string(rsp_ptr->m_buf_a, ATOM_EMMC_INFO, text_a);
+    amt_packet_add_string(rsp_ptr->m_buf_a, AMT_ATOM_EMMC_INFO, text_a);
     return amt_reply_finish_ok(channel, rsp_ptr);
 }

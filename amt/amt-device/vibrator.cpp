@@ -1,7 +1,7 @@
 #include "amt/amt-device/vibrator.h"
 
+#include "amt/amt-atom.h"
 #include "amt/amt-command.h"
-#include "amt/amt-device/device-atom.h"
 #include "amt/amt-device/device-file.h"
 #include "amt/amt-handle/channel/response.h"
 #include "amt/amt-packet.h"

@@ -1,3 +1,4 @@
+#include "amt/amt-atom.h"
 #include "amt/amt-command.h"
 #include "amt/amt-device/command.h"
 #include "amt/amt-device/device-fail.h"
@@ -18,8 +19,6 @@ namespace {
 constexpr char PROTECT_COMMAND[] = "chmod -R 555 " WIFI_FOLDER;
 constexpr char HANDLER[] = "amt_device_wifi_address";
 
-constexpr uint8_t ATOM_OPERATION = 152;
-constexpr uint8_t ATOM_ADDRESS = 153;
 constexpr int32_t OPERATION_READ = 0;
 constexpr int32_t OPERATION_WRITE = 1;
 constexpr int32_t OPERATION_CHECK = 2;
@@ -37,14 +36,14 @@ int read_address(amt_buf_st *rsp_ptr)
         return AMT_DEVICE_FAIL(HANDLER, PUB_ERR_FAIL, "read error");
     }
     PUB_LOG(g_amt_device_log, "read WIFI address: %s", address_a);
-    amt_packet_add_string(rsp_ptr->m_buf_a, ATOM_ADDRESS, address_a);
+    amt_packet_add_string(rsp_ptr->m_buf_a, AMT_ATOM_WIFI_ADDRESS, address_a);
     return PUB_ERR_NONE;
 }
 
 int write_address(const amt_buf_st *req_ptr)
 {
     char address_a[ADDRESS_SIZE];
-    amt_device_get_text(req_ptr, ATOM_ADDRESS, address_a, sizeof(address_a));
+    amt_device_get_text(req_ptr, AMT_ATOM_WIFI_ADDRESS, address_a, sizeof(address_a));
     if (amt_write_wifi_address(address_a) != PUB_ERR_NONE) {
         return AMT_DEVICE_FAIL(HANDLER, PUB_ERR_FAIL, "write error");
     }
@@ -84,7 +83,7 @@ int amt_device_wifi_address(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *r
         return PUB_ERR_PARAM;
     }
     amt_reply_start(rsp_ptr, AMT_WIFI_TEST_RSPCMD);
-    const int32_t operation = amt_packet_get_int(req_ptr->m_buf_a, ATOM_OPERATION);
+    const int32_t operation = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_WIFI_OPERATION);
     PUB_LOG(g_amt_device_log, "amt_device_wifi_address op_type:%d", operation);
     const int result = operate(operation, req_ptr, rsp_ptr);
     if (result != PUB_ERR_NONE) {

@@ -1,5 +1,6 @@
 #include <stdio.h>
 
+#include "amt/amt-atom.h"
 #include "amt/amt-command.h"
 #include "amt/amt-device/command.h"
 #include "amt/amt-device/device-fail.h"
@@ -17,12 +18,6 @@ namespace {
 
 constexpr char HANDLER[] = "amt_device_wifi_rtx_test";
 constexpr uint32_t COMMAND_SIZE = 100;
-
-constexpr uint8_t ATOM_SUB_COMMAND = 154;
-constexpr uint8_t ATOM_CHANNEL = 155;
-constexpr uint8_t ATOM_RATE = 156;
-constexpr uint8_t ATOM_POWER = 157;
-constexpr uint8_t ATOM_PACKET_COUNT = 158;
 
 constexpr amt_radio_step_st START_STEP = {&g_amt_device_log, "WIFI-start", "ldt_wifiCtrl"};
 constexpr amt_radio_step_st STOP_STEP = {&g_amt_device_log, "WIFI-stop", "ldt_wifiCtrl"};
@@ -51,12 +46,12 @@ bool get_number(const amt_buf_st *req_ptr, uint8_t atom_id, uint32_t size, uint1
 
 bool get_channel(const amt_buf_st *req_ptr, uint16_t *value_ptr)
 {
-    return get_number(req_ptr, ATOM_CHANNEL, 1, value_ptr);
+    return get_number(req_ptr, AMT_ATOM_WIFI_CHANNEL, 1, value_ptr);
 }
 
 bool get_rate(const amt_buf_st *req_ptr, uint16_t *value_ptr)
 {
-    return get_number(req_ptr, ATOM_RATE, 2, value_ptr);
+    return get_number(req_ptr, AMT_ATOM_WIFI_RATE, 2, value_ptr);
 }
 
 int fail(const char *text)
@@ -97,7 +92,7 @@ int start_tx(const amt_buf_st *req_ptr, amt_buf_st *)
     if (!get_rate(req_ptr, &rate)) {
         return fail("Tx get rate error");
     }
-    if (!get_number(req_ptr, ATOM_POWER, 2, &power)) {
+    if (!get_number(req_ptr, AMT_ATOM_WIFI_POWER, 2, &power)) {
         return fail("Tx get power error");
     }
     PUB_LOG(g_amt_device_log, "WIFI-TX-start start. channel:%d; power:%d; rate:%d", channel, power, rate);
@@ -137,7 +132,7 @@ int stop_rx(const amt_buf_st *, amt_buf_st *rsp_ptr)
     PUB_LOG(g_amt_device_log, "WIFI-RX-stop end. return:%d; cnt:%d.", stopped, count);
     const int result = AMT_RADIO_STEP_CHECK(HANDLER, RX_STOP_STEP, stopped);
     if (result == PUB_ERR_NONE) {
-        amt_packet_add_int(rsp_ptr->m_buf_a, ATOM_PACKET_COUNT, count);
+        amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_WIFI_PACKET_COUNT, count);
     }
     return result;
 }
@@ -188,9 +183,9 @@ int amt_device_wifi_rtx_test(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *
     }
     amt_reply_start(rsp_ptr, AMT_WIFI_RTX_TEST_RSPCMD);
     uint8_t sub_command = 0;
-    amt_packet_get_bytes(req_ptr->m_buf_a, ATOM_SUB_COMMAND, &sub_command, sizeof(sub_command));
+    amt_packet_get_bytes(req_ptr->m_buf_a, AMT_ATOM_WIFI_SUB_COMMAND, &sub_command, sizeof(sub_command));
     trace_sub_command(sub_command);
-    amt_packet_add_bytes(rsp_ptr->m_buf_a, ATOM_SUB_COMMAND, &sub_command, sizeof(sub_command));
+    amt_packet_add_bytes(rsp_ptr->m_buf_a, AMT_ATOM_WIFI_SUB_COMMAND, &sub_command, sizeof(sub_command));
     const int result = operate(sub_command, req_ptr, rsp_ptr);
     if (result != PUB_ERR_NONE) {
         return result;

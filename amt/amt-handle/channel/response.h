@@ -2,15 +2,13 @@
 
 #include <stdint.h>
 
+#include "amt/amt-atom.h"
 #include "amt/amt-buf.h"
 #include "amt/amt-log.h"
 
 /* The result code (atom 1) that modem-backed handlers answer failures with, and that of the dispatchers. */
 constexpr int32_t AMT_RESULT_MODEM_FAILED = 10;
 constexpr int32_t AMT_RESULT_NOT_SERVED = 1;
-
-/* The atom that carries the result code in every response. */
-constexpr uint8_t AMT_ATOM_RESULT = 1;
 
 /*
  * Sends the packet (or text) in rsp_ptr on its channel in one write: the PC port for channel 1, the app
