@@ -4,9 +4,9 @@ from __future__ import annotations
 
 from dataclasses import dataclass, field
 
-from amt_station.decoder import Acknowledgement, Frame, Item, Text
-from amt_station.packet import Packet
-from amt_station.requests import Channel
+from amt_station.requests.model import Channel
+from amt_station.wire.decoder import Acknowledgement, Frame, Item, Text
+from amt_station.wire.packet import Packet
 
 
 @dataclass(frozen=True)

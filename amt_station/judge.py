@@ -8,9 +8,9 @@ from __future__ import annotations
 
 from amt_station.errors import Held, Refused
 from amt_station.exchange import Exchange, split_reply
-from amt_station.packet import Packet
-from amt_station.requests import Channel
-from amt_station.table import display_name, requests_by_id
+from amt_station.requests.model import Channel
+from amt_station.requests.table import display_name, requests_by_id
+from amt_station.wire.packet import Packet
 
 _REFUSED_CODE = 1
 

@@ -8,16 +8,17 @@ from types import TracebackType
 from typing import Iterator
 
 from amt_station import judge
-from amt_station.at_commands import FLUSH_COMMAND
-from amt_station.decoder import (Acknowledgement, BareDecoder, Decoder, EnvelopeDecoder, Frame, Item,
-                             Skipped, Text)
-from amt_station.envelope import LARGEST_REQUEST, encode_request
-from amt_station.errors import BadFrame, NoAnswer, Refused, StationError, UsageProblem, WireError
+from amt_station.errors import BadFrame, NoAnswer, Refused, StationError, UsageProblem
 from amt_station.exchange import AtReply, Exchange, TimedItem, split_reply
-from amt_station.packet import Packet
 from amt_station.port import Port, SerialPort
-from amt_station.requests import Channel
-from amt_station.table import display_name, requests_by_id
+from amt_station.requests.at_commands import FLUSH_COMMAND
+from amt_station.requests.model import Channel
+from amt_station.requests.table import display_name, requests_by_id
+from amt_station.wire.decoder import (Acknowledgement, BareDecoder, Decoder, EnvelopeDecoder, Frame,
+                                      Item, Skipped, Text)
+from amt_station.wire.envelope import LARGEST_REQUEST, encode_request
+from amt_station.wire.errors import WireError
+from amt_station.wire.packet import Packet
 
 DEFAULT_TIMEOUT = 10.0
 RECOVER_TIMEOUT = 3.0

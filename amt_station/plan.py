@@ -13,13 +13,13 @@ from dataclasses import dataclass
 from pathlib import Path
 from typing import Any, Mapping
 
-from amt_station.at_commands import known_refusal
-from amt_station.atom_text import parse_atom
 from amt_station.errors import StationError, UsageProblem
-from amt_station.operations import check_channel, operation_packet
-from amt_station.packet import Packet
-from amt_station.requests import Channel
-from amt_station.table import find_command, find_operation, requests_by_id
+from amt_station.requests.at_commands import known_refusal
+from amt_station.requests.atom_text import parse_atom
+from amt_station.requests.model import Channel
+from amt_station.requests.operations import check_channel, operation_packet
+from amt_station.requests.table import find_command, find_operation, requests_by_id
+from amt_station.wire.packet import Packet
 
 Value = int | str
 

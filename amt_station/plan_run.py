@@ -7,10 +7,11 @@ from dataclasses import dataclass, field
 from enum import Enum
 from typing import Iterator, Mapping
 
-from amt_station.errors import (EXIT_PASS, EXIT_REFUSED, Held, NoPort, Refused, StationError)
+from amt_station.errors import EXIT_PASS, EXIT_REFUSED, Held, NoPort, Refused, StationError
 from amt_station.link import Link
-from amt_station.operations import read_answer, run_operation
+from amt_station.perform import run_operation
 from amt_station.plan import Plan, Step, Value
+from amt_station.requests.operations import read_answer
 
 
 class Verdict(str, Enum):

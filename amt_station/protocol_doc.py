@@ -6,14 +6,15 @@ import re
 from pathlib import Path
 from typing import Callable, Iterable, Mapping, Sequence
 
-from amt_station.at_commands import AT_COMMANDS, WATCHED
-from amt_station.catalogue import command_names
-from amt_station.checksum import TABLE, checksum
-from amt_station.envelope import ACKNOWLEDGEMENT, encode_envelope
-from amt_station.operations import operation_packet
-from amt_station.packet import RESULT_ATOM, Atom, Packet
-from amt_station.requests import Field, Operation, Request, Service
-from amt_station.table import FAMILIES, REQUESTS, find_operation, requests_by_id, tunnel
+from amt_station.requests.at_commands import AT_COMMANDS, WATCHED
+from amt_station.requests.catalogue import command_names
+from amt_station.requests.model import Field, Operation, Request, Service
+from amt_station.requests.operations import operation_packet
+from amt_station.requests.table import FAMILIES, REQUESTS, find_operation, requests_by_id, tunnel
+from amt_station.wire.atoms import RESULT_ATOM, Atom
+from amt_station.wire.checksum import TABLE, checksum
+from amt_station.wire.envelope import ACKNOWLEDGEMENT, encode_envelope
+from amt_station.wire.packet import Packet
 
 _PROSE = Path(__file__).with_name("protocol-prose.md")
 _MARK = re.compile(r"^<!-- ([a-z-]+) -->$", re.MULTILINE)

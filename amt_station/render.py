@@ -4,12 +4,13 @@ from __future__ import annotations
 
 from typing import Any, Iterable, Sequence
 
-from amt_station.decoder import Acknowledgement, Frame, Item, Skipped, Text
 from amt_station.exchange import AtReply, Exchange
-from amt_station.operations import NamedValue, read_answer
-from amt_station.packet import Atom, Packet
-from amt_station.requests import RESULT, Field
-from amt_station.table import display_name, requests_by_id
+from amt_station.requests.model import RESULT, Field
+from amt_station.requests.operations import NamedValue, read_answer
+from amt_station.requests.table import display_name, requests_by_id
+from amt_station.wire.atoms import Atom
+from amt_station.wire.decoder import Acknowledgement, Frame, Item, Skipped, Text
+from amt_station.wire.packet import Packet
 
 Json = dict[str, Any]
 

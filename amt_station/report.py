@@ -7,7 +7,7 @@ from collections import Counter
 from typing import Sequence
 from xml.etree import ElementTree
 
-from amt_station import console
+from amt_station.cli import console
 from amt_station.plan import Plan
 from amt_station.plan_run import StepResult, Verdict
 from amt_station.render import Json, columns, plain, printable

@@ -10,9 +10,9 @@ from typing import Callable, Mapping
 
 from amt_simulator import Handset
 from amt_station.link import Link
-from amt_station.operations import Value, operation_packet
-from amt_station.requests import Channel
-from amt_station.table import find_operation
+from amt_station.requests.model import Channel
+from amt_station.requests.operations import Value, operation_packet
+from amt_station.requests.table import find_operation
 
 # How much more than at first the daemon may hold, however long it has worked.
 RESIDENT_BOUND_KIB = 512

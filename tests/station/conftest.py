@@ -10,10 +10,10 @@ import pytest
 from hypothesis import HealthCheck, configuration, settings
 from station_peer import PATIENCE, ROOT, Peer, Run, station_command, station_environment
 
-from amt_station.decoder import BareDecoder, EnvelopeDecoder
 from amt_station.link import Link
 from amt_station.port import FdPort
-from amt_station.requests import Channel
+from amt_station.requests.model import Channel
+from amt_station.wire.decoder import BareDecoder, EnvelopeDecoder
 
 # New examples at a desk; the same ones every time where a machine judges a change.
 settings.register_profile("station", deadline=None, database=None, print_blob=True,

@@ -12,9 +12,10 @@ import tty
 from pathlib import Path
 from typing import Callable, Sequence
 
-from amt_station.decoder import Decoder, Frame, Item, Text
-from amt_station.envelope import ACKNOWLEDGEMENT, encode_envelope
-from amt_station.packet import Atom, Packet
+from amt_station.wire.atoms import Atom
+from amt_station.wire.decoder import Decoder, Frame, Item, Text
+from amt_station.wire.envelope import ACKNOWLEDGEMENT, encode_envelope
+from amt_station.wire.packet import Packet
 
 ROOT = Path(__file__).resolve().parents[2]
 PATIENCE = 10.0

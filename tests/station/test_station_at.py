@@ -5,10 +5,10 @@ from __future__ import annotations
 import pytest
 from station_peer import Peer, error_packet, ok, replying, sequence
 
-from amt_station.decoder import Text
-from amt_station.envelope import ACKNOWLEDGEMENT
 from amt_station.errors import BadFrame, Held, NoAnswer, Refused
 from amt_station.link import Link
+from amt_station.wire.decoder import Text
+from amt_station.wire.envelope import ACKNOWLEDGEMENT
 
 OK = "\r\nOK\r\n"
 FLUSH = b"AT^DBTADDR=?\r"

@@ -11,10 +11,11 @@ import pytest
 from station_peer import (PATIENCE, ROOT, Peer, Run, answering, ok, replying, sequence,
                           station_command, station_environment)
 
-from amt_station.decoder import Frame
-from amt_station.envelope import ACKNOWLEDGEMENT, encode_envelope
 from amt_station.link import Link
-from amt_station.packet import Atom, Packet
+from amt_station.wire.atoms import Atom
+from amt_station.wire.decoder import Frame
+from amt_station.wire.envelope import ACKNOWLEDGEMENT, encode_envelope
+from amt_station.wire.packet import Packet
 
 VERSION_ATOMS = (Atom.integer(19, 16), Atom.raw(18, b"\r1.2\n\n"))
 ONE_LINE = re.compile(r"\Aamt-station: [^\n]+\n\Z")

@@ -9,10 +9,10 @@ import pytest
 from hypothesis import given
 from hypothesis import strategies as st
 
-from amt_station.envelope import MAGIC, wrap
 from amt_station.wire import (ACKNOWLEDGEMENT, Acknowledgement, Atom, BareDecoder, ChecksumError,
-                          Decoder, EnvelopeDecoder, Frame, Item, LengthError, Packet, Skipped,
-                          StrayBytesError, Text, TruncatedError, encode_envelope)
+                              Decoder, EnvelopeDecoder, Frame, Item, LengthError, Packet, Skipped,
+                              StrayBytesError, Text, TruncatedError, encode_envelope)
+from amt_station.wire.envelope import MAGIC, wrap
 
 PACKET = Packet(45, (Atom.integer(19, 16), Atom.string(37, "AT\r\nOK"), Atom.raw(4, MAGIC)))
 OTHER = Packet(170)

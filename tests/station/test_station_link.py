@@ -8,13 +8,14 @@ import threading
 import pytest
 from station_peer import Peer, answering, error_packet, ok, sequence
 
-from amt_station.decoder import Frame, Item, Skipped, Text
-from amt_station.envelope import ACKNOWLEDGEMENT, LARGEST_REQUEST, encode_envelope
 from amt_station.errors import BadFrame, Held, NoAnswer, NoPort, PortBusy, Refused, UsageProblem
 from amt_station.link import Link
-from amt_station.packet import Atom, Packet
 from amt_station.port import FdPort, SerialPort
-from amt_station.requests import Channel
+from amt_station.requests.model import Channel
+from amt_station.wire.atoms import Atom
+from amt_station.wire.decoder import Frame, Item, Skipped, Text
+from amt_station.wire.envelope import ACKNOWLEDGEMENT, LARGEST_REQUEST, encode_envelope
+from amt_station.wire.packet import Packet
 
 VERSION = Packet(45, (Atom.integer(19, 16),))
 SHORT = 1.0

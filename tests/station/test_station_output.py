@@ -13,8 +13,8 @@ import pytest
 from station_peer import (PATIENCE, ROOT, Peer, Run, answering, error_packet, ok, replying,
                           sequence, station_command, station_environment)
 
-from amt_station.envelope import ACKNOWLEDGEMENT
-from amt_station.packet import Atom
+from amt_station.wire.atoms import Atom
+from amt_station.wire.envelope import ACKNOWLEDGEMENT
 
 VERSION_ATOMS = (Atom.integer(19, 16), Atom.raw(18, b"\r1.2\n\n"))
 ONE_LINE = re.compile(r"\Aamt-station: [^\n]+\n\Z")

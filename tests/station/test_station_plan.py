@@ -12,15 +12,16 @@ import pytest
 from station_peer import (PATIENCE, ROOT, Peer, Run, answering, error_packet, sequence,
                           station_command, station_environment)
 
-from amt_station.decoder import Frame, Item
-from amt_station.envelope import ACKNOWLEDGEMENT, encode_envelope
 from amt_station.errors import UsageProblem
 from amt_station.link import Link
-from amt_station.packet import Atom, Packet
 from amt_station.plan import Limit, Plan, load_plan
 from amt_station.plan_run import StepResult, Verdict, exit_status, run_plan
 from amt_station.report import junit_xml, summary
-from amt_station.requests import Channel
+from amt_station.requests.model import Channel
+from amt_station.wire.atoms import Atom
+from amt_station.wire.decoder import Frame, Item
+from amt_station.wire.envelope import ACKNOWLEDGEMENT, encode_envelope
+from amt_station.wire.packet import Packet
 
 ADC = '[[step]]\nname = "adc"\ncommand = "battery adc"\nlimits.adc = { min = 10, max = 20 }\n'
 

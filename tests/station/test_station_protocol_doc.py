@@ -7,11 +7,11 @@ import re
 import pytest
 from station_peer import ROOT
 
-from amt_station.at_commands import AT_COMMANDS
-from amt_station.catalogue import command_names
 from amt_station.protocol_doc import protocol_document
-from amt_station.requests import Request
-from amt_station.table import FAMILIES, REQUESTS, tunnel
+from amt_station.requests.at_commands import AT_COMMANDS
+from amt_station.requests.catalogue import command_names
+from amt_station.requests.model import Request
+from amt_station.requests.table import FAMILIES, REQUESTS, tunnel
 
 DOCUMENT = protocol_document()
 

@@ -7,14 +7,17 @@ from typing import Hashable
 
 import pytest
 
-from amt_station.at_commands import AT_COMMANDS, FLUSH_COMMAND, known_refusal
-from amt_station.catalogue import UNDEFINED, command_ids, command_name, command_names, parse_catalogue
 from amt_station.errors import UsageProblem
-from amt_station.operations import build_packet, operation_packet, read_answer, run_operation
-from amt_station.packet import Atom, AtomType, Packet
-from amt_station.requests import Channel, Field, Operation, Request
-from amt_station.table import (FAMILIES, REQUESTS, display_name, find_command, find_operation,
-                           operations, requests_by_id)
+from amt_station.perform import run_operation
+from amt_station.requests.at_commands import AT_COMMANDS, FLUSH_COMMAND, known_refusal
+from amt_station.requests.catalogue import (UNDEFINED, command_ids, command_name, command_names,
+                                            parse_catalogue)
+from amt_station.requests.model import Channel, Field, Operation, Request
+from amt_station.requests.operations import build_packet, operation_packet, read_answer
+from amt_station.requests.table import (FAMILIES, REQUESTS, display_name, find_command,
+                                        find_operation, operations, requests_by_id)
+from amt_station.wire.atoms import Atom, AtomType
+from amt_station.wire.packet import Packet
 
 # What the handset registers; everything else is passed on (PC line) or refused (app channel).
 ACKNOWLEDGED_ON_PC = {45, 170, 172, 174, 176, 178, 185, 187, 191, 193, 219, 224, 226, 236, 240,

@@ -6,11 +6,11 @@ import pytest
 from hypothesis import given
 from hypothesis import strategies as st
 
-from amt_station.envelope import check_envelope_packet
 from amt_station.wire import (ACKNOWLEDGEMENT, LARGEST_REQUEST, PACKET_SIZE, Atom, AtomType,
-                          AtomTypeError, ChecksumError, HeadError, LengthError, MagicError, Packet,
-                          TruncatedError, ValueRangeError, WireError, checksum, decode_envelope,
-                          encode_envelope, encode_request, unwrap, wrap)
+                              AtomTypeError, ChecksumError, HeadError, LengthError, MagicError,
+                              Packet, TruncatedError, ValueRangeError, WireError, checksum,
+                              decode_envelope, encode_envelope, encode_request, unwrap, wrap)
+from amt_station.wire.envelope import check_envelope_packet
 
 
 def hexed(text: str) -> bytes:

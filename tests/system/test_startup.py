@@ -7,7 +7,7 @@ import pytest
 from conftest import HandsetFactory
 from amt_simulator import Handset
 from amt_simulator.waiting import scaled
-from amt_station.catalogue import command_name
+from amt_station.requests.catalogue import command_name
 from support.channels import AppChannel, PcChannel, integer, packet
 from support.registrations import APP_ROWS, PC_ROWS
 from support.trace import TAG, Trace, error_line

@@ -9,8 +9,8 @@ from amt_simulator import Handset
 from amt_simulator.errors import HandsetError
 from amt_simulator.waiting import wait_until
 from amt_station.link import Link
-from amt_station.packet import Packet
-from amt_station.requests import Channel
+from amt_station.requests.model import Channel
+from amt_station.wire.packet import Packet
 from tools.demo.stage import Stage
 
 IMEI = "490154203237518"

@@ -6,13 +6,13 @@ from pathlib import Path
 from typing import Callable, Mapping
 
 from amt_simulator import Handset, screen
-from amt_station.decoder import Acknowledgement, Frame, Item, Text
 from amt_station.errors import Refused, StationError
 from amt_station.link import Link
-from amt_station.operations import Value, operation_packet, read_answer
-from amt_station.packet import Packet
 from amt_station.render import printable
-from amt_station.table import display_name, find_operation, requests_by_id
+from amt_station.requests.operations import Value, operation_packet, read_answer
+from amt_station.requests.table import display_name, find_operation, requests_by_id
+from amt_station.wire.decoder import Acknowledgement, Frame, Item, Text
+from amt_station.wire.packet import Packet
 
 WIDTHS = (26, 56)
 

@@ -6,7 +6,7 @@ from pathlib import Path
 from typing import Callable
 
 from amt_station import wire
-from amt_station.catalogue import command_ids
+from amt_station.requests.catalogue import command_ids
 
 TOKEN = re.compile(r'(?:[^\s"#]|"(?:[^"\\]|\\.)*")+')
 QUOTED = re.compile(r'"((?:[^"\\]|\\.)*)"')

@@ -2,8 +2,8 @@
 
 from __future__ import annotations
 
-from amt_station.requests import RESULT, Channel, Field, Operation, Refusal, Request, Service
-from amt_station.table.common import BOOL, INT, STRING, on_pc
+from amt_station.requests.model import RESULT, Channel, Field, Operation, Refusal, Request, Service
+from amt_station.requests.table.common import BOOL, INT, STRING, on_pc
 
 
 _PC = (Channel.PC,)

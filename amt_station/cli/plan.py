@@ -6,8 +6,8 @@ from pathlib import Path
 
 import click
 
-from amt_station import console
-from amt_station.cli_options import Settings, common_options
+from amt_station.cli import console
+from amt_station.cli.options import Settings, common_options
 from amt_station.errors import Interrupted, UsageProblem
 from amt_station.plan import Plan, load_plan
 from amt_station.plan_run import StepResult, Verdict, exit_status, run_plan

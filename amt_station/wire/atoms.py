@@ -1,23 +1,18 @@
-"""Packets and their atoms: the typed values that every request and response is made of."""
+"""Atoms: the typed values that every request and response is made of."""
 
 from __future__ import annotations
 
 import struct
-from dataclasses import dataclass, field
+from dataclasses import dataclass
 from enum import IntEnum
-from typing import Iterator, Union
+from typing import Union
 
-from amt_station.errors import (AtomTypeError, HeadError, LengthError, TruncatedError,
-                            ValueRangeError)
+from amt_station.wire.errors import AtomTypeError, HeadError, TruncatedError, ValueRangeError
 
-PACKET_SIZE = 4096
-PACKET_HEAD = 0xBB
-PACKET_HEADER_SIZE = 6
 ATOM_HEAD = 0xEE
 ATOM_HEADER_SIZE = 5
 RESULT_ATOM = 1
 
-_PACKET_HEADER = struct.Struct("<HBBH")
 _ATOM_HEADER = struct.Struct("<BBBH")
 _INTEGER = struct.Struct("<i")
 
@@ -43,7 +38,8 @@ _LABELS = {AtomType.INT: "int", AtomType.STRING: "str", AtomType.BYTES: "bytes",
 _FIXED_LENGTHS = {AtomType.INT: 4, AtomType.BOOL: 1}
 
 
-def _check_byte(value: int, what: str) -> None:
+def check_byte(value: int, what: str) -> None:
+    """Raise unless ``value`` is one."""
     if not 0 <= value <= 255:
         raise ValueRangeError(f"{what} {value} is not a byte")
 
@@ -57,7 +53,7 @@ class Atom:
     content: bytes
 
     def __post_init__(self) -> None:
-        _check_byte(self.id, "atom id")
+        check_byte(self.id, "atom id")
         wanted = _FIXED_LENGTHS.get(self.type, len(self.content))
         if len(self.content) != wanted:
             raise AtomTypeError(f"atom {self.id} of type {self.type.label} holds "
@@ -86,7 +82,7 @@ class Atom:
     @classmethod
     def boolean(cls, atom_id: int, value: int) -> Atom:
         """A one-byte atom: 0 or 1 as a switch, but any byte is allowed."""
-        _check_byte(value, f"atom {atom_id}: value")
+        check_byte(value, f"atom {atom_id}: value")
         return cls(atom_id, AtomType.BOOL, bytes((value,)))
 
     @property
@@ -105,7 +101,8 @@ class Atom:
         return _ATOM_HEADER.pack(ATOM_HEAD, self.id, self.type, len(self.content)) + self.content
 
 
-def _decode_atom(data: bytes, offset: int) -> Atom:
+def decode_atom(data: bytes, offset: int) -> Atom:
+    """The atom whose header begins at ``offset``."""
     where = f"atom at byte {offset}"
     if data[offset] != ATOM_HEAD:
         raise HeadError(f"{where} begins with 0x{data[offset]:02X} instead of 0xEE")
@@ -118,71 +115,3 @@ def _decode_atom(data: bytes, offset: int) -> Atom:
     if len(content) != length:
         raise TruncatedError(f"{where} announces {length} bytes, {len(content)} are left")
     return Atom(atom_id, AtomType(type_code), content)
-
-
-def _iterate_atoms(data: bytes) -> Iterator[Atom]:
-    offset = PACKET_HEADER_SIZE
-    while offset < len(data):
-        atom = _decode_atom(data, offset)
-        offset += ATOM_HEADER_SIZE + len(atom.content)
-        yield atom
-
-
-def check_packet_header(data: bytes) -> int:
-    """Return the total length that the first 6 bytes announce, or raise what is wrong in them."""
-    if len(data) < PACKET_HEADER_SIZE:
-        raise TruncatedError(f"a packet of {len(data)} bytes has no room for its header")
-    total, head, _, atom_length = _PACKET_HEADER.unpack_from(data)
-    if head != PACKET_HEAD:
-        raise HeadError(f"the packet's head is 0x{head:02X} instead of 0xBB")
-    if not PACKET_HEADER_SIZE <= total <= PACKET_SIZE:
-        raise LengthError(f"a packet cannot be {total} bytes long")
-    if atom_length != total - PACKET_HEADER_SIZE:
-        raise LengthError(f"the packet's atom length is {atom_length} in {total} bytes")
-    return int(total)
-
-
-@dataclass(frozen=True)
-class Packet:
-    """A request or a response: a command id and its atoms in order."""
-
-    command: int
-    atoms: tuple[Atom, ...] = field(default=())
-
-    def __post_init__(self) -> None:
-        _check_byte(self.command, "command id")
-        object.__setattr__(self, "atoms", tuple(self.atoms))
-
-    def encode(self) -> bytes:
-        """The bare packet, as it travels on the app channel."""
-        body = b"".join(atom.encode() for atom in self.atoms)
-        total = PACKET_HEADER_SIZE + len(body)
-        if total > PACKET_SIZE:
-            raise ValueRangeError(f"a packet of {total} bytes exceeds {PACKET_SIZE}")
-        return _PACKET_HEADER.pack(total, PACKET_HEAD, self.command, len(body)) + body
-
-    @classmethod
-    def decode(cls, data: bytes) -> Packet:
-        """Read a bare packet that fills ``data`` exactly."""
-        data = bytes(data)
-        total = check_packet_header(data)
-        if total > len(data):
-            raise TruncatedError(f"the packet announces {total} bytes, {len(data)} are there")
-        if total < len(data):
-            raise LengthError(f"{len(data) - total} bytes follow the packet's end")
-        return cls(data[3], tuple(_iterate_atoms(data)))
-
-    def find(self, atom_id: int) -> Atom | None:
-        """The first atom with this id."""
-        return next((atom for atom in self.atoms if atom.id == atom_id), None)
-
-    def get_int(self, atom_id: int, default: int = 0) -> int:
-        """The number in an integer or one-byte atom; ``default`` for any other or none."""
-        atom = self.find(atom_id)
-        return atom.value if atom is not None and isinstance(atom.value, int) else default
-
-    @property
-    def result(self) -> int | None:
-        """The result code, or None when the packet carries none."""
-        atom = self.find(RESULT_ATOM)
-        return atom.value if atom is not None and isinstance(atom.value, int) else None

@@ -2,8 +2,8 @@
 
 from __future__ import annotations
 
-from amt_station.packet import AtomType
-from amt_station.requests import PASSED_ON, Field, Refusal, Service
+from amt_station.requests.model import PASSED_ON, Field, Refusal, Service
+from amt_station.wire.atoms import AtomType
 
 INT, STRING, BYTES, BOOL = AtomType.INT, AtomType.STRING, AtomType.BYTES, AtomType.BOOL
 

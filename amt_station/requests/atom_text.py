@@ -2,9 +2,10 @@
 
 from __future__ import annotations
 
-from amt_station.errors import UsageProblem, WireError
-from amt_station.packet import Atom, AtomType
-from amt_station.requests import Request
+from amt_station.errors import UsageProblem
+from amt_station.requests.model import Request
+from amt_station.wire.atoms import Atom, AtomType
+from amt_station.wire.errors import WireError
 
 TYPES = {kind.label: kind for kind in AtomType}
 

@@ -1,7 +1,7 @@
 """What a request is: its atoms, who serves it, what comes back, and how a station asks for it.
 
-The rows themselves are in ``amt_station.table``; the protocol reference and the typed commands are
-both made from them.
+The rows themselves are in ``amt_station.requests.table``; the protocol reference and the typed
+commands are both made from them.
 """
 
 from __future__ import annotations
@@ -10,9 +10,10 @@ from dataclasses import dataclass, field
 from enum import Enum
 from typing import Mapping
 
-from amt_station.catalogue import command_name
-from amt_station.errors import UsageProblem, WireError
-from amt_station.packet import RESULT_ATOM, Atom, AtomType
+from amt_station.errors import UsageProblem
+from amt_station.requests.catalogue import command_name
+from amt_station.wire.atoms import RESULT_ATOM, Atom, AtomType
+from amt_station.wire.errors import WireError
 
 
 class Channel(str, Enum):

@@ -5,10 +5,11 @@ from __future__ import annotations
 from functools import lru_cache
 from typing import Mapping
 
-from amt_station.catalogue import command_ids, command_name, command_names
 from amt_station.errors import UsageProblem
-from amt_station.requests import Operation, Request
-from amt_station.table import device, identity, mode, modem_value, radio, test_result, tunnel
+from amt_station.requests.catalogue import command_ids, command_name, command_names
+from amt_station.requests.model import Operation, Request
+from amt_station.requests.table import (device, identity, mode, modem_value, radio, test_result,
+                                        tunnel)
 
 FAMILIES: tuple[tuple[str, tuple[Request, ...]], ...] = (
     ("Versions and modem values", modem_value.REQUESTS),

@@ -2,9 +2,9 @@
 
 from __future__ import annotations
 
-from amt_station.requests import RESULT, Channel, Field, Operation, Refusal, Request, Service
-from amt_station.table.common import (BOOL, BYTES, DEVICE_FILE, INT, MODEM_ERROR, NO_MODEM,
-                                  REMEMBERED_ON_PC, STRING, asks_modem, on_app)
+from amt_station.requests.model import RESULT, Channel, Field, Operation, Refusal, Request, Service
+from amt_station.requests.table.common import (BOOL, BYTES, DEVICE_FILE, INT, MODEM_ERROR, NO_MODEM,
+                                               REMEMBERED_ON_PC, STRING, asks_modem, on_app)
 
 
 MODULES = {"product": 1, "software": 16, "l1": 17, "hls": 18, "platform": 19, "app": 20,

@@ -6,13 +6,14 @@ from typing import Any
 
 import click
 
-from amt_station import console
-from amt_station.cli_options import Settings, common_parameters
-from amt_station.cli_raw import show_exchange
-from amt_station.operations import check_channel, operation_packet, read_answer, run_operation
+from amt_station.cli import console
+from amt_station.cli.options import Settings, common_parameters
+from amt_station.cli.outcome import show_exchange
+from amt_station.perform import run_operation
 from amt_station.render import exchange_json, value_line
-from amt_station.requests import Field, Operation, Request
-from amt_station.table import operations
+from amt_station.requests.model import Field, Operation, Request
+from amt_station.requests.operations import check_channel, operation_packet, read_answer
+from amt_station.requests.table import operations
 
 
 def _parameters(row: Request, operation: Operation) -> list[click.Parameter]:

@@ -2,8 +2,8 @@
 
 from __future__ import annotations
 
-from amt_station.requests import RESULT, Channel, Field, Operation, Refusal, Request
-from amt_station.table.common import (DEVICE_FILE, INT, ON, STRING, TEST_HAL, on_app, on_pc)
+from amt_station.requests.model import RESULT, Channel, Field, Operation, Refusal, Request
+from amt_station.requests.table.common import DEVICE_FILE, INT, ON, STRING, TEST_HAL, on_app, on_pc
 
 
 _PC, _APP = (Channel.PC,), (Channel.APP,)

@@ -2,8 +2,8 @@
 
 from __future__ import annotations
 
-from amt_station.requests import RESULT, Field, Operation, Refusal, Request
-from amt_station.table.common import BYTES, INT, TEST_LIBRARY, on_app, on_pc
+from amt_station.requests.model import RESULT, Field, Operation, Refusal, Request
+from amt_station.requests.table.common import BYTES, INT, TEST_LIBRARY, on_app, on_pc
 
 
 _WIFI_STEPS = {"start": 1, "stop": 2, "tx-start": 3, "tx-stop": 4, "rx-start": 5, "rx-stop": 6}

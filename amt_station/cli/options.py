@@ -10,7 +10,7 @@ import click
 
 from amt_station.errors import NoPort, UsageProblem
 from amt_station.link import Link
-from amt_station.requests import Channel
+from amt_station.requests.model import Channel
 
 _Command = TypeVar("_Command", bound=Callable[..., Any])
 

@@ -8,9 +8,9 @@ from __future__ import annotations
 
 from typing import Mapping
 
-from amt_station.catalogue import command_name
-from amt_station.requests import RESULT, Field, Refusal, Request
-from amt_station.table.common import BOOL, BYTES, INT, asks_modem
+from amt_station.requests.catalogue import command_name
+from amt_station.requests.model import RESULT, Field, Refusal, Request
+from amt_station.requests.table.common import BOOL, BYTES, INT, asks_modem
 
 
 _SERVICE = asks_modem(

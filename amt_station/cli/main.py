@@ -8,11 +8,14 @@ from typing import NoReturn, Sequence
 
 import click
 
-from amt_station import console
-from amt_station.cli_options import Settings, common_options
-from amt_station.cli_plan import plan
-from amt_station.cli_raw import at, commands, recover, send
-from amt_station.cli_typed import add_typed_commands
+from amt_station.cli import console
+from amt_station.cli.at import at
+from amt_station.cli.commands import commands
+from amt_station.cli.options import Settings, common_options
+from amt_station.cli.plan import plan
+from amt_station.cli.recover import recover
+from amt_station.cli.send import send
+from amt_station.cli.typed import add_typed_commands
 from amt_station.errors import EXIT_PASS, Interrupted, Refused, StationError, UsageProblem
 
 _EPILOG = ("Exit status: 0 pass, 1 the handset said no, 2 usage, 3 no port, 4 port busy, "

@@ -2,8 +2,8 @@
 
 from __future__ import annotations
 
-from amt_station.requests import RESULT, Channel, Field, Operation, Refusal, Request, Service
-from amt_station.table.common import INT, MODEM_ERROR, STRING, VERDICTS, asks_modem, on_app
+from amt_station.requests.model import RESULT, Channel, Field, Operation, Refusal, Request, Service
+from amt_station.requests.table.common import INT, MODEM_ERROR, STRING, VERDICTS, asks_modem, on_app
 
 
 _VERDICT = Field(36, INT, "verdict", "1 pass, 2 fail, anything else unknown", choices=VERDICTS,

@@ -13,11 +13,11 @@ from abc import ABC, abstractmethod
 from dataclasses import dataclass
 from typing import Callable, TypeVar, Union
 
-from amt_station.envelope import (ACKNOWLEDGEMENT, HEAD_SIZE, LENGTH_OFFSET_SIZE, MAGIC,
-                              check_envelope_packet, decode_envelope, envelope_size)
-from amt_station.errors import StrayBytesError, TruncatedError, WireError
-from amt_station.packet import (ATOM_HEAD, PACKET_HEAD, PACKET_HEADER_SIZE, Packet,
-                            check_packet_header)
+from amt_station.wire.atoms import ATOM_HEAD
+from amt_station.wire.envelope import (ACKNOWLEDGEMENT, HEAD_SIZE, LENGTH_OFFSET_SIZE, MAGIC,
+                                       check_envelope_packet, decode_envelope, envelope_size)
+from amt_station.wire.errors import StrayBytesError, TruncatedError, WireError
+from amt_station.wire.packet import PACKET_HEAD, PACKET_HEADER_SIZE, Packet, check_packet_header
 
 
 @dataclass(frozen=True)

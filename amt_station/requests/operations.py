@@ -6,11 +6,10 @@ from dataclasses import dataclass
 from typing import Mapping
 
 from amt_station.errors import UsageProblem
-from amt_station.exchange import Exchange
-from amt_station.link import Link
-from amt_station.packet import RESULT_ATOM, Atom, Packet
-from amt_station.requests import Channel, Field, Operation, Request
-from amt_station.table import find_operation, requests_by_id
+from amt_station.requests.model import Channel, Field, Operation, Request
+from amt_station.requests.table import requests_by_id
+from amt_station.wire.atoms import RESULT_ATOM, Atom
+from amt_station.wire.packet import Packet
 
 Value = int | str
 
@@ -58,17 +57,6 @@ def check_channel(row: Request, operation: Operation, channel: Channel) -> None:
         served = " and ".join(name.value for name in operation.channels
                               if row.service(name) is not None)
         raise UsageProblem(f"{operation.name} is served on the {served} channel only")
-
-
-def run_operation(link: Link, path: tuple[str, ...],
-                  values: Mapping[str, Value] | None = None,
-                  timeout: float | None = None) -> list[Exchange]:
-    """Carry out a typed command and what it needs before; the last exchange is its own."""
-    row, operation = find_operation(path)
-    check_channel(row, operation, link.channel)
-    packet = operation_packet(row, operation, values)
-    before = run_operation(link, operation.before, None, timeout) if operation.before else []
-    return [*before, link.request(packet, timeout)]
 
 
 def read_answer(command: int, answer: Packet) -> list[NamedValue]:

@@ -2,8 +2,9 @@
 
 from __future__ import annotations
 
-from amt_station.requests import RESULT, Channel, Field, Operation, Refusal, Request, Service
-from amt_station.table.common import (INT, MODEM_ERROR, NO_MODEM, TEST_HAL, asks_modem, on_pc)
+from amt_station.requests.model import RESULT, Channel, Field, Operation, Refusal, Request, Service
+from amt_station.requests.table.common import (INT, MODEM_ERROR, NO_MODEM, TEST_HAL, asks_modem,
+                                               on_pc)
 
 
 PERMISSIONS = {"deny": 0, "allow": 1}

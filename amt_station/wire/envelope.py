@@ -4,10 +4,10 @@ from __future__ import annotations
 
 import struct
 
-from amt_station.checksum import checksum
-from amt_station.errors import (ChecksumError, LengthError, MagicError, TruncatedError,
-                            ValueRangeError)
-from amt_station.packet import PACKET_HEADER_SIZE, PACKET_SIZE, Packet, check_packet_header
+from amt_station.wire.checksum import checksum
+from amt_station.wire.errors import (ChecksumError, LengthError, MagicError, TruncatedError,
+                                     ValueRangeError)
+from amt_station.wire.packet import PACKET_HEADER_SIZE, PACKET_SIZE, Packet, check_packet_header
 
 MAGIC = bytes.fromhex("AABBCCDD")
 HEAD_SIZE = 12

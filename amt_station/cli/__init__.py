@@ -1,0 +1,1 @@
+"""``amt-station``: the command-line test station, one command a file."""
