@@ -5,7 +5,7 @@
 #include <string.h>
 
 #include "amt/amt-handle/channel/context.h"
-#include "amt/amt-handle/channel/response.h"
+#include "amt/amt-handle/channel/reply.h"
 
 int amt_at_reply_ok()
 {

@@ -5,7 +5,7 @@
 #include "amt/amt-command.h"
 #include "amt/amt-convert.h"
 #include "amt/amt-handle/channel/identity-slots.h"
-#include "amt/amt-handle/channel/response.h"
+#include "amt/amt-handle/channel/reply.h"
 #include "amt/amt-handle/request/identity-store.h"
 #include "amt/amt-log.h"
 #include "amt/amt-packet.h"

@@ -6,7 +6,7 @@
 #include "amt/amt-handle/at/at-probe.h"
 #include "amt/amt-handle/channel/context.h"
 #include "amt/amt-handle/channel/process-end.h"
-#include "amt/amt-handle/channel/response.h"
+#include "amt/amt-handle/channel/reply.h"
 #include "amt/amt-handle/channel/service-process.h"
 #include "amt/amt-handle/channel/wait.h"
 #include "amt/amt-handle/reader/dispatch.h"

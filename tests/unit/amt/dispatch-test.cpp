@@ -9,7 +9,7 @@
 #include "amt/amt-command.h"
 #include "amt/amt-convert.h"
 #include "amt/amt-handle/channel/context.h"
-#include "amt/amt-handle/channel/response.h"
+#include "amt/amt-handle/channel/reply.h"
 #include "amt/amt-handle/reader/registry.h"
 #include "amt/amt-handle/request/version.h"
 #include "pub/error.h"

@@ -1,4 +1,4 @@
-#include "amt/amt-handle/channel/response.h"
+#include "amt/amt-handle/channel/reply.h"
 
 #include <errno.h>
 #include <fcntl.h>
@@ -225,7 +225,7 @@ TEST(response, is_wrapped_for_the_pc_only)
     const std::string packet = wire_packet(194, text_atom(191, "SN"));
     for (const uint32_t channel : {AMT_CHANNEL_PC, AMT_CHANNEL_APP}) {
         amt_buf_st rsp = make_rsp(packet, 0);
-        EXPECT_EQ(amt_handle_finish_rsp(channel, &rsp), PUB_ERR_NONE);
+        EXPECT_EQ(amt_reply_finish(channel, &rsp), PUB_ERR_NONE);
         EXPECT_TRUE(is_clear(rsp));
     }
     EXPECT_EQ(line.pc_frames(), texts_t{to_pc(packet)});
@@ -239,44 +239,111 @@ TEST(response, that_does_not_fit_its_envelope_is_refused)
     for (const size_t size : {4080U, 4081U}) {
         const std::string packet = wire_packet(9, bytes_atom(4, std::string(size - 11, 'p')));
         amt_buf_st rsp = make_rsp(packet, 0);
-        const int status = amt_handle_finish_rsp(AMT_CHANNEL_PC, &rsp);
+        const int status = amt_reply_finish(AMT_CHANNEL_PC, &rsp);
         EXPECT_EQ(status, size == 4080 ? PUB_ERR_NONE : PUB_ERR_PARAM);
     }
     EXPECT_EQ(line.pc_frames().size(), 1U);
 }
 
-int check(uint32_t channel, const amt_buf_st *req_ptr, const amt_buf_st *rsp_ptr)
+int enter(uint32_t channel, const amt_buf_st *req_ptr, const amt_buf_st *rsp_ptr)
 {
-    return AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr);
+    return amt_reply_enter(g_amt_device_log, channel, req_ptr, rsp_ptr);
+}
+
+int enter_modem(uint32_t channel, const amt_buf_st *req_ptr, const amt_buf_st *rsp_ptr)
+{
+    return amt_reply_enter_modem(g_amt_gps_log, channel, req_ptr, rsp_ptr);
 }
 
 TEST(request, has_a_channel_content_and_room_for_a_response)
 {
+    const modem_line_c line;
     const amt_buf_st req = make_rsp("abc", 3);
     const amt_buf_st empty = {};
     for (const uint32_t channel : {0U, 1U, 2U, 254U, 256U}) {
-        EXPECT_EQ(check(channel, &req, &empty), PUB_ERR_NONE);
+        const log_capture_c capture;
+        EXPECT_EQ(enter(channel, &req, &empty), PUB_ERR_NONE);
+        EXPECT_EQ(enter_modem(channel, &req, &empty), PUB_ERR_NONE);
+        EXPECT_EQ(capture.texts(), (texts_t{"enter()", "enter_modem()"}));
     }
     const log_capture_c capture;
     errno = 0;
-    EXPECT_EQ(check(255, &req, &empty), PUB_ERR_PARAM);
-    EXPECT_EQ(check(1, nullptr, &empty), PUB_ERR_PARAM);
-    EXPECT_EQ(check(1, &empty, &empty), PUB_ERR_PARAM);
-    EXPECT_EQ(check(1, &req, nullptr), PUB_ERR_PARAM);
-    const std::string line = error_line("amt/amt-device", "check", -101);
+    EXPECT_EQ(enter(255, &req, &empty), PUB_ERR_PARAM);
+    EXPECT_EQ(enter(1, nullptr, &empty), PUB_ERR_PARAM);
+    EXPECT_EQ(enter(1, &empty, &empty), PUB_ERR_PARAM);
+    EXPECT_EQ(enter_modem(1, &req, nullptr), PUB_ERR_PARAM);
+    const std::string entry = "enter()";
+    const std::string line_text = error_line("amt/amt-device", "enter", -101);
     EXPECT_EQ(without_line_numbers(capture),
-              (texts_t{line, "1, 0, 0, 0", line, "0, 1, 0, 0", line, "0, 0, 1, 0", line, "0, 0, 0, 1"}));
+              (texts_t{entry, line_text, "1, 0, 0, 0", entry, line_text, "0, 1, 0, 0", entry, line_text,
+                       "0, 0, 1, 0", "enter_modem()", error_line("amt/amt-gps", "enter_modem", -101),
+                       "0, 0, 0, 1"}));
 }
 
-TEST(modem, absent_is_said)
+TEST(request, is_named_with_the_line_that_enters)
 {
+    const amt_buf_st req = make_rsp("abc", 3);
     const log_capture_c capture;
-    g_handle_state.m_is_no_modem = 0;
-    EXPECT_EQ(amt_handle_check_modem(), PUB_ERR_NONE);
+    const int line = __LINE__ + 1;
+    EXPECT_EQ(amt_reply_enter(g_amt_handle_log, 1, &req, nullptr), PUB_ERR_PARAM);
+    EXPECT_EQ(capture.count_containing(", LINE-" + std::to_string(line) + ", FUNC-TestBody()"), 1);
+}
+
+TEST(request, needs_the_modem_after_its_arguments)
+{
+    const modem_line_c line;
     g_handle_state.m_is_no_modem = 1;
-    EXPECT_EQ(amt_handle_check_modem(), PUB_ERR_NO_MODEM);
-    g_handle_state.m_is_no_modem = 0;
-    EXPECT_EQ(capture.texts(), (texts_t{"WARNING !", "no CP."}));
+    const amt_buf_st req = make_rsp("abc", 3);
+    const amt_buf_st empty = {};
+    const log_capture_c capture;
+    errno = 0;
+    EXPECT_EQ(enter(1, &req, &empty), PUB_ERR_NONE);
+    EXPECT_EQ(enter_modem(1, &req, &empty), PUB_ERR_NO_MODEM);
+    EXPECT_EQ(enter_modem(255, &req, &empty), PUB_ERR_PARAM);
+    EXPECT_EQ(amt_reply_check_modem(g_amt_handle_log, "somebody", 12), PUB_ERR_NO_MODEM);
+    EXPECT_EQ(without_line_numbers(capture),
+              (texts_t{"enter()", "enter_modem()", error_line("amt/amt-gps", "enter_modem", -111),
+                       "WARNING !", "no CP.", "enter_modem()", error_line("amt/amt-gps", "enter_modem", -101),
+                       "1, 0, 0, 0", error_line("amt/amt-handle", "somebody", -111), "WARNING !", "no CP."}));
+}
+
+TEST(reply, starts_in_a_clear_buffer)
+{
+    amt_buf_st rsp = make_rsp(std::string(AMT_PACKET_SIZE, '\x5A'), 16);
+    amt_reply_start(&rsp, 192);
+    EXPECT_EQ(rsp.m_buf_len, 0U);
+    const std::string packet = wire_packet(192, "");
+    const std::string whole = packet + std::string(AMT_PACKET_SIZE - packet.size(), '\0');
+    EXPECT_EQ(std::string(reinterpret_cast<const char *>(rsp.m_buf_a), AMT_PACKET_SIZE), whole);
+}
+
+TEST(reply, ends_with_its_result)
+{
+    const modem_line_c line;
+    const std::string packet = wire_packet(194, text_atom(191, "SN") + int_atom(1, 0));
+    for (const uint32_t channel : {AMT_CHANNEL_PC, AMT_CHANNEL_APP}) {
+        amt_buf_st rsp = make_rsp(std::string(AMT_PACKET_SIZE, '\x5A'), 16);
+        amt_reply_start(&rsp, 194);
+        amt_packet_add_string(rsp.m_buf_a, 191, "SN");
+        EXPECT_EQ(amt_reply_finish_ok(channel, &rsp), PUB_ERR_NONE);
+        EXPECT_TRUE(is_clear(rsp));
+    }
+    EXPECT_EQ(line.pc_frames(), texts_t{to_pc(packet)});
+    EXPECT_EQ(line.app_packets(), texts_t{packet});
+}
+
+TEST(reply, of_a_failure_is_result_10)
+{
+    const modem_line_c line;
+    for (const uint32_t channel : {AMT_CHANNEL_PC, AMT_CHANNEL_APP}) {
+        amt_buf_st rsp = make_rsp(std::string(AMT_PACKET_SIZE, '\x5A'), 16);
+        EXPECT_EQ(amt_reply_fail(channel, &rsp, 86), PUB_ERR_NONE);
+    }
+    EXPECT_EQ(line.pc_frames(), texts_t{to_pc(failure_packet(86))});
+    EXPECT_EQ(line.app_packets(), texts_t{failure_packet(86)});
+    g_handle_context.m_fd_pc = 0;
+    amt_buf_st rsp = {};
+    EXPECT_EQ(amt_reply_fail(AMT_CHANNEL_PC, &rsp, 86), PUB_ERR_FAIL);
 }
 
 } // namespace

@@ -1,8 +1,9 @@
-#include "amt/amt-handle/channel/response.h"
+#include "amt/amt-handle/channel/reply.h"
 
 #include <string.h>
 #include <unistd.h>
 
+#include "amt/amt-atom.h"
 #include "amt/amt-convert.h"
 #include "amt/amt-handle/channel/context.h"
 #include "amt/amt-packet.h"
@@ -28,8 +29,9 @@ int get_fd(uint32_t channel)
     return channel == AMT_CHANNEL_PC ? g_handle_context.m_fd_pc.load() : g_handle_context.m_pty.m_ptm_fd;
 }
 
-/* The faults the senders look for before anything else. */
-int check_sender(int line, const char *func, uint32_t channel, const amt_buf_st *rsp_ptr)
+/* The faults that each sender looks for first, in the calling sender's name. */
+int check_sender(uint32_t channel, const amt_buf_st *rsp_ptr, const char *func = __builtin_FUNCTION(),
+                 int line = __builtin_LINE())
 {
     if (!is_no_channel(channel) && rsp_ptr != nullptr) {
         return PUB_ERR_NONE;
@@ -41,10 +43,23 @@ int check_sender(int line, const char *func, uint32_t channel, const amt_buf_st 
 
 int send_result(uint32_t channel, amt_buf_st *rsp_ptr, uint8_t rsp_id, int32_t code)
 {
-    amt_handle_clear_buf(rsp_ptr);
-    amt_packet_init(rsp_ptr->m_buf_a, rsp_id);
+    amt_reply_start(rsp_ptr, rsp_id);
     amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_RESULT, code);
-    return amt_handle_finish_rsp(channel, rsp_ptr);
+    return amt_reply_finish(channel, rsp_ptr);
+}
+
+/* The faults that each handler looks for first. */
+int check_request(const pub_log_source_st &source, uint32_t channel, const amt_buf_st *req_ptr,
+                  const amt_buf_st *rsp_ptr, const char *func, int line)
+{
+    const bool is_channel_none = channel == AMT_CHANNEL_NONE;
+    const bool is_req_empty = req_ptr != nullptr && req_ptr->m_buf_len == 0;
+    if (!is_channel_none && req_ptr != nullptr && !is_req_empty && rsp_ptr != nullptr) {
+        return PUB_ERR_NONE;
+    }
+    pub_log_error(source, PUB_ERR_PARAM, func, line);
+    pub_log_flags(source, {is_channel_none, req_ptr == nullptr, is_req_empty, rsp_ptr == nullptr});
+    return PUB_ERR_PARAM;
 }
 
 int write_rsp(int fd, const amt_buf_st *rsp_ptr)
@@ -67,9 +82,57 @@ int write_rsp(int fd, const amt_buf_st *rsp_ptr)
 
 } // namespace
 
+int amt_reply_enter(const pub_log_source_st &source, uint32_t channel, const amt_buf_st *req_ptr,
+                    const amt_buf_st *rsp_ptr, const char *func, int line)
+{
+    pub_log_entry(source, func);
+    return check_request(source, channel, req_ptr, rsp_ptr, func, line);
+}
+
+int amt_reply_enter_modem(const pub_log_source_st &source, uint32_t channel, const amt_buf_st *req_ptr,
+                          const amt_buf_st *rsp_ptr, const char *func, int line)
+{
+    const int status = amt_reply_enter(source, channel, req_ptr, rsp_ptr, func, line);
+    return status == PUB_ERR_NONE ? amt_reply_check_modem(source, func, line) : status;
+}
+
+int amt_reply_check_modem(const pub_log_source_st &source, const char *func, int line)
+{
+    if (g_handle_state.m_is_no_modem == 0) {
+        return PUB_ERR_NONE;
+    }
+    pub_log_error(source, PUB_ERR_NO_MODEM, func, line);
+    PUB_LOG(source, "WARNING !");
+    PUB_LOG(source, "no CP.");
+    return PUB_ERR_NO_MODEM;
+}
+
+void amt_reply_start(amt_buf_st *rsp_ptr, uint8_t rsp_id)
+{
+    amt_handle_clear_buf(rsp_ptr);
+    amt_packet_init(rsp_ptr->m_buf_a, rsp_id);
+}
+
+int amt_reply_finish(uint32_t channel, amt_buf_st *rsp_ptr)
+{
+    const int status = channel == AMT_CHANNEL_PC ? amt_convert_app_2_pc(rsp_ptr) : PUB_ERR_NONE;
+    return status == PUB_ERR_NONE ? amt_handle_send_rsp(channel, rsp_ptr) : status;
+}
+
+int amt_reply_finish_ok(uint32_t channel, amt_buf_st *rsp_ptr)
+{
+    amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_RESULT, 0);
+    return amt_reply_finish(channel, rsp_ptr);
+}
+
+int amt_reply_fail(uint32_t channel, amt_buf_st *rsp_ptr, uint8_t rsp_id)
+{
+    return amt_handle_send_rsp_err(channel, rsp_ptr, rsp_id, AMT_RESULT_MODEM_FAILED);
+}
+
 int amt_handle_send_rsp(uint32_t channel, amt_buf_st *rsp_ptr)
 {
-    if (check_sender(__LINE__, __func__, channel, rsp_ptr) != PUB_ERR_NONE) {
+    if (check_sender(channel, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
     if (rsp_ptr->m_buf_len == 0) {
@@ -98,7 +161,7 @@ int amt_handle_send_rsp(uint32_t channel, amt_buf_st *rsp_ptr)
 
 int amt_handle_send_rsp_ok(uint32_t channel, amt_buf_st *rsp_ptr, uint8_t rsp_id)
 {
-    if (check_sender(__LINE__, __func__, channel, rsp_ptr) != PUB_ERR_NONE) {
+    if (check_sender(channel, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
     return send_result(channel, rsp_ptr, rsp_id, 0);
@@ -106,7 +169,7 @@ int amt_handle_send_rsp_ok(uint32_t channel, amt_buf_st *rsp_ptr, uint8_t rsp_id
 
 int amt_handle_send_rsp_err(uint32_t channel, amt_buf_st *rsp_ptr, uint8_t rsp_id, int32_t code)
 {
-    if (check_sender(__LINE__, __func__, channel, rsp_ptr) != PUB_ERR_NONE) {
+    if (check_sender(channel, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
     return send_result(channel, rsp_ptr, rsp_id, code);
@@ -125,31 +188,11 @@ int amt_handle_send_pre_rsp_for_pc(uint32_t channel, amt_buf_st *rsp_ptr)
     return amt_handle_send_rsp(channel, rsp_ptr);
 }
 
-int amt_handle_finish_rsp(uint32_t channel, amt_buf_st *rsp_ptr)
-{
-    const int status = channel == AMT_CHANNEL_PC ? amt_convert_app_2_pc(rsp_ptr) : PUB_ERR_NONE;
-    return status == PUB_ERR_NONE ? amt_handle_send_rsp(channel, rsp_ptr) : status;
-}
-
+/* The check alone, for handlers that log their entry line themselves: until the last of them has moved. */
+int amt_handle_check_request(const pub_log_source_st &source, int line, const char *func, uint32_t channel,
+                             const amt_buf_st *req_ptr, const amt_buf_st *rsp_ptr);
 int amt_handle_check_request(const pub_log_source_st &source, int line, const char *func, uint32_t channel,
                              const amt_buf_st *req_ptr, const amt_buf_st *rsp_ptr)
 {
-    const bool is_channel_none = channel == AMT_CHANNEL_NONE;
-    const bool is_req_empty = req_ptr != nullptr && req_ptr->m_buf_len == 0;
-    if (!is_channel_none && req_ptr != nullptr && !is_req_empty && rsp_ptr != nullptr) {
-        return PUB_ERR_NONE;
-    }
-    pub_log_error(source, PUB_ERR_PARAM, func, line);
-    pub_log_flags(source, {is_channel_none, req_ptr == nullptr, is_req_empty, rsp_ptr == nullptr});
-    return PUB_ERR_PARAM;
-}
-
-int amt_handle_check_modem()
-{
-    if (g_handle_state.m_is_no_modem == 0) {
-        return PUB_ERR_NONE;
-    }
-    PUB_LOG(g_amt_handle_log, "WARNING !");
-    PUB_LOG(g_amt_handle_log, "no CP.");
-    return PUB_ERR_NO_MODEM;
+    return check_request(source, channel, req_ptr, rsp_ptr, func, line);
 }
