@@ -1,13 +1,12 @@
 #include "amt/amt-device/battery-adc.h"
 
-#include <errno.h>
 #include <stdio.h>
 
 #include "amt/amt-device/command.h"
 #include "amt/amt-device/device-fail.h"
-#include "amt/amt-device/number-scan.h"
 #include "amt/amt-handle/request/factory-file.h"
 #include "pub/error.h"
+#include "pub/file/scan.h"
 #include "pub/util/thread-end.h"
 
 namespace {
@@ -31,18 +30,16 @@ int amt_read_adc(uint32_t *value_ptr)
         return PUB_ERR_NONE;
     }
     pub_util_sleep_ms(MEASURE_MS);
-    FILE *stream = fopen(AMT_BATTERY_DRIVER_FILE, "re");
-    if (stream == nullptr) {
+    const pub_file_st file(AMT_BATTERY_DRIVER_FILE, pub_file_mode_en::READ);
+    if (!file.is_open()) {
         return AMT_DEVICE_FAIL_CALL(__func__, "fopen");
     }
-    errno = 0;
-    const bool is_read = amt_number_scan_unsigned(stream, value_ptr) == 1;
+    const bool is_read = pub_file_scan_unsigned(file, value_ptr) == 1;
     if (is_read) {
         PUB_LOG(g_amt_device_log, "ADC value: %u", *value_ptr);
     } else {
         AMT_DEVICE_FAIL_CALL(__func__, "fscanf");
     }
-    fclose(stream);
     return is_read ? PUB_ERR_NONE : PUB_ERR_FAIL;
 }
 

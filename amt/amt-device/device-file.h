@@ -10,7 +10,7 @@
 /*
  * Reads the number at the start of the file. Returns 0, or -118 after the error line and the line of the open
  * or of the reading; *value_ptr is left alone then. A number out of range, or followed by other text, is the
- * number that "%d" takes (see number-scan.h).
+ * number that "%d" takes (see pub/file/scan.h).
  */
 int amt_device_file_read_int(int line, const char *func, const char *path, int32_t *value_ptr);
 

@@ -1,32 +1,26 @@
 #include "amt/amt-handle/request/factory-file.h"
 
 #include <errno.h>
-#include <stdio.h>
 #include <stdlib.h>
 
+#include "pub/file/file.h"
 #include "pub/util/thread-end.h"
 
-static constexpr int FLUSH_COUNT = 2;
-static constexpr uint32_t FLUSH_PAUSE_MS = 50;
-static constexpr const char *SYNC_COMMAND = "/system/bin/sync";
+namespace {
 
-/* Flushes the stream too: a full file system shows when the text leaves the stream, not when it enters it. */
-static bool put_text(FILE *stream, const char *text, const char *line_end)
-{
-    return fputs(text, stream) != EOF && fputs(line_end, stream) != EOF && fflush(stream) == 0;
-}
+constexpr int FLUSH_COUNT = 2;
+constexpr uint32_t FLUSH_PAUSE_MS = 50;
+constexpr const char *SYNC_COMMAND = "/system/bin/sync";
+
+} // namespace
 
 amt_factory_step_en amt_factory_file_put(const char *path, const char *text, const char *line_end)
 {
-    FILE *const stream = fopen(path, "w+");
-    if (stream == nullptr) {
+    const pub_file_st file(path, pub_file_mode_en::RENEW);
+    if (!file.is_open()) {
         return amt_factory_step_en::OPEN_FAILED;
     }
-    const bool is_written = put_text(stream, text, line_end);
-    const int write_errno = errno;
-    fclose(stream);
-    errno = write_errno;
-    return is_written ? amt_factory_step_en::DONE : amt_factory_step_en::WRITE_FAILED;
+    return pub_file_put(file, text, line_end) ? amt_factory_step_en::DONE : amt_factory_step_en::WRITE_FAILED;
 }
 
 amt_factory_step_en amt_factory_file_write(const char *path, const char *text, const char *line_end)

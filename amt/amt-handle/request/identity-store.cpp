@@ -9,12 +9,15 @@
 
 #include "amt/amt-handle/channel/identity-slots.h"
 #include "amt/amt-handle/request/factory-file.h"
-#include "amt/amt-handle/request/line-file.h"
 #include "amt/amt-log.h"
 #include "pub/error.h"
+#include "pub/file/file.h"
 
 /* A handset whose system was reflashed from an older layout has its Bluetooth address here. */
 static constexpr const char *BT_ADDRESS_FILE_2 = "/mnt/opl/nvm/BT_Address.txt";
+
+/* Room for the longest line that counts, 98 characters with the line feed. */
+static constexpr uint32_t LINE_SIZE = 99;
 
 static constexpr mode_t FOLDER_MODE = 0777;
 static constexpr uint32_t FOLDER_COMMAND_SIZE = 100;
@@ -48,20 +51,24 @@ static int fail_open(int line, const char *func, const char *path)
     return PUB_ERR_FILE;
 }
 
-/* Reads the first line of the file into line_ptr (AMT_LINE_SIZE bytes), for the operation of that name. */
-static int read_first_line(int line, const char *func, const char *path, char *line_ptr)
+/* Reads the first line of the file, cut to what fits buf (size bytes), for the operation of that name. */
+static int read_first_line(int line, const char *func, const char *path, char *buf, uint32_t size)
 {
-    switch (amt_line_file_read(path, line_ptr)) {
-    case amt_line_step_en::OPEN_FAILED:
+    memset(buf, 0, size);
+    char line_a[LINE_SIZE];
+    switch (pub_file_read_line(path, line_a, sizeof(line_a))) {
+    case pub_file_step_en::OPEN_FAILED:
         return fail_open(line, func, path);
-    case amt_line_step_en::READ_FAILED:
-        pub_log_error(g_amt_handle_log, PUB_ERR_FILE, func, line);
-        PUB_LOG(g_amt_handle_log, "read fail: %d - %s", errno, strerror(errno));
-        return PUB_ERR_FILE;
-    case amt_line_step_en::DONE:
+    case pub_file_step_en::DONE:
+        memcpy(buf, line_a, strnlen(line_a, size - 1));
+        return PUB_ERR_NONE;
+    case pub_file_step_en::READ_FAILED:
+    case pub_file_step_en::WRITE_FAILED:
         break;
     }
-    return PUB_ERR_NONE;
+    pub_log_error(g_amt_handle_log, PUB_ERR_FILE, func, line);
+    PUB_LOG(g_amt_handle_log, "read fail: %d - %s", errno, strerror(errno));
+    return PUB_ERR_FILE;
 }
 
 int amt_write_pcba_sn(const char *text, const char *path)
@@ -92,13 +99,10 @@ int amt_write_pcba_sn(const char *text, const char *path)
 int amt_read_pcba_sn(char *buf)
 {
     pub_log_entry(g_amt_handle_log);
-    memset(buf, 0, AMT_PCBA_SN_SIZE);
-    char line_a[AMT_LINE_SIZE];
-    const int ret_val = read_first_line(__LINE__, __func__, AMT_PCBA_SN_FILE, line_a);
+    const int ret_val = read_first_line(__LINE__, __func__, AMT_PCBA_SN_FILE, buf, AMT_PCBA_SN_SIZE);
     if (ret_val != PUB_ERR_NONE) {
         return ret_val;
     }
-    amt_line_copy(buf, AMT_PCBA_SN_SIZE, line_a);
     PUB_LOG(g_amt_handle_log, "read pcba-sn: %s", buf);
     return PUB_ERR_NONE;
 }
@@ -111,13 +115,10 @@ int amt_read_data_from_file(char *buf, uint32_t size, const char *path)
         pub_log_flags(g_amt_handle_log, {buf == nullptr, size == 0, path == nullptr});
         return PUB_ERR_PARAM;
     }
-    memset(buf, 0, size);
-    char line_a[AMT_LINE_SIZE];
-    const int ret_val = read_first_line(__LINE__, __func__, path, line_a);
+    const int ret_val = read_first_line(__LINE__, __func__, path, buf, size);
     if (ret_val != PUB_ERR_NONE) {
         return ret_val;
     }
-    amt_line_copy(buf, size, line_a);
     PUB_LOG(g_amt_handle_log, "read content: %s", buf);
     return PUB_ERR_NONE;
 }
@@ -211,23 +212,22 @@ int amt_read_wifi_address(char *buf)
 {
     pub_log_entry(g_amt_handle_log);
     buf[0] = '\0';
-    char line_a[AMT_LINE_SIZE];
-    switch (amt_line_file_read(AMT_WIFI_ADDRESS_FILE, line_a)) {
-    case amt_line_step_en::OPEN_FAILED:
+    char line_a[LINE_SIZE];
+    const pub_file_step_en step = pub_file_read_line(AMT_WIFI_ADDRESS_FILE, line_a, sizeof(line_a));
+    if (step == pub_file_step_en::OPEN_FAILED) {
         pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
         PUB_LOG(g_amt_handle_log, "open %s fail", AMT_WIFI_ADDRESS_FILE);
         return PUB_ERR_FAIL;
-    case amt_line_step_en::READ_FAILED:
+    }
+    if (step != pub_file_step_en::DONE) {
         pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
         PUB_LOG(g_amt_handle_log, "read fail");
         return PUB_ERR_FAIL;
-    case amt_line_step_en::DONE:
-        break;
     }
     const size_t length = strlen(line_a);
     PUB_LOG(g_amt_handle_log, "wifi_addr_len: %d", static_cast<int>(length));
     line_a[length > 0 ? length - 1 : 0] = '\0';
-    amt_line_copy(buf, AMT_WIFI_ADDRESS_SIZE, line_a);
+    snprintf(buf, AMT_WIFI_ADDRESS_SIZE, "%.*s", static_cast<int>(AMT_WIFI_ADDRESS_SIZE - 1), line_a);
     return PUB_ERR_NONE;
 }
 

@@ -1,17 +1,16 @@
 #include "amt/amt-handle/request/modem-value.h"
 
-#include <errno.h>
 #include <inttypes.h>
 #include <stdio.h>
 #include <string.h>
 
 #include "amt/amt-command.h"
-#include "amt/amt-device/number-scan.h"
 #include "amt/amt-handle/channel/at-exchange.h"
 #include "amt/amt-handle/channel/at-io.h"
 #include "amt/amt-handle/request/request-frame.h"
 #include "amt/amt-packet.h"
 #include "pub/error.h"
+#include "pub/file/scan.h"
 
 namespace {
 
@@ -89,19 +88,18 @@ int answer_text(const text_request_st &request, uint32_t channel, amt_buf_st *rs
 /* Reads the battery driver's number. Returns 0 or -118, errno being the failing call's. */
 int read_temperature(uint32_t *temperature_ptr)
 {
-    FILE *const stream = fopen(TEMPERATURE_FILE, "r");
-    if (stream == nullptr) {
+    const pub_file_st file(TEMPERATURE_FILE, pub_file_mode_en::READ);
+    if (!file.is_open()) {
         pub_log_error(g_amt_handle_log, PUB_ERR_FILE, TEMPERATURE_HANDLER);
         PUB_LOG(g_amt_handle_log, "fopen error: errno=%d", errno);
         return PUB_ERR_FILE;
     }
-    const int count = amt_number_scan_unsigned(stream, temperature_ptr);
-    if (count != 1) {
+    if (pub_file_scan_unsigned(file, temperature_ptr) != 1) {
         pub_log_error(g_amt_handle_log, PUB_ERR_FILE, TEMPERATURE_HANDLER);
         PUB_LOG(g_amt_handle_log, "fscanf error: errno=%d", errno);
+        return PUB_ERR_FILE;
     }
-    fclose(stream);
-    return count == 1 ? PUB_ERR_NONE : PUB_ERR_FILE;
+    return PUB_ERR_NONE;
 }
 
 } // namespace

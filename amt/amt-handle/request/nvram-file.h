@@ -1,6 +1,6 @@
 #pragma once
 
-#include <stdio.h>
+#include "pub/file/file.h"
 
 /*
  * The calibration file of the Wi-Fi chip: the stock text with the stored address of this handset in it.
@@ -18,8 +18,8 @@ constexpr const char *AMT_WIFI_ADDRESS_FILE = "/amt/WIFI/WIFI_nvram.txt";
 int amt_write_wifi_to_nvram_file();
 
 /*
- * The copy alone. address is the stored address with its line feed; empty: none is stored. Lines are those of
- * line-file.h. Both streams stay the caller's. Returns 0, or -100 when the copy was cut after its 100th
- * ordinary line.
+ * The copy alone. address is the stored address with its line feed; empty: none is stored. A line of more
+ * than 98 characters counts as several. Returns 0, or -100 when the copy was cut after its 100th ordinary
+ * line or could not be written.
  */
-int amt_nvram_copy(FILE *source, FILE *destination, const char *address);
+int amt_nvram_copy(const pub_file_st &source, const pub_file_st &destination, const char *address);

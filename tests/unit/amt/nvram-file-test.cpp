@@ -23,11 +23,9 @@ copy_st copy(const std::string &source, const char *address)
 {
     const temp_folder_c folder;
     write_whole_file(folder.path("source"), source);
-    FILE *const in = fopen(folder.path("source").c_str(), "r");
-    FILE *const out = fopen(folder.path("copy").c_str(), "w+");
+    const pub_file_st in(folder.path("source").c_str(), pub_file_mode_en::READ);
+    const pub_file_st out(folder.path("copy").c_str(), pub_file_mode_en::RENEW);
     const int status = amt_nvram_copy(in, out, address);
-    fclose(in);
-    fclose(out);
     return {status, read_whole_file(folder.path("copy"))};
 }
 
