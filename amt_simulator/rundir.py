@@ -1,18 +1,28 @@
-"""The directory of a handset: made under one base, held by its owner, gone with its owner."""
+"""The directory of a handset: made under one base, held by its owner, gone with its owner.
 
+The base lies where every user of the PC may write, and what stands in it gets removed: so nobody
+else may be able to lay anything there.
+"""
+
+import contextlib
 import fcntl
 import os
 import shutil
+import stat
 import subprocess
 import tempfile
+import time
 from pathlib import Path
 
 from amt_simulator.errors import HandsetError
 
 BASE_VARIABLE = "HANDSET_BASE"
+BASE_MODE, EVERYBODY = 0o700, 0o777
 LOCK = "owner"
 KEPT = "kept"
 NEW = ".new-"
+# So long after its making a directory that has no name yet will not get one any more.
+NEW_SECONDS = 3600.0
 
 # Removes the directory when the owner's end of the pipe closes, however the owner ended. The
 # processes of the sandbox die at that same moment, so a first attempt may come too early.
@@ -27,29 +37,48 @@ done
 """
 
 
+def _check_base(base: Path) -> None:
+    """Refuse a base directory in which anybody else could lay or change something."""
+    status = base.lstat()
+    if stat.S_ISLNK(status.st_mode):
+        wrong = "is a symbolic link"
+    elif not stat.S_ISDIR(status.st_mode):
+        wrong = "is no directory"
+    elif status.st_uid != os.getuid():
+        wrong = "belongs to another user"
+    elif status.st_mode & EVERYBODY != BASE_MODE:
+        wrong = f"has the mode {status.st_mode & EVERYBODY:04o}, not {BASE_MODE:04o}"
+    else:
+        return
+    raise HandsetError(f"{base} {wrong}; set {BASE_VARIABLE} to a directory of your own that "
+                       "nobody else may enter (chmod 700)")
+
+
 def base_directory() -> Path:
-    """Where this user's handsets live."""
+    """Where this user's handsets live: a directory that only this user can change."""
     chosen = os.environ.get(BASE_VARIABLE)
     base = Path(chosen) if chosen else Path(tempfile.gettempdir()) / f"vx-handset-{os.getuid()}"
     try:
-        base.mkdir(mode=0o700, parents=True, exist_ok=True)
-        owner = base.stat().st_uid
+        # What is there already, a link too, is looked at, and not where it leads.
+        with contextlib.suppress(FileExistsError):
+            base.mkdir(mode=BASE_MODE, parents=True)
+        _check_base(base)
     except OSError as error:
         raise HandsetError(f"cannot make {base}: {error.strerror}") from None
-    if owner != os.getuid():
-        raise HandsetError(f"{base} belongs to another user; set {BASE_VARIABLE} to a directory "
-                           "of your own")
     return base
 
 
-def _lock(directory: Path) -> int | None:
+def _lock(directory: Path, flags: int = 0) -> int | None:
     """Take the directory's lock; None while its owner lives."""
-    fd = os.open(directory / LOCK, os.O_RDWR | os.O_CREAT | os.O_CLOEXEC, 0o600)
+    fd = os.open(directory / LOCK, os.O_RDWR | os.O_NOFOLLOW | os.O_CLOEXEC | flags, 0o600)
     try:
         fcntl.flock(fd, fcntl.LOCK_EX | fcntl.LOCK_NB)
     except BlockingIOError:
         os.close(fd)
         return None
+    except OSError:
+        os.close(fd)
+        raise
     return fd
 
 
@@ -84,11 +113,22 @@ def remove_tree(directory: Path) -> None:
 def sweep(base: Path) -> None:
     """Remove what owners left behind that did not even have the time to be cleaned up after."""
     for directory in base.iterdir():
-        if directory.name.startswith(NEW) or not (directory / LOCK).exists() or (
-                directory / KEPT).exists():
+        if directory.is_symlink():
             continue
-        if not has_owner(directory):
+        if directory.name.startswith(NEW):
+            is_left = _age(directory) > NEW_SECONDS
+        else:
+            is_left = (directory / LOCK).exists() and not (directory / KEPT).exists()
+        if is_left and not has_owner(directory):
             remove_tree(directory)
+
+
+def _age(directory: Path) -> float:
+    """The seconds since something was made in DIRECTORY, none when it has gone."""
+    try:
+        return time.time() - directory.stat().st_mtime
+    except OSError:
+        return 0.0
 
 
 class RunDirectory:
@@ -97,14 +137,23 @@ class RunDirectory:
     def __init__(self) -> None:
         base = base_directory()
         sweep(base)
-        made = Path(tempfile.mkdtemp(prefix=f"{NEW}{os.getpid()}-", dir=base))
-        lock = _lock(made)
+        self.path = Path(tempfile.mkdtemp(prefix=f"{NEW}{os.getpid()}-", dir=base))
+        self._lock = -1
+        self._keeper: subprocess.Popen[bytes] | None = None
+        try:
+            self._hold()
+        except BaseException:
+            self.close()
+            raise
+
+    def _hold(self) -> None:
+        """Take the directory's lock, give it the name under which it is found, and watch it."""
+        lock = _lock(self.path, os.O_CREAT)
         if lock is None:
-            raise HandsetError(f"cannot lock {made}")
+            raise HandsetError(f"cannot lock {self.path}")
         self._lock = lock
         # Only now, with the lock held, it gets a name that a sweep looks at.
-        self.path = made.with_name(made.name.removeprefix(NEW))
-        made.rename(self.path)
+        self.path = self.path.rename(self.path.with_name(self.path.name.removeprefix(NEW)))
         self._keeper = subprocess.Popen(
             ["/bin/sh", "-c", KEEPER, "handset-keeper", str(self.path)], stdin=subprocess.PIPE,
             stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL, start_new_session=True,
@@ -112,12 +161,17 @@ class RunDirectory:
 
     def close(self, keep: bool = False) -> None:
         """Give the directory up; KEEP leaves it to whoever wants to look into it."""
-        assert self._keeper.stdin is not None
-        if keep:
-            (self.path / KEPT).touch()
-            self._keeper.stdin.write(b"keep\n")
-        else:
-            remove_tree(self.path)
-        self._keeper.stdin.close()
-        self._keeper.wait()
-        os.close(self._lock)
+        try:
+            if keep:
+                (self.path / KEPT).touch()
+            else:
+                remove_tree(self.path)
+        finally:
+            if self._keeper is not None and self._keeper.stdin is not None:
+                if keep:
+                    self._keeper.stdin.write(b"keep\n")
+                self._keeper.stdin.close()
+                self._keeper.wait()
+            if self._lock >= 0:
+                os.close(self._lock)
+                self._lock = -1

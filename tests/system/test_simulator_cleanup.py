@@ -11,8 +11,8 @@ from typing import Callable, Iterator
 
 import pytest
 
-from amt_simulator import Handset
-from amt_simulator.rundir import BASE_VARIABLE, RunDirectory, remove_tree, sweep
+from amt_simulator import Handset, HandsetError
+from amt_simulator.rundir import BASE_VARIABLE, RunDirectory, base_directory, remove_tree, sweep
 
 PROJECT = Path(__file__).resolve().parents[2]
 FAKE_DAEMON = Path(__file__).with_name("support") / "fake_daemon.py"
@@ -138,7 +138,7 @@ def test_a_directory_can_be_kept(base: Path) -> None:
 
 def test_left_directories_are_swept(base: Path) -> None:
     """What a power cut of the PC left is removed by the next start; what is in use is not."""
-    base.mkdir()
+    base.mkdir(mode=0o700)
     stale = base / "1-stale"
     stale.mkdir()
     (stale / "owner").touch()
@@ -153,3 +153,88 @@ def test_left_directories_are_swept(base: Path) -> None:
         used.close()
         other.close()
     assert not used.path.exists()
+
+
+def test_the_usual_base_is_made_for_one_user(tmp_path: Path,
+                                             monkeypatch: pytest.MonkeyPatch) -> None:
+    """Below the temporary directory, named after the user, and closed to all others."""
+    monkeypatch.delenv(BASE_VARIABLE, raising=False)
+    monkeypatch.setattr("tempfile.tempdir", str(tmp_path))
+    made = base_directory()
+    assert made == tmp_path / f"vx-handset-{os.getuid()}"
+    assert made.stat().st_mode & 0o777 == 0o700
+    assert base_directory() == made
+
+
+def test_a_link_in_place_of_the_base_is_refused(tmp_path: Path,
+                                                monkeypatch: pytest.MonkeyPatch) -> None:
+    """Whoever laid it there cannot make the sweep remove directories of the victim."""
+    victim = tmp_path / "home"
+    precious = victim / "precious"
+    precious.mkdir(parents=True)
+    (precious / "owner").touch()
+    monkeypatch.delenv(BASE_VARIABLE, raising=False)
+    monkeypatch.setattr("tempfile.tempdir", str(tmp_path))
+    (tmp_path / f"vx-handset-{os.getuid()}").symlink_to(victim)
+    with pytest.raises(HandsetError, match="is a symbolic link; set HANDSET_BASE"):
+        Handset(build=None, daemon=FAKE_DAEMON).up()
+    assert (precious / "owner").exists()
+
+
+@pytest.mark.parametrize("mode", [0o755, 0o770, 0o707, 0o500])
+def test_a_base_of_another_mode_is_refused(base: Path, mode: int) -> None:
+    """Nobody else may look into it or lay something there."""
+    base.mkdir()
+    base.chmod(mode)
+    with pytest.raises(HandsetError, match=f"has the mode {mode:04o}, not 0700"):
+        RunDirectory()
+
+
+def test_a_base_of_another_user_is_refused(base: Path, monkeypatch: pytest.MonkeyPatch) -> None:
+    """Whoever made it could change it."""
+    base.mkdir(mode=0o700)
+    monkeypatch.setattr("os.getuid", lambda: base.stat().st_uid + 1)
+    with pytest.raises(HandsetError, match="belongs to another user"):
+        RunDirectory()
+
+
+def test_a_base_that_is_no_directory_is_refused(base: Path) -> None:
+    """A file there is told, and left alone."""
+    base.write_text("mine")
+    with pytest.raises(HandsetError, match="is no directory"):
+        RunDirectory()
+    assert base.read_text() == "mine"
+
+
+def test_a_sweep_looks_at_directories_of_the_base_only(base: Path, tmp_path: Path) -> None:
+    """A link in the base is nothing that a handset left."""
+    base.mkdir(mode=0o700)
+    precious = tmp_path / "precious"
+    precious.mkdir()
+    (precious / "owner").touch()
+    (base / "1-link").symlink_to(precious)
+    sweep(base)
+    assert (precious / "owner").exists() and (base / "1-link").is_symlink()
+
+
+def test_a_directory_that_never_got_its_name_is_swept(base: Path) -> None:
+    """An hour later nobody is making it any more; a fresh one may be in the making."""
+    base.mkdir(mode=0o700)
+    old, fresh = base / ".new-1-old", base / ".new-1-fresh"
+    old.mkdir()
+    fresh.mkdir()
+    os.utime(old, (time.time() - 7200,) * 2)
+    sweep(base)
+    assert not old.exists() and fresh.exists()
+
+
+def test_a_directory_that_cannot_be_held_is_removed(base: Path,
+                                                    monkeypatch: pytest.MonkeyPatch) -> None:
+    """Whatever fails behind its making."""
+    def refuse(*_arguments: object, **_others: object) -> None:
+        raise BlockingIOError("no more processes")
+
+    monkeypatch.setattr("amt_simulator.rundir.subprocess.Popen", refuse)
+    with pytest.raises(BlockingIOError):
+        RunDirectory()
+    assert list(base.iterdir()) == []
