@@ -98,11 +98,14 @@ class Handset(HandsetControl):
         PATH names the kind of start whose lines these are, when it is not the handset's own.
         """
         kind = KINDS[path] if path else self.kind
+        reader = self.log.reader()
+        logged: set[tuple[int, str]] = set()
 
         def attempt() -> bool:
-            pid = self.pid
-            texts = [record.text for record in self.log.records() if record.pid == pid]
-            return all(any(text in line for line in texts) for text in kind.ready)
+            logged.update((record.pid, text) for record in reader.more() for text in kind.ready
+                          if text in record.text)
+            # Another daemon that runs now is not yet there because the last one was.
+            return bool(logged) and {(self.pid, text) for text in kind.ready} <= logged
 
         wait_until(attempt, f"the daemon to serve ({kind.ready})", timeout, self.story)
         if kind.name == "packet":

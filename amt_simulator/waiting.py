@@ -8,7 +8,8 @@ from amt_simulator.errors import HandsetTimeout
 
 DEFAULT_SECONDS = 10.0
 SCALE_VARIABLE = "HANDSET_TIME_SCALE"
-STEP_SECONDS = 0.002
+# The pause between two looks grows with the wait, so that a long one costs the processor little.
+SHORTEST_STEP, LONGEST_STEP, STEP_SHARE = 0.001, 0.02, 0.05
 
 Found = TypeVar("Found")
 
@@ -26,14 +27,16 @@ def deadline(seconds: float | None) -> float:
 def wait_until(attempt: Callable[[], Found | None], what: str, timeout: float | None = None,
                explain: Callable[[], str] | None = None) -> Found:
     """Repeat ATTEMPT until it gives something true; raise with WHAT and EXPLAIN's text if late."""
+    begin = time.monotonic()
     end = deadline(timeout)
     while True:
         # The clock is read first: what happened before the deadline counts.
-        late = time.monotonic() >= end
+        now = time.monotonic()
+        late = now >= end
         found = attempt()
         if found:
             return found
         if late:
             raise HandsetTimeout(f"waited in vain for {what}" +
                                  (f"\n{explain()}" if explain else ""))
-        time.sleep(STEP_SECONDS)
+        time.sleep(min(LONGEST_STEP, max(SHORTEST_STEP, (now - begin) * STEP_SHARE)))
