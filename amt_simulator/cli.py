@@ -15,7 +15,7 @@ from amt_simulator.handset import Handset
 from amt_simulator.kinds import KINDS
 from amt_simulator.options import MODEM_MODES
 from amt_simulator.parse import CardSize, Pair, Screen, file_contents, pairs, unescaped
-from amt_simulator.root import ROOT
+from amt_simulator.tree import ROOT
 from amt_simulator.running import Announcement, NoHandset, find
 
 FAILED, NO_HANDSET = 1, 3

@@ -9,7 +9,7 @@ from typing import Callable
 
 import click
 
-from amt_simulator import root
+from amt_simulator import tree
 from amt_simulator.control import HandsetControl
 from amt_simulator.errors import HandsetError
 from amt_simulator.parse import CardSize, unescaped
@@ -95,13 +95,14 @@ def calls(handset: HandsetControl) -> None:
 def files(handset: HandsetControl, directories: tuple[str, ...]) -> None:
     """List files of the handset with their sizes (by default: those that tests read)."""
     for inside in directories or SHOWN:
-        place = handset.path(inside)
-        if directories and not place.exists():
-            raise HandsetError(f"{inside} is not there")
-        for path in sorted([place] if place.is_file() else place.rglob("*")):
-            if path.is_file() and not path.is_symlink():
-                name = os.path.join(inside, path.relative_to(place)) if path != place else inside
-                click.echo(f"{path.stat().st_size:8} {name}")
+        try:
+            found = tree.sizes(handset.directory, inside)
+        except (FileNotFoundError, NotADirectoryError):
+            if directories:
+                raise HandsetError(f"{inside} is not there") from None
+            continue
+        for name, size in sorted(found.items()):
+            click.echo(f"{size:8} {name}")
 
 
 @click.command("show")
@@ -224,7 +225,7 @@ def status(handset: HandsetControl, as_json: bool) -> None:
     announced = Announcement.read(handset.directory)
     facts: dict[str, object] = {
         "path": announced.path, "build": announced.build, **announced.ports,
-        "log": str(handset.log.path), "files": str(handset.directory / root.ROOT),
+        "log": str(handset.log.path), "files": str(handset.directory / tree.ROOT),
         "directory": str(handset.directory), "usb": handset.text(SHORT_NAMES["usb"]).strip(),
         "daemon_pid": handset.pid, "daemon_exits": handset.exits(),
     }

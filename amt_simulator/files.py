@@ -2,9 +2,9 @@
 
 from pathlib import Path
 
-from amt_simulator import root
+from amt_simulator import root, tree
 from amt_simulator.log import Log
-from amt_simulator.root import Content
+from amt_simulator.tree import Content
 from amt_simulator.waiting import wait_until
 
 
@@ -17,15 +17,15 @@ class HandsetFiles:
     def attach(self, directory: Path) -> None:
         """Look at the handset in DIRECTORY."""
         self.directory = directory
-        self.log = Log(directory / root.STATE / "log.txt")
+        self.log = Log(directory / tree.STATE / "log.txt")
 
     def path(self, inside: str) -> Path:
-        """Where on the PC the handset's file INSIDE lies."""
-        return root.host_path(self.directory, inside)
+        """Where on the PC the handset's file INSIDE lies; a link there is not followed."""
+        return tree.host_path(self.directory, inside)
 
     def read(self, inside: str) -> bytes:
         """The content of a file of the handset."""
-        return self.path(inside).read_bytes()
+        return tree.read(self.directory, inside)
 
     def text(self, inside: str) -> str:
         """The content of a file of the handset as text."""
@@ -33,17 +33,16 @@ class HandsetFiles:
 
     def place(self, inside: str, content: Content) -> None:
         """Place a file while the handset is up; None takes it away."""
-        root.place(self.directory, inside, content)
+        tree.place(self.directory, inside, content)
 
     def wait_file(self, inside: str, content: "bytes | str | None" = None,
                   timeout: float | None = None) -> bytes:
         """Wait until a file exists and, when given, has this content; returns the content."""
         wanted = content.encode() if isinstance(content, str) else content
-        path = self.path(inside)
 
         def attempt() -> tuple[bytes] | None:
             try:
-                data = path.read_bytes()
+                data = self.read(inside)
             except OSError:
                 return None
             return (data,) if wanted is None or data == wanted else None
@@ -80,6 +79,5 @@ class HandsetFiles:
 
     def sanitizer_reports(self) -> dict[str, str]:
         """What a sanitizer has reported, by file."""
-        directory = self.path("/handset")
-        return {path.name: path.read_text("utf-8", "replace")
-                for path in sorted(directory.glob("sanitizer.*"))}
+        names = sorted(path.name for path in self.path("/handset").glob("sanitizer.*"))
+        return {name: self.read(f"/handset/{name}").decode("utf-8", "replace") for name in names}

@@ -10,7 +10,7 @@ from amt_simulator import root
 from amt_simulator.android import service_entry
 from amt_simulator.errors import HandsetError
 from amt_simulator.kinds import AUDIO_KEY, KINDS, LINE_KEYS, Kind, config_text, settings
-from amt_simulator.root import Content
+from amt_simulator.tree import Content, place
 
 MODEM_MODES = ("table", "silent", "held", "absent")
 # The pause that init makes before it starts the daemon again.
@@ -118,19 +118,19 @@ def furnish(directory: Path, options: Options, program: programs.Program) -> Non
     root.build_root(directory)
     root.build_devices(directory, *options.screen)
     programs.install(directory, program)
-    root.place(directory, kind.config, config_text(options.config))
-    root.place(directory, kind.program, ("", 0o755))
+    place(directory, kind.config, config_text(options.config))
+    place(directory, kind.program, ("", 0o755))
     audio = settings(options.config).get(AUDIO_KEY, "")
     if audio.startswith("/system/"):
-        root.place(directory, audio, root.SILENCE)
-    root.place(directory, "/sys/class/android_usb/android0/state",
+        place(directory, audio, root.SILENCE)
+    place(directory, "/sys/class/android_usb/android0/state",
                (options.usb_state or kind.usb_state) + "\n")
     for properties in (root.PROPERTIES, kind.properties, options.properties):
         root.write_properties(directory, properties)
     root.write_answers(directory, options.answers)
     for name in RECORDS:
-        root.place(directory, f"/handset/{name}", b"")
+        place(directory, f"/handset/{name}", b"")
     for inside, content in options.files.items():
-        root.place(directory, inside, content)
-    root.place(directory, "/handset/init.json",
+        place(directory, inside, content)
+    place(directory, "/handset/init.json",
                json.dumps(_orders(options, program), indent=1))

@@ -6,7 +6,7 @@ from dataclasses import dataclass
 from pathlib import Path
 
 from amt_simulator.errors import HandsetError
-from amt_simulator.root import ROOT
+from amt_simulator.tree import ROOT
 
 PROJECT = Path(__file__).resolve().parent.parent
 DAEMON = "vx-kel-amt"

@@ -1,14 +1,11 @@
 """The handset's root file system: what lies where when it comes up."""
 
 import os
-import shutil
 from pathlib import Path
-from typing import Mapping, Sequence, Union
+from typing import Mapping, Sequence
 
 from amt_simulator.errors import HandsetError
-
-# A file to place: its content, content and mode, a file of the PC to copy, or None for no file.
-Content = Union[str, bytes, Path, tuple[Union[str, bytes], int], None]
+from amt_simulator.tree import PROC_DRIVER, ROOT, STATE, host_path, place
 
 DIRECTORIES = (
     "amt", "data/etc", "data/local", "data/misc/wifi", "data/orla/current", "dev", "etc",
@@ -60,43 +57,6 @@ DEVICE_FILES = {
     "/dev/video0": "/handset/devices/video0",
 }
 SCREEN_BYTES_A_PIXEL = 4
-
-# Seen by the daemon at places that are no plain part of the root.
-PROC_DRIVER = "proc-driver"
-STATE = "state"
-ROOT = "root"
-
-
-def host_path(directory: Path, inside: str) -> Path:
-    """Where on the PC the handset's file INSIDE lies."""
-    if not inside.startswith("/"):
-        raise HandsetError(f"{inside}: a path in the handset begins with /")
-    clean = os.path.normpath(inside)
-    for prefix, place in (("/handset", STATE), ("/proc/driver", PROC_DRIVER)):
-        if clean == prefix or clean.startswith(prefix + "/"):
-            return directory / place / clean[len(prefix):].lstrip("/")
-    for prefix in ("/proc", "/dev", "/usr", "/storage/sdcard1"):
-        if clean == prefix or clean.startswith(prefix + "/"):
-            raise HandsetError(f"{inside} exists only inside the handset: use its commands")
-    return directory / ROOT / clean.lstrip("/")
-
-
-def place(directory: Path, inside: str, content: Content) -> None:
-    """Put a file into the handset, in place of whatever stands there."""
-    target = host_path(directory, inside)
-    if target.is_dir() and not target.is_symlink():
-        shutil.rmtree(target)
-    elif os.path.lexists(target):
-        target.unlink()
-    if content is None:
-        return
-    target.parent.mkdir(parents=True, exist_ok=True)
-    if isinstance(content, Path):
-        shutil.copy(content, target)
-        return
-    data, mode = content if isinstance(content, tuple) else (content, 0o644)
-    target.write_bytes(data.encode("utf-8", "surrogateescape") if isinstance(data, str) else data)
-    target.chmod(mode)
 
 
 def build_root(directory: Path) -> None:

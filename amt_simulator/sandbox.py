@@ -13,7 +13,8 @@ from typing import Mapping
 from amt_simulator.client import socket_address
 from amt_simulator.errors import HandsetError
 from amt_simulator.program import DAEMON_COPY, INSIDE, MODULE_DIRECTORY
-from amt_simulator.root import DEVICE_FILES, PROC_DRIVER, ROOT, STATE
+from amt_simulator.root import DEVICE_FILES
+from amt_simulator.tree import PROC_DRIVER, ROOT, STATE
 from amt_simulator.waiting import scaled
 
 PYTHON = "/usr/bin/python3"
