@@ -15,6 +15,7 @@
 namespace {
 
 constexpr char CONTROL_HANDLER[] = "amt_gps_control";
+constexpr char READ_HANDLER[] = "amt_gps_read_result";
 
 constexpr int32_t OPERATION_STOP = 0;
 constexpr int32_t OPERATION_CHECK = 2;
@@ -24,21 +25,22 @@ constexpr int32_t GPS_STOP = 0;
 constexpr int32_t GPS_START = 1;
 constexpr int32_t GPS_READ_SIGNAL = 2;
 
-constexpr amt_radio_step_st CHECK_STEP = {&g_amt_gps_log, "GPS connectivity check", "ldt_gpsCheck"};
-constexpr amt_radio_step_st STOP_STEP = {&g_amt_gps_log, "GPS stop", "ldt_gpsCtrl"};
-constexpr amt_radio_step_st START_STEP = {&g_amt_gps_log, "GPS-start", "ldt_gpsCtrl"};
-constexpr amt_radio_step_st READ_STEP = {&g_amt_gps_log, "GPS-READ-SIGNAL", "ldt_gpsCtrl"};
+constexpr amt_radio_step_st CHECK_STEP = {&g_amt_gps_log, CONTROL_HANDLER, "GPS connectivity check",
+                                          "ldt_gpsCheck"};
+constexpr amt_radio_step_st STOP_STEP = {&g_amt_gps_log, CONTROL_HANDLER, "GPS stop", "ldt_gpsCtrl"};
+constexpr amt_radio_step_st START_STEP = {&g_amt_gps_log, CONTROL_HANDLER, "GPS-start", "ldt_gpsCtrl"};
+constexpr amt_radio_step_st READ_STEP = {&g_amt_gps_log, READ_HANDLER, "GPS-READ-SIGNAL", "ldt_gpsCtrl"};
 
 int check_connectivity()
 {
     amt_radio_step_start(CHECK_STEP);
-    return AMT_RADIO_STEP_END(CONTROL_HANDLER, CHECK_STEP, ldt_gpsCheck());
+    return amt_radio_step_end(CHECK_STEP, ldt_gpsCheck());
 }
 
 int switch_gps(const amt_radio_step_st &step, int32_t gps_operation)
 {
     amt_radio_step_start(step);
-    return AMT_RADIO_STEP_END(CONTROL_HANDLER, step, ldt_gpsCtrl(gps_operation, 0, nullptr, nullptr));
+    return amt_radio_step_end(step, ldt_gpsCtrl(gps_operation, 0, nullptr, nullptr));
 }
 
 /* An unknown operation starts the GPS, on purpose. */
@@ -90,7 +92,7 @@ int amt_gps_read_result(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_p
     int32_t cnr = 0;
     const int32_t answered = ldt_gpsCtrl(GPS_READ_SIGNAL, index, &svid, &cnr);
     PUB_LOG(g_amt_gps_log, "GPS-READ-SIGNAL end. return:%d; svid:%d; cnr:%d.", answered, svid, cnr);
-    if (AMT_RADIO_STEP_CHECK(__func__, READ_STEP, answered) != PUB_ERR_NONE) {
+    if (amt_radio_step_check(READ_STEP, answered) != PUB_ERR_NONE) {
         return PUB_ERR_FAIL;
     }
     amt_reply_start(rsp_ptr, AMT_GPS_READ_RESULT_RSPCMD);

@@ -32,11 +32,11 @@ int check_player()
 {
     int result = PUB_ERR_NONE;
     if (access(PLAYER_PATH, F_OK) != 0) {
-        result = AMT_DEVICE_FAIL(AUDIO_HANDLER, PUB_ERR_FILE, "access(\"" PLAYER_PATH "\") fail: %d - %s",
+        result = amt_device_fail({AUDIO_HANDLER}, PUB_ERR_FILE, "access(\"" PLAYER_PATH "\") fail: %d - %s",
                                  errno, strerror(errno));
     }
     if (access(g_amt_cfg.m_audio_file_a, F_OK) != 0) {
-        result = AMT_DEVICE_FAIL(AUDIO_HANDLER, PUB_ERR_FILE, "access(\"%s\") fail: %d - %s",
+        result = amt_device_fail({AUDIO_HANDLER}, PUB_ERR_FILE, "access(\"%s\") fail: %d - %s",
                                  g_amt_cfg.m_audio_file_a, errno, strerror(errno));
     }
     return result;
@@ -54,7 +54,7 @@ int start_player()
              static_cast<long>(g_amt_cfg.m_audio_frame_count), g_amt_cfg.m_audio_file_a);
     errno = 0;
     if (system(command_a) != 0) {
-        return AMT_DEVICE_FAIL(AUDIO_HANDLER, PUB_ERR_FILE, "system(%s) fail: %d - %s", command_a, errno,
+        return amt_device_fail({AUDIO_HANDLER}, PUB_ERR_FILE, "system(%s) fail: %d - %s", command_a, errno,
                                strerror(errno));
     }
     return PUB_ERR_NONE;
@@ -100,7 +100,7 @@ int amt_device_audio_loop(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp
     const int32_t enable = amt_packet_get_bool(req_ptr->m_buf_a, AMT_ATOM_SWITCH) == 1 ? 1 : 0;
     const int32_t type = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_LOOP_TYPE);
     amt_hal_entry_st entry = {};
-    if (AMT_HAL_LOAD(AUDIO_LOOP_HAL_LIBRARY, AUDIO_LOOP_HAL_CODEC_LOOP_TEST, &entry) != PUB_ERR_NONE) {
+    if (amt_hal_load(AUDIO_LOOP_HAL_LIBRARY, AUDIO_LOOP_HAL_CODEC_LOOP_TEST, &entry) != PUB_ERR_NONE) {
         return PUB_ERR_FILE;
     }
     PUB_LOG(g_amt_device_log, "will call codec_loop_test. enable:%d; type:%d.", enable, type);

@@ -41,12 +41,12 @@ int amt_device_lcd_brightness(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st 
         return PUB_ERR_PARAM;
     }
     if (src_lcd_brightness < 0) {
-        AMT_DEVICE_READ_INT(LCD_FILE, &src_lcd_brightness);
+        amt_device_file_read_int(LCD_FILE, &src_lcd_brightness);
     }
     const int32_t requested = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_LCD_LEVEL);
     PUB_LOG(g_amt_device_log, "amt_device_lcd_brightness lcd_brightness: %d", requested);
     PUB_LOG(g_amt_device_log, "amt_device_lcd_brightness src_lcd_brightness: %d", src_lcd_brightness);
-    if (AMT_DEVICE_WRITE_INT(LCD_FILE, level_to_write(requested)) == PUB_ERR_NONE) {
+    if (amt_device_file_write_int(LCD_FILE, level_to_write(requested)) == PUB_ERR_NONE) {
         amt_handle_send_rsp_ok(channel, rsp_ptr, AMT_LCDLIGHT_RSPCMD);
     }
     return PUB_ERR_NONE;
@@ -59,7 +59,7 @@ int amt_device_button_backlight(uint32_t channel, amt_buf_st *req_ptr, amt_buf_s
         return PUB_ERR_PARAM;
     }
     const int32_t flag = amt_packet_get_bool(req_ptr->m_buf_a, AMT_ATOM_SWITCH);
-    if (AMT_DEVICE_WRITE_INT(BUTTON_FILE, flag) != PUB_ERR_NONE) {
+    if (amt_device_file_write_int(BUTTON_FILE, flag) != PUB_ERR_NONE) {
         return PUB_ERR_FILE;
     }
     PUB_LOG(g_amt_device_log, "%s button backlight", flag == 1 ? "open" : "close");

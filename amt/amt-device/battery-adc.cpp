@@ -5,6 +5,7 @@
 #include "amt/amt-device/command.h"
 #include "amt/amt-device/device-fail.h"
 #include "amt/amt-handle/request/factory-file.h"
+#include "amt/amt-log.h"
 #include "pub/error.h"
 #include "pub/file/scan.h"
 #include "pub/util/thread-end.h"
@@ -23,7 +24,7 @@ constexpr uint32_t CALIBRATION_SIZE = 80;
 int amt_read_adc(uint32_t *value_ptr)
 {
     if (value_ptr == nullptr) {
-        return AMT_DEVICE_FAIL(__func__, PUB_ERR_FAIL, "Null pointer.");
+        return amt_device_fail({}, PUB_ERR_FAIL, "Null pointer.");
     }
     if (amt_device_do_command(MEASURE_COMMAND) != PUB_ERR_NONE) {
         /* On purpose: a driver that cannot measure gives a value of 0, not an error. */
@@ -32,13 +33,13 @@ int amt_read_adc(uint32_t *value_ptr)
     pub_util_sleep_ms(MEASURE_MS);
     const pub_file_st file(AMT_BATTERY_DRIVER_FILE, pub_file_mode_en::READ);
     if (!file.is_open()) {
-        return AMT_DEVICE_FAIL_CALL(__func__, "fopen");
+        return amt_device_fail_call({}, "fopen");
     }
     const bool is_read = pub_file_scan_unsigned(file, value_ptr) == 1;
     if (is_read) {
         PUB_LOG(g_amt_device_log, "ADC value: %u", *value_ptr);
     } else {
-        AMT_DEVICE_FAIL_CALL(__func__, "fscanf");
+        amt_device_fail_call({}, "fscanf");
     }
     return is_read ? PUB_ERR_NONE : PUB_ERR_FAIL;
 }
@@ -49,9 +50,9 @@ int amt_write_adc_diff_value(int32_t a, int32_t b, int32_t c, int32_t d)
     snprintf(text_a, sizeof(text_a), "amt_set_vbatt[%d] [%d] [%d] [%d]", a, b, c, d);
     const amt_factory_step_en step = amt_factory_file_put(CALIBRATION_FILE, text_a);
     if (step == amt_factory_step_en::OPEN_FAILED) {
-        return AMT_DEVICE_FAIL_CALL(__func__, "fopen");
+        return amt_device_fail_call({}, "fopen");
     }
     PUB_LOG(g_amt_device_log, "SAVA ADC value: %d %d %d %d", a, b, c, d);
     amt_factory_file_sync();
-    return step == amt_factory_step_en::DONE ? PUB_ERR_NONE : AMT_DEVICE_FAIL_CALL(__func__, "fprintf");
+    return step == amt_factory_step_en::DONE ? PUB_ERR_NONE : amt_device_fail_call({}, "fprintf");
 }

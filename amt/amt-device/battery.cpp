@@ -72,7 +72,7 @@ int build_check_rsp(const amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
     if (command_id == AMT_CALIBRATE_ADC_CMD) {
         return build_calibration_rsp(req_ptr, rsp_ptr);
     }
-    return AMT_DEVICE_FAIL(CHECK_HANDLER, PUB_ERR_FAIL, "Invalid command id[%d]", command_id);
+    return amt_device_fail({CHECK_HANDLER}, PUB_ERR_FAIL, "Invalid command id[%d]", command_id);
 }
 
 } // namespace
@@ -84,7 +84,7 @@ int amt_device_battery_voltage(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st
         return PUB_ERR_PARAM;
     }
     int32_t voltage = 0;
-    if (AMT_DEVICE_READ_INT(VOLTAGE_FILE, &voltage) != PUB_ERR_NONE) {
+    if (amt_device_file_read_int(VOLTAGE_FILE, &voltage) != PUB_ERR_NONE) {
         return PUB_ERR_FILE;
     }
     PUB_LOG(g_amt_device_log, "battery_voltage: %d", voltage);

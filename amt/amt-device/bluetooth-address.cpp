@@ -32,11 +32,11 @@ constexpr int32_t OPERATION_CHECK = 3;
 constexpr uint32_t ADDRESS_SIZE = 60;
 #define ADDRESS_WORD_FORMAT "%59s"
 
-constexpr amt_radio_step_st CHECK_STEP = {&g_amt_device_log, "BT hardware check", "ldt_btCheck"};
+constexpr amt_radio_step_st CHECK_STEP = {&g_amt_device_log, HANDLER, "BT hardware check", "ldt_btCheck"};
 
-int fail_open()
+int fail_open(const amt_device_place_st &place = {HANDLER})
 {
-    return AMT_DEVICE_FAIL(HANDLER, PUB_ERR_FILE, "open(\"%s\") fail: %d - %s", ADDRESS_FILE, errno,
+    return amt_device_fail(place, PUB_ERR_FILE, "open(\"%s\") fail: %d - %s", ADDRESS_FILE, errno,
                            strerror(errno));
 }
 
@@ -54,7 +54,7 @@ int read_address(amt_buf_st *rsp_ptr)
     const int count = fscanf(stream, ADDRESS_WORD_FORMAT, address_a);
     fclose(stream);
     if (count != 1) {
-        return AMT_DEVICE_FAIL(HANDLER, PUB_ERR_FAIL, "read not completed");
+        return amt_device_fail({HANDLER}, PUB_ERR_FAIL, "read not completed");
     }
     PUB_LOG(g_amt_device_log, "read BT address: %s", address_a);
     amt_packet_add_string(rsp_ptr->m_buf_a, AMT_ATOM_BT_ADDRESS, address_a);
@@ -65,10 +65,10 @@ int read_address(amt_buf_st *rsp_ptr)
 int finish_write(amt_factory_step_en step, bool is_address, const char *address)
 {
     if (!is_address) {
-        return AMT_DEVICE_FAIL(HANDLER, PUB_ERR_PARAM, "unknown BT address");
+        return amt_device_fail({HANDLER}, PUB_ERR_PARAM, "unknown BT address");
     }
     if (step != amt_factory_step_en::DONE) {
-        return AMT_DEVICE_FAIL(HANDLER, PUB_ERR_FILE, "fputs() fail");
+        return amt_device_fail({HANDLER}, PUB_ERR_FILE, "fputs() fail");
     }
     PUB_LOG(g_amt_device_log, "write BT address: %s", address);
     amt_device_run(PROTECT_COMMAND);
@@ -96,7 +96,7 @@ int check_hardware()
 {
     amt_radio_step_start(CHECK_STEP);
     const int32_t result = ldt_btCheck();
-    return AMT_RADIO_STEP_END(HANDLER, CHECK_STEP, result);
+    return amt_radio_step_end(CHECK_STEP, result);
 }
 
 int operate(int32_t operation, const amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
@@ -109,7 +109,7 @@ int operate(int32_t operation, const amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
     case OPERATION_CHECK:
         return check_hardware();
     default:
-        return AMT_DEVICE_FAIL(HANDLER, PUB_ERR_PARAM, "unknown operation: %d", operation);
+        return amt_device_fail({HANDLER}, PUB_ERR_PARAM, "unknown operation: %d", operation);
     }
 }
 

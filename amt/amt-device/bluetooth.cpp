@@ -14,7 +14,7 @@ namespace {
 
 constexpr char HANDLER[] = "amt_device_bt";
 constexpr char START_FAILED_TEXT[] = "error to exec: hciattach";
-constexpr amt_radio_step_st START_STEP = {&g_amt_device_log, "BT-start", "ldt_btCtrl"};
+constexpr amt_radio_step_st START_STEP = {&g_amt_device_log, HANDLER, "BT-start", "ldt_btCtrl"};
 
 /*
  * The child's share. It shares with the service, through its descriptors, the very same open lines: what it
@@ -27,8 +27,8 @@ int switch_on_in_child(uint32_t channel, amt_buf_st *rsp_ptr)
 {
     amt_radio_step_start(START_STEP);
     const int32_t result = ldt_btCtrl(1);
-    if (AMT_RADIO_STEP_END(HANDLER, START_STEP, result) != PUB_ERR_NONE) {
-        return AMT_DEVICE_FAIL(HANDLER, PUB_ERR_FILE, START_FAILED_TEXT);
+    if (amt_radio_step_end(START_STEP, result) != PUB_ERR_NONE) {
+        return amt_device_fail({HANDLER}, PUB_ERR_FILE, START_FAILED_TEXT);
     }
     return amt_handle_send_rsp_ok(channel, rsp_ptr, AMT_BLUETOOTH_RSPCMD);
 }
@@ -44,7 +44,7 @@ int amt_device_bt(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
     const pid_t service_pid = getpid();
     const pid_t child_pid = fork();
     if (child_pid < 0) {
-        return AMT_DEVICE_FAIL(HANDLER, PUB_ERR_FILE, START_FAILED_TEXT);
+        return amt_device_fail({HANDLER}, PUB_ERR_FILE, START_FAILED_TEXT);
     }
     if (child_pid == 0) {
         amt_child_die_with(service_pid);

@@ -45,7 +45,7 @@ int select_preview(int32_t camera)
     int32_t value = camera;
     int result = PUB_ERR_NONE;
     if (ioctl(fd, SARVOCAM_IOCTL_PREVIEW, &value) < 0) {
-        result = AMT_DEVICE_FAIL_CALL(PREVIEW_HANDLER, "ioctl");
+        result = amt_device_fail_call({PREVIEW_HANDLER}, "ioctl");
     }
     close(fd);
     return result;
@@ -57,7 +57,7 @@ int run_test(int fd, int32_t control_id, int32_t *verdict_ptr)
     int32_t value = TEST_INPUT;
     if (ioctl(fd, VIDIOC_S_INPUT, &value) < 0) {
         if (errno != ENODEV) {
-            return AMT_DEVICE_FAIL_CALL(CONTROL_HANDLER, "ioctl");
+            return amt_device_fail_call({CONTROL_HANDLER}, "ioctl");
         }
         /* A camera without this input is a finished test. */
         *verdict_ptr = RESULT_NO_INPUT;
@@ -67,7 +67,7 @@ int run_test(int fd, int32_t control_id, int32_t *verdict_ptr)
     value = control_id == CONTROL_FIRST ? 0 : 1;
     const int verdict = ioctl(fd, SARVOCAM_IOCTL_SELF_TEST, &value);
     if (verdict < 0) {
-        return AMT_DEVICE_FAIL_CALL(CONTROL_HANDLER, "ioctl");
+        return amt_device_fail_call({CONTROL_HANDLER}, "ioctl");
     }
     *verdict_ptr = verdict;
     PUB_LOG(g_amt_device_log, "update result: %d", verdict);
@@ -78,7 +78,7 @@ int test_camera(int32_t control_id, int32_t *verdict_ptr)
 {
     const int fd = open_camera();
     if (fd < 0) {
-        return AMT_DEVICE_FAIL_CALL(CONTROL_HANDLER, "open");
+        return amt_device_fail_call({CONTROL_HANDLER}, "open");
     }
     const int result = run_test(fd, control_id, verdict_ptr);
     close(fd);
@@ -125,7 +125,7 @@ int amt_device_camera_control(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st 
     const int32_t control_id = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_CAMERA_CONTROL);
     log_control_id(control_id);
     if (control_id != CONTROL_FIRST && control_id != CONTROL_SECOND) {
-        return AMT_DEVICE_FAIL(__func__, PUB_ERR_FAIL, "invalid control_id: %d", control_id);
+        return amt_device_fail({}, PUB_ERR_FAIL, "invalid control_id: %d", control_id);
     }
     int32_t verdict = 0;
     const int result = test_camera(control_id, &verdict);

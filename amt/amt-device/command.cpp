@@ -5,6 +5,7 @@
 #include <string.h>
 
 #include "amt/amt-device/device-fail.h"
+#include "amt/amt-log.h"
 #include "pub/error.h"
 
 namespace {
@@ -22,8 +23,8 @@ int amt_device_do_command(const char *command)
             PUB_LOG(g_amt_device_log, "system(%s) OK", command);
             return PUB_ERR_NONE;
         }
-        AMT_DEVICE_FAIL(__func__, PUB_ERR_FILE, "system(%s) FAIL[count = %d]: %d - %s", command, attempt,
-                        errno, strerror(errno));
+        amt_device_fail({}, PUB_ERR_FILE, "system(%s) FAIL[count = %d]: %d - %s", command, attempt, errno,
+                        strerror(errno));
     }
     return PUB_ERR_FAIL;
 }

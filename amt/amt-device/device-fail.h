@@ -1,19 +1,31 @@
 #pragma once
 
-#include "amt/amt-log.h"
+#include <stdint.h>
 
 /*
- * The two lines of a failure: the error line of the named function, then the text. Both show the errno of the
- * call, and errno is preserved. Returns code, so that a handler can return what it logs.
- *
- * The function is named by the caller, because the lines name the handler, whichever helper found the fault.
+ * Where a failure is told from: the function that the log line names and the line in its source. {} is the
+ * caller's own, {"amt_device_audio"} names the handler from within one of its helpers.
  */
-int amt_device_fail(const pub_log_source_st &source, int line, const char *func, int code, const char *format,
-                    ...) __attribute__((format(printf, 5, 6)));
+struct amt_device_place_st
+{
+    const char *m_func_ptr;
+    int m_line;
 
-/* The same for a failed system call: the error line with -100, then the line of the call. Returns -100. */
-int amt_device_fail_call(int line, const char *func, const char *call);
+    constexpr amt_device_place_st(const char *func = __builtin_FUNCTION(), int line = __builtin_LINE())
+        : m_func_ptr(func), m_line(line)
+    {
+    }
+};
 
-#define AMT_DEVICE_FAIL(func, code, ...) amt_device_fail(g_amt_device_log, __LINE__, func, code, __VA_ARGS__)
-#define AMT_DEVICE_FAIL_CALL(func, call) amt_device_fail_call(__LINE__, func, call)
-#define AMT_GPS_FAIL(func, code, ...)    amt_device_fail(g_amt_gps_log, __LINE__, func, code, __VA_ARGS__)
+/*
+ * The two lines of a failure: the error line of the place, then the text. Both show the errno of the failing
+ * call, and errno is preserved. Returns code, so that a handler can return what it logs.
+ */
+int amt_device_fail(const amt_device_place_st &place, int code, const char *format, ...)
+    __attribute__((format(printf, 3, 4)));
+
+/*
+ * The same for a failed system call: the error line with PUB_ERR_FAIL, then the line of the call. Returns
+ * PUB_ERR_FAIL.
+ */
+int amt_device_fail_call(const amt_device_place_st &place, const char *call);

@@ -2,16 +2,15 @@
 
 #include <dlfcn.h>
 
-#include "amt/amt-device/device-fail.h"
 #include "pub/error.h"
 
 namespace {
 
-int fail_load(int line, const char *func)
+int fail_load(const amt_device_place_st &place)
 {
     const char *text = dlerror();
-    const int status = amt_device_fail(g_amt_device_log, line, func, PUB_ERR_FILE, "call dlopen fail: - %s",
-                                       text == nullptr ? "" : text);
+    const int status =
+        amt_device_fail(place, PUB_ERR_FILE, "call dlopen fail: - %s", text == nullptr ? "" : text);
     /* Lets go of the text now: at the thread's end that would happen inside a signal handler. */
     dlerror();
     return status;
@@ -19,14 +18,15 @@ int fail_load(int line, const char *func)
 
 } // namespace
 
-int amt_hal_load(int line, const char *func, const char *path, const char *name, amt_hal_entry_st *entry_ptr)
+int amt_hal_load(const char *path, const char *name, amt_hal_entry_st *entry_ptr,
+                 const amt_device_place_st &place)
 {
     entry_ptr->m_library_ptr = dlopen(path, RTLD_LAZY);
     if (entry_ptr->m_library_ptr == nullptr) {
-        return fail_load(line, func);
+        return fail_load(place);
     }
     entry_ptr->m_entry_ptr = dlsym(entry_ptr->m_library_ptr, name);
-    return entry_ptr->m_entry_ptr == nullptr ? fail_load(line, func) : PUB_ERR_NONE;
+    return entry_ptr->m_entry_ptr == nullptr ? fail_load(place) : PUB_ERR_NONE;
 }
 
 void amt_hal_unload(amt_hal_entry_st *entry_ptr)

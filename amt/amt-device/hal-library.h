@@ -1,5 +1,7 @@
 #pragma once
 
+#include "amt/amt-device/device-fail.h"
+
 /* An entry of a hardware-abstraction library, loaded for one call. */
 struct amt_hal_entry_st
 {
@@ -8,11 +10,11 @@ struct amt_hal_entry_st
 };
 
 /*
- * Loads the library with lazy binding and looks the entry up. Returns 0, or -118 after the error line of func
- * and the loader's error text. After a failed lookup the library stays loaded, on purpose.
+ * Loads the library with lazy binding and looks the entry up. Returns 0, or PUB_ERR_FILE after the error line
+ * of the place and the loader's error text. After a failed lookup the library stays loaded, on purpose.
  */
-int amt_hal_load(int line, const char *func, const char *path, const char *name, amt_hal_entry_st *entry_ptr);
-#define AMT_HAL_LOAD(path, name, entry_ptr) amt_hal_load(__LINE__, __func__, path, name, entry_ptr)
+int amt_hal_load(const char *path, const char *name, amt_hal_entry_st *entry_ptr,
+                 const amt_device_place_st &place = {});
 
 /* Unloads what amt_hal_load has loaded. */
 void amt_hal_unload(amt_hal_entry_st *entry_ptr);

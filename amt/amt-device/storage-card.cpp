@@ -42,7 +42,7 @@ int amt_device_tf_card(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_pt
     }
     PUB_LOG(g_amt_device_log, "amt_device_tf_card--->will open storage config file: %s", SETTING_FILE);
     int32_t setting = 0;
-    if (AMT_DEVICE_READ_INT(SETTING_FILE, &setting) == PUB_ERR_NONE) {
+    if (amt_device_file_read_int(SETTING_FILE, &setting) == PUB_ERR_NONE) {
         PUB_LOG(g_amt_device_log, "amt_device_tf_card--->getted storage config value: %d", setting);
     }
     PUB_LOG(g_amt_device_log, "amt_device_tf_card--->storage config value: %d", setting);

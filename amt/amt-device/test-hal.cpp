@@ -18,18 +18,18 @@ constexpr int32_t DEVICE_INFO_CAPACITY = 4055;
 constexpr uint32_t EMMC_INFO_SIZE = 100;
 
 /*
- * Loads the HAL for this one call: logs, calls the entry and stores its answer. Returns 0 when the call was
- * made, or -118 with *answer_ptr left alone.
+ * Loads the HAL and has call call the entry: logs, and stores the entry's answer. Returns 0 when the call was
+ * made, or PUB_ERR_FILE with *answer_ptr left alone.
  */
-template <typename func_t, typename... arg_t>
-int call_hal(int line, const char *func, const char *name, int32_t *answer_ptr, arg_t... args)
+template <typename entry_func, typename call_func>
+int call_hal(const char *name, int32_t *answer_ptr, call_func call, const amt_device_place_st &place = {})
 {
     amt_hal_entry_st entry = {};
-    if (amt_hal_load(line, func, AMT_MISC_HAL_LIBRARY, name, &entry) != PUB_ERR_NONE) {
+    if (amt_hal_load(AMT_MISC_HAL_LIBRARY, name, &entry, place) != PUB_ERR_NONE) {
         return PUB_ERR_FILE;
     }
     PUB_LOG(g_amt_device_log, "will call %s.", name);
-    *answer_ptr = reinterpret_cast<func_t>(entry.m_entry_ptr)(args...);
+    *answer_ptr = call(reinterpret_cast<entry_func>(entry.m_entry_ptr));
     PUB_LOG(g_amt_device_log, "stop call %s. return value:%d.", name, *answer_ptr);
     amt_hal_unload(&entry);
     return PUB_ERR_NONE;
@@ -41,8 +41,8 @@ int amt_make_ue_enter_idle()
 {
     pub_log_entry(g_amt_device_log);
     int32_t answer = 0;
-    const int result =
-        call_hal<amt_misc_hal_enter_idle_func>(__LINE__, __func__, AMT_MISC_HAL_ENTER_IDLE, &answer);
+    const int result = call_hal<amt_misc_hal_enter_idle_func>(AMT_MISC_HAL_ENTER_IDLE, &answer,
+                                                              [](auto entry) { return entry(); });
     if (result != PUB_ERR_NONE) {
         return result;
     }
@@ -56,11 +56,11 @@ int amt_usb_charge_ctrl(int32_t mode)
 {
     PUB_LOG(g_amt_device_log, "will call amt_usb_charger_enable , type:%d.", mode);
     if (mode < 0) {
-        return AMT_DEVICE_FAIL(__func__, PUB_ERR_PARAM, "parameter type(%d) is not valid.", mode);
+        return amt_device_fail({}, PUB_ERR_PARAM, "parameter type(%d) is not valid.", mode);
     }
     int32_t answer = 0;
     const int result = call_hal<amt_misc_hal_usb_charger_enable_func>(
-        __LINE__, __func__, AMT_MISC_HAL_USB_CHARGER_ENABLE, &answer, mode);
+        AMT_MISC_HAL_USB_CHARGER_ENABLE, &answer, [mode](auto entry) { return entry(mode); });
     if (result != PUB_ERR_NONE) {
         return result;
     }
@@ -74,8 +74,8 @@ int amt_boot_dl_fin_read(int32_t *verdict_ptr)
 {
     PUB_LOG(g_amt_device_log, "amt_boot_dl_fin_read start.");
     *verdict_ptr = 0;
-    return call_hal<amt_misc_hal_check_sanity_func>(__LINE__, __func__, AMT_MISC_HAL_CHECK_SANITY,
-                                                    verdict_ptr);
+    return call_hal<amt_misc_hal_check_sanity_func>(AMT_MISC_HAL_CHECK_SANITY, verdict_ptr,
+                                                    [](auto entry) { return entry(); });
 }
 
 int amt_read_dev_info(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
@@ -88,7 +88,8 @@ int amt_read_dev_info(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr
     char text_a[DEVICE_INFO_CAPACITY + 1] = {};
     int32_t answer = 0;
     const int result = call_hal<amt_misc_hal_create_devinfo_func>(
-        __LINE__, __func__, AMT_MISC_HAL_CREATE_DEVINFO, &answer, text_a, DEVICE_INFO_CAPACITY);
+        AMT_MISC_HAL_CREATE_DEVINFO, &answer,
+        [&text_a](auto entry) { return entry(text_a, DEVICE_INFO_CAPACITY); });
     if (result != PUB_ERR_NONE || answer != 0) {
         return result != PUB_ERR_NONE ? result : answer;
     }
@@ -121,7 +122,7 @@ int amt_device_emmc_info(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_
     amt_reply_start(rsp_ptr, AMT_READ_EMMC_INFO_RSPCMD);
     char text_a[EMMC_INFO_SIZE] = {};
     if (amt_read_emmc_info(text_a) != PUB_ERR_NONE) {
-        return AMT_DEVICE_FAIL(__func__, PUB_ERR_FAIL, "read error");
+        return amt_device_fail({}, PUB_ERR_FAIL, "read error");
     }
     PUB_LOG(g_amt_device_log, "read emmc_info: %s", text_a);
     amt_packet_add_string(rsp_ptr->m_buf_a, AMT_ATOM_EMMC_INFO, text_a);

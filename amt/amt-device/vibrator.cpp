@@ -21,7 +21,7 @@ int amt_device_vibrator(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_p
         return PUB_ERR_PARAM;
     }
     const int32_t flag = amt_packet_get_bool(req_ptr->m_buf_a, AMT_ATOM_SWITCH);
-    if (AMT_DEVICE_WRITE_INT(ENABLE_FILE, flag != 0 ? RUN_MS : 0) != PUB_ERR_NONE) {
+    if (amt_device_file_write_int(ENABLE_FILE, flag != 0 ? RUN_MS : 0) != PUB_ERR_NONE) {
         return PUB_ERR_FILE;
     }
     /* Any other value has started it too, but only 1 is called so. */

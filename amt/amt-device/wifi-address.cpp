@@ -27,13 +27,14 @@ constexpr int32_t OPERATION_CHECK = 2;
 constexpr uint32_t ADDRESS_SIZE = 60;
 
 /* The line of a failed check names the Bluetooth call; so it is known. */
-constexpr amt_radio_step_st CHECK_STEP = {&g_amt_device_log, "wifi connectivity check", "ldt_btCtrl"};
+constexpr amt_radio_step_st CHECK_STEP = {&g_amt_device_log, HANDLER, "wifi connectivity check",
+                                          "ldt_btCtrl"};
 
 int read_address(amt_buf_st *rsp_ptr)
 {
     char address_a[ADDRESS_SIZE] = {};
     if (amt_read_wifi_address(address_a) != PUB_ERR_NONE) {
-        return AMT_DEVICE_FAIL(HANDLER, PUB_ERR_FAIL, "read error");
+        return amt_device_fail({HANDLER}, PUB_ERR_FAIL, "read error");
     }
     PUB_LOG(g_amt_device_log, "read WIFI address: %s", address_a);
     amt_packet_add_string(rsp_ptr->m_buf_a, AMT_ATOM_WIFI_ADDRESS, address_a);
@@ -45,7 +46,7 @@ int write_address(const amt_buf_st *req_ptr)
     char address_a[ADDRESS_SIZE];
     amt_device_get_text(req_ptr, AMT_ATOM_WIFI_ADDRESS, address_a, sizeof(address_a));
     if (amt_write_wifi_address(address_a) != PUB_ERR_NONE) {
-        return AMT_DEVICE_FAIL(HANDLER, PUB_ERR_FAIL, "write error");
+        return amt_device_fail({HANDLER}, PUB_ERR_FAIL, "write error");
     }
     PUB_LOG(g_amt_device_log, "Write WIFI address: %s", address_a);
     amt_device_run(PROTECT_COMMAND);
@@ -57,7 +58,7 @@ int check_connectivity()
 {
     amt_radio_step_start(CHECK_STEP);
     const int32_t result = ldt_wifiCheck();
-    return AMT_RADIO_STEP_END(HANDLER, CHECK_STEP, result);
+    return amt_radio_step_end(CHECK_STEP, result);
 }
 
 int operate(int32_t operation, const amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
@@ -70,7 +71,7 @@ int operate(int32_t operation, const amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
     case OPERATION_CHECK:
         return check_connectivity();
     default:
-        return AMT_DEVICE_FAIL(HANDLER, PUB_ERR_PARAM, "unknown operation: %d", operation);
+        return amt_device_fail({HANDLER}, PUB_ERR_PARAM, "unknown operation: %d", operation);
     }
 }
 

@@ -19,12 +19,12 @@ namespace {
 constexpr char HANDLER[] = "amt_device_wifi_rtx_test";
 constexpr uint32_t COMMAND_SIZE = 100;
 
-constexpr amt_radio_step_st START_STEP = {&g_amt_device_log, "WIFI-start", "ldt_wifiCtrl"};
-constexpr amt_radio_step_st STOP_STEP = {&g_amt_device_log, "WIFI-stop", "ldt_wifiCtrl"};
-constexpr amt_radio_step_st TX_START_STEP = {&g_amt_device_log, "WIFI-TX-start", "ldt_TxTest"};
-constexpr amt_radio_step_st TX_STOP_STEP = {&g_amt_device_log, "WIFI-TX-stop", "ldt_TxTest"};
-constexpr amt_radio_step_st RX_START_STEP = {&g_amt_device_log, "WIFI-RX-start", "ldt_RxTest"};
-constexpr amt_radio_step_st RX_STOP_STEP = {&g_amt_device_log, "WIFI-RX-stop", "ldt_RxTest"};
+constexpr amt_radio_step_st START_STEP = {&g_amt_device_log, HANDLER, "WIFI-start", "ldt_wifiCtrl"};
+constexpr amt_radio_step_st STOP_STEP = {&g_amt_device_log, HANDLER, "WIFI-stop", "ldt_wifiCtrl"};
+constexpr amt_radio_step_st TX_START_STEP = {&g_amt_device_log, HANDLER, "WIFI-TX-start", "ldt_TxTest"};
+constexpr amt_radio_step_st TX_STOP_STEP = {&g_amt_device_log, HANDLER, "WIFI-TX-stop", "ldt_TxTest"};
+constexpr amt_radio_step_st RX_START_STEP = {&g_amt_device_log, HANDLER, "WIFI-RX-start", "ldt_RxTest"};
+constexpr amt_radio_step_st RX_STOP_STEP = {&g_amt_device_log, HANDLER, "WIFI-RX-stop", "ldt_RxTest"};
 
 /* The script is linked into the image through this, though nothing follows it. */
 [[gnu::used]] const char *const g_script_ptr = g_wifi_radio_test_script_a;
@@ -54,9 +54,9 @@ bool get_rate(const amt_buf_st *req_ptr, uint16_t *value_ptr)
     return get_number(req_ptr, AMT_ATOM_WIFI_RATE, 2, value_ptr);
 }
 
-int fail(const char *text)
+int fail(const char *text, const amt_device_place_st &place = {HANDLER})
 {
-    return AMT_DEVICE_FAIL(HANDLER, PUB_ERR_FAIL, "%s", text);
+    return amt_device_fail(place, PUB_ERR_FAIL, "%s", text);
 }
 
 int start_wifi(const amt_buf_st *, amt_buf_st *)
@@ -65,7 +65,7 @@ int start_wifi(const amt_buf_st *, amt_buf_st *)
         return PUB_ERR_NONE;
     }
     amt_radio_step_start(START_STEP);
-    const int result = AMT_RADIO_STEP_END(HANDLER, START_STEP, ldt_wifiCtrl(1));
+    const int result = amt_radio_step_end(START_STEP, ldt_wifiCtrl(1));
     wifi_running = result == PUB_ERR_NONE;
     return result;
 }
@@ -76,7 +76,7 @@ int stop_wifi(const amt_buf_st *, amt_buf_st *)
         return PUB_ERR_NONE;
     }
     amt_radio_step_start(STOP_STEP);
-    const int result = AMT_RADIO_STEP_END(HANDLER, STOP_STEP, ldt_wifiCtrl(0));
+    const int result = amt_radio_step_end(STOP_STEP, ldt_wifiCtrl(0));
     wifi_running = result != PUB_ERR_NONE;
     return result;
 }
@@ -96,13 +96,13 @@ int start_tx(const amt_buf_st *req_ptr, amt_buf_st *)
         return fail("Tx get power error");
     }
     PUB_LOG(g_amt_device_log, "WIFI-TX-start start. channel:%d; power:%d; rate:%d", channel, power, rate);
-    return AMT_RADIO_STEP_END(HANDLER, TX_START_STEP, ldt_TxTest(1, power, rate, channel));
+    return amt_radio_step_end(TX_START_STEP, ldt_TxTest(1, power, rate, channel));
 }
 
 int stop_tx(const amt_buf_st *, amt_buf_st *)
 {
     PUB_LOG(g_amt_device_log, "WIFI-TX-stop start. ");
-    return AMT_RADIO_STEP_END(HANDLER, TX_STOP_STEP, ldt_TxTest(0, 0, 0, 0));
+    return amt_radio_step_end(TX_STOP_STEP, ldt_TxTest(0, 0, 0, 0));
 }
 
 int start_rx(const amt_buf_st *req_ptr, amt_buf_st *)
@@ -116,7 +116,7 @@ int start_rx(const amt_buf_st *req_ptr, amt_buf_st *)
         return fail("Rx get rate error");
     }
     PUB_LOG(g_amt_device_log, "WIFI-RX-start start. channel:%d; rate:%d", channel, rate);
-    const int result = AMT_RADIO_STEP_END(HANDLER, RX_START_STEP, ldt_RxTest(1, channel, rate, nullptr));
+    const int result = amt_radio_step_end(RX_START_STEP, ldt_RxTest(1, channel, rate, nullptr));
     if (result == PUB_ERR_NONE) {
         wifi_rx_channel = static_cast<uint8_t>(channel);
     }
@@ -130,7 +130,7 @@ int stop_rx(const amt_buf_st *, amt_buf_st *rsp_ptr)
     PUB_LOG(g_amt_device_log, "WIFI-RX-stop start. channel:%d", wifi_rx_channel);
     const int32_t stopped = ldt_RxTest(0, wifi_rx_channel, 0, &count);
     PUB_LOG(g_amt_device_log, "WIFI-RX-stop end. return:%d; cnt:%d.", stopped, count);
-    const int result = AMT_RADIO_STEP_CHECK(HANDLER, RX_STOP_STEP, stopped);
+    const int result = amt_radio_step_check(RX_STOP_STEP, stopped);
     if (result == PUB_ERR_NONE) {
         amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_WIFI_PACKET_COUNT, count);
     }
@@ -153,7 +153,7 @@ constexpr uint8_t SUB_COMMAND_MAX = sizeof(SUB_COMMAND_A) / sizeof(SUB_COMMAND_A
 int operate(uint8_t sub_command, const amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
     if (sub_command == 0 || sub_command > SUB_COMMAND_MAX) {
-        AMT_DEVICE_FAIL(HANDLER, PUB_ERR_PARAM, "unknown operation: %u", sub_command);
+        amt_device_fail({HANDLER}, PUB_ERR_PARAM, "unknown operation: %u", sub_command);
         amt_device_run("echo the subcmd is invalid >> " TRACE_FILE);
         return PUB_ERR_PARAM;
     }
