@@ -8,7 +8,8 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include "pub/util/thread-end.h"
+#include "amt/amt-log.h"
+#include "pub/util/signal-table.h"
 
 namespace {
 
@@ -18,20 +19,34 @@ namespace {
  */
 constexpr size_t STACK_SIZE = size_t{64} * 1024;
 
-void wait_for(pid_t child_pid)
+/* Children that no thread waits for; 0 is a free place. */
+constexpr uint32_t NOTED_COUNT = 16;
+pid_t g_noted_pid_a[NOTED_COUNT];
+
+/* Whether the child is gone; with WNOHANG it may not be. */
+bool wait_for(pid_t child_pid, int option)
 {
-    while (waitpid(child_pid, nullptr, 0) < 0 && errno == EINTR) {
+    int status = 0;
+    pid_t ended_pid = 0;
+    do {
+        ended_pid = waitpid(child_pid, &status, option);
+    } while (ended_pid < 0 && errno == EINTR);
+    if (ended_pid == child_pid && WIFSIGNALED(status)) {
+        const int number = WTERMSIG(status);
+        PUB_LOG(g_amt_device_log, "BT-start error. child %d ended by signal %d(%s)", child_pid, number,
+                pub_util_get_signal_name(number));
     }
+    return ended_pid != 0;
 }
 
 /* The argument is the child's id itself, so that nothing has to outlive the caller. */
 void *run_reaper(void *argument)
 {
-    wait_for(static_cast<pid_t>(reinterpret_cast<intptr_t>(argument)));
+    wait_for(static_cast<pid_t>(reinterpret_cast<intptr_t>(argument)), 0);
     return nullptr;
 }
 
-int start_reaper(pid_t child_pid)
+int create_reaper(pid_t child_pid)
 {
     pthread_attr_t attributes;
     pthread_attr_init(&attributes);
@@ -45,24 +60,49 @@ int start_reaper(pid_t child_pid)
     return error;
 }
 
-} // namespace
-
-void amt_child_reap(pid_t child_pid)
+/* Signals are for the threads that know them: the reaper inherits a mask that blocks them all. */
+int start_reaper(pid_t child_pid)
 {
-    /* Signals are for the threads that know them: the reaper inherits a mask that blocks them all. */
     sigset_t all_set;
     sigset_t old_set;
     sigfillset(&all_set);
     pthread_sigmask(SIG_SETMASK, &all_set, &old_set);
-    const int error = start_reaper(child_pid);
+    const int error = create_reaper(child_pid);
     pthread_sigmask(SIG_SETMASK, &old_set, nullptr);
-    if (error != 0) {
-        const bool was_deferred = pub_util_is_thread_end_deferred();
-        pub_util_allow_thread_end();
-        wait_for(child_pid);
-        if (was_deferred) {
-            pub_util_defer_thread_end();
+    return error;
+}
+
+void ask_for_noted()
+{
+    for (pid_t &pid : g_noted_pid_a) {
+        if (pid != 0 && wait_for(pid, WNOHANG)) {
+            pid = 0;
         }
+    }
+}
+
+void note(pid_t child_pid)
+{
+    for (pid_t &pid : g_noted_pid_a) {
+        if (pid == 0) {
+            pid = child_pid;
+            return;
+        }
+    }
+    PUB_LOG(g_amt_device_log, "WARNING !");
+    PUB_LOG(g_amt_device_log, "nobody waits for child %d", child_pid);
+}
+
+} // namespace
+
+void amt_child_reap(pid_t child_pid)
+{
+    ask_for_noted();
+    const int error = start_reaper(child_pid);
+    if (error != 0) {
+        errno = error;
+        pub_log_sys_call(g_amt_device_log, "pthread_create");
+        note(child_pid);
     }
 }
 

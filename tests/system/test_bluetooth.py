@@ -18,6 +18,7 @@ from support.traffic import APP_OUT, PC_OUT, dump
 BT, HANDLER = 170, "amt_device_bt"
 GPS_TEST, RADIO_TEST = 176, 187
 CALL = "ldt_btCtrl(1) = {}"
+KILLED = "BT-start error. child {} ended by signal 9(SIGKILL)"
 
 Channel = Union[AppChannel, PcChannel]
 PATHS: dict[str, Callable[[Handset], Channel]] = {"packet": AppChannel, "pc": PcChannel}
@@ -189,11 +190,16 @@ def test_service_outlives_the_child(make_handset: HandsetFactory, path: str, num
     channel = PATHS[path](handset)
     HeldCall(handset, "ldt_btCtrl")
     for _ in range(2):
+        mark = handset.log.mark()
         assert channel.request(BT) == done(BT)
         pid = child(handset)
         wait_until(lambda: "BT-start start" in lines_of(handset, pid) or None, "the start")
         handset.signal(number, pid=pid)
         wait_alone(handset)
+        # The other two end the child by its own signal treatment.
+        told = [record.text for record in handset.log.records(mark, TAG)
+                if record.pid == handset.pid and record.text.startswith("BT-start error")]
+        assert told == ([KILLED.format(pid)] if number == signal.SIGKILL else [])
         # What the service holds was not put away: its lines, its link, its files.
         assert channel.request(GPS_TEST) == packet(175, *done(0).atoms)
     assert "amt_handle_deinit()" not in handset.log.texts(TAG)

@@ -1,0 +1,180 @@
+#include "amt/amt-device/child-reaper.h"
+
+#include <dlfcn.h>
+#include <errno.h>
+#include <pthread.h>
+#include <signal.h>
+#include <sys/wait.h>
+#include <time.h>
+#include <unistd.h>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "tests/unit/support/log-capture.h"
+
+namespace {
+
+bool g_is_without_threads = false;
+
+/* While it lives, no thread is to be had. */
+class no_threads_c {
+public:
+    no_threads_c()
+    {
+        g_is_without_threads = true;
+    }
+
+    ~no_threads_c()
+    {
+        g_is_without_threads = false;
+    }
+
+    no_threads_c(const no_threads_c &) = delete;
+    no_threads_c &operator=(const no_threads_c &) = delete;
+};
+
+constexpr char NO_THREAD_LINE[] = "sys call: pthread_create() failed! errno = 11";
+constexpr int DEADLINE_MS = 30000;
+
+/* Waits until the condition holds; false when it does not before the deadline. */
+template <typename condition_func> bool wait_until(condition_func condition)
+{
+    constexpr timespec PAUSE = {0, 5 * 1000000};
+    for (int waited = 0; waited < DEADLINE_MS; waited += 5) {
+        if (condition()) {
+            return true;
+        }
+        nanosleep(&PAUSE, nullptr);
+    }
+    return condition();
+}
+
+/* A process that has ended keeps its id until it is waited for. */
+bool is_waited_for(pid_t pid)
+{
+    return wait_until([pid] { return kill(pid, 0) != 0 && errno == ESRCH; });
+}
+
+bool is_zombie(pid_t pid)
+{
+    siginfo_t info = {};
+    return waitid(P_PID, static_cast<id_t>(pid), &info, WEXITED | WNOWAIT) == 0 && info.si_pid == pid;
+}
+
+/* A child that stays until it gets a signal. */
+pid_t start_hanging_child()
+{
+    const pid_t pid = fork();
+    if (pid == 0) {
+        for (;;) {
+            pause();
+        }
+    }
+    return pid;
+}
+
+std::string signal_line(pid_t pid, const std::string &signal)
+{
+    return "BT-start error. child " + std::to_string(pid) + " ended by signal " + signal;
+}
+
+TEST(child_reaper, tells_the_signal_that_ended_a_child)
+{
+    for (const auto &[number, text] : {std::pair(SIGKILL, "9(SIGKILL)"), std::pair(SIGUSR2, "12(SIGUSR2)")}) {
+        const log_capture_c capture;
+        const pid_t pid = start_hanging_child();
+        amt_child_reap(pid);
+        ASSERT_EQ(kill(pid, number), 0);
+        EXPECT_TRUE(is_waited_for(pid));
+        const std::string line = signal_line(pid, text);
+        EXPECT_TRUE(wait_until([&] { return capture.has(line); })) << line;
+    }
+}
+
+TEST(child_reaper, says_nothing_of_a_child_that_ends_by_itself)
+{
+    const log_capture_c capture;
+    const pid_t pid = fork();
+    if (pid == 0) {
+        _exit(9);
+    }
+    const no_threads_c no_threads;
+    amt_child_reap(pid);
+    ASSERT_TRUE(is_zombie(pid));
+    const pid_t other_pid = start_hanging_child();
+    amt_child_reap(other_pid);
+    EXPECT_TRUE(is_waited_for(pid));
+    EXPECT_THAT(capture.texts(), testing::ElementsAre(NO_THREAD_LINE, NO_THREAD_LINE));
+    kill(other_pid, SIGKILL);
+    EXPECT_EQ(waitpid(other_pid, nullptr, 0), other_pid);
+}
+
+/* A chip that hangs keeps its child: the caller has lines to serve meanwhile. */
+TEST(child_reaper, never_waits_itself)
+{
+    pid_t hanging_pid = 0;
+    {
+        const log_capture_c capture;
+        const no_threads_c no_threads;
+        hanging_pid = start_hanging_child();
+        amt_child_reap(hanging_pid);
+        EXPECT_EQ(kill(hanging_pid, 0), 0);
+        EXPECT_THAT(capture.texts(), testing::ElementsAre(NO_THREAD_LINE));
+    }
+    const log_capture_c capture;
+    const pid_t second_pid = start_hanging_child();
+    amt_child_reap(second_pid);
+    EXPECT_EQ(kill(hanging_pid, 0), 0) << "it still hangs, and nobody waits";
+    ASSERT_EQ(kill(hanging_pid, SIGKILL), 0);
+    ASSERT_TRUE(is_zombie(hanging_pid));
+    const pid_t third_pid = start_hanging_child();
+    amt_child_reap(third_pid);
+    EXPECT_TRUE(is_waited_for(hanging_pid)) << "the next start asks for it";
+    EXPECT_TRUE(capture.has(signal_line(hanging_pid, "9(SIGKILL)")));
+    for (const pid_t pid : {second_pid, third_pid}) {
+        ASSERT_EQ(kill(pid, SIGKILL), 0);
+        EXPECT_TRUE(is_waited_for(pid));
+    }
+}
+
+TEST(child_reaper, tells_of_a_child_too_many)
+{
+    constexpr int COUNT = 17;
+    std::vector<pid_t> pids;
+    {
+        const log_capture_c capture;
+        const no_threads_c no_threads;
+        for (int i = 0; i < COUNT; i++) {
+            pids.push_back(start_hanging_child());
+            amt_child_reap(pids.back());
+        }
+        EXPECT_EQ(capture.count_containing("nobody waits for child "), 1);
+        EXPECT_TRUE(capture.has("nobody waits for child " + std::to_string(pids.back())));
+    }
+    for (const pid_t pid : pids) {
+        kill(pid, SIGKILL);
+        ASSERT_TRUE(is_zombie(pid));
+    }
+    const pid_t last_pid = start_hanging_child();
+    amt_child_reap(last_pid);
+    kill(last_pid, SIGKILL);
+    EXPECT_EQ(waitpid(pids.back(), nullptr, WNOHANG), pids.back());
+    for (const pid_t pid : pids) {
+        EXPECT_TRUE(is_waited_for(pid));
+    }
+    EXPECT_TRUE(is_waited_for(last_pid));
+}
+
+} // namespace
+
+extern "C" int pthread_create(pthread_t *id_ptr, const pthread_attr_t *attributes_ptr, void *(*body)(void *),
+                              void *argument)
+{
+    if (g_is_without_threads) {
+        return EAGAIN;
+    }
+    using create_func = int (*)(pthread_t *, const pthread_attr_t *, void *(*)(void *), void *);
+    static const create_func next = reinterpret_cast<create_func>(dlsym(RTLD_NEXT, "pthread_create"));
+    return next(id_ptr, attributes_ptr, body, argument);
+}
