@@ -1,5 +1,3 @@
-#include "amt/amt-device/audio.h"
-
 #include <errno.h>
 #include <signal.h>
 #include <stdio.h>
@@ -11,6 +9,7 @@
 #include "amt/amt-cfg.h"
 #include "amt/amt-command.h"
 #include "amt/amt-device/device-fail.h"
+#include "amt/amt-device/device-request.h"
 #include "amt/amt-device/hal-library.h"
 #include "amt/amt-handle/channel/response.h"
 #include "amt/amt-packet.h"

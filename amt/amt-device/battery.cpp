@@ -5,20 +5,34 @@
 
 #include "amt/amt-atom.h"
 #include "amt/amt-command.h"
-#include "amt/amt-device/battery-adc.h"
+#include "amt/amt-device/command.h"
 #include "amt/amt-device/device-fail.h"
 #include "amt/amt-device/device-file.h"
+#include "amt/amt-device/device-request.h"
 #include "amt/amt-handle/channel/response.h"
+#include "amt/amt-handle/request/factory-file.h"
 #include "amt/amt-handle/request/request-frame.h"
 #include "amt/amt-packet.h"
 #include "pub/error.h"
+#include "pub/file/scan.h"
+#include "pub/util/thread-end.h"
 
 namespace {
 
-constexpr char VOLTAGE_FILE[] = "/sys/class/power_supply/battery/voltage_now";
+#define DRIVER_FILE "/proc/driver/sarvo_battery"
 
-constexpr uint32_t COMMAND_SIZE = 100;
+/* How the driver takes the calibration values: at boot from the file, at once on its own. */
+#define CALIBRATION_FORMAT "amt_set_vbatt[%d] [%d] [%d] [%d]"
+
+constexpr char VOLTAGE_FILE[] = "/sys/class/power_supply/battery/voltage_now";
+constexpr char CALIBRATION_FILE[] = "/amt/vbatt";
+constexpr char MEASURE_COMMAND[] = "echo \"amt_get_vbatt\" > " DRIVER_FILE;
 constexpr char CHECK_HANDLER[] = "amt_device_battery_voltage_check";
+constexpr uint32_t MEASURE_MS = 20;
+constexpr uint32_t COMMAND_SIZE = 100;
+
+/* Four numbers of 11 characters, their frame and the terminating zero. */
+constexpr uint32_t CALIBRATION_SIZE = 80;
 
 int build_adc_rsp(amt_buf_st *rsp_ptr)
 {
@@ -37,8 +51,7 @@ int build_adc_rsp(amt_buf_st *rsp_ptr)
 void hand_to_driver(int32_t a, int32_t b, int32_t c, int32_t d)
 {
     char command_a[COMMAND_SIZE];
-    snprintf(command_a, sizeof(command_a),
-             "echo \"amt_set_vbatt[%d] [%d] [%d] [%d]\" > " AMT_BATTERY_DRIVER_FILE, a, b, c, d);
+    snprintf(command_a, sizeof(command_a), "echo \"" CALIBRATION_FORMAT "\" > " DRIVER_FILE, a, b, c, d);
     const int result = system(command_a);
     PUB_LOG(g_amt_device_log, "%s", command_a);
     if (result < 0) {
@@ -74,8 +87,43 @@ int build_check_rsp(const amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
     }
     return amt_device_fail({CHECK_HANDLER}, PUB_ERR_FAIL, "Invalid command id[%d]", command_id);
 }
-
 } // namespace
+
+int amt_read_adc(uint32_t *value_ptr)
+{
+    if (value_ptr == nullptr) {
+        return amt_device_fail({}, PUB_ERR_FAIL, "Null pointer.");
+    }
+    if (amt_device_do_command(MEASURE_COMMAND) != PUB_ERR_NONE) {
+        /* On purpose: a driver that cannot measure gives a value of 0, not an error. */
+        return PUB_ERR_NONE;
+    }
+    pub_util_sleep_ms(MEASURE_MS);
+    const pub_file_st file(DRIVER_FILE, pub_file_mode_en::READ);
+    if (!file.is_open()) {
+        return amt_device_fail_call({}, "fopen");
+    }
+    const bool is_read = pub_file_scan_unsigned(file, value_ptr) == 1;
+    if (is_read) {
+        PUB_LOG(g_amt_device_log, "ADC value: %u", *value_ptr);
+    } else {
+        amt_device_fail_call({}, "fscanf");
+    }
+    return is_read ? PUB_ERR_NONE : PUB_ERR_FAIL;
+}
+
+int amt_write_adc_diff_value(int32_t a, int32_t b, int32_t c, int32_t d)
+{
+    char text_a[CALIBRATION_SIZE];
+    snprintf(text_a, sizeof(text_a), CALIBRATION_FORMAT, a, b, c, d);
+    const amt_factory_step_en step = amt_factory_file_put(CALIBRATION_FILE, text_a);
+    if (step == amt_factory_step_en::OPEN_FAILED) {
+        return amt_device_fail_call({}, "fopen");
+    }
+    PUB_LOG(g_amt_device_log, "SAVA ADC value: %d %d %d %d", a, b, c, d);
+    amt_factory_file_sync();
+    return step == amt_factory_step_en::DONE ? PUB_ERR_NONE : amt_device_fail_call({}, "fprintf");
+}
 
 int amt_device_battery_voltage(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {

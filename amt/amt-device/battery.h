@@ -1,14 +1,16 @@
 #pragma once
 
-#include "amt/amt-buf.h"
-
-/* Request 9: the battery voltage as the kernel gives it, unscaled, in atom 5. 0, -101, -118 or the send's
- * status. */
-int amt_device_battery_voltage(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr);
+#include <stdint.h>
 
 /*
- * Request 224: the battery ADC's raw value in atom 151. Request 226: stores the calibration values of atoms
- * 146 to 149 and hands them to the driver. 0, -101, -100 (reading, storing, or another id) or the send's
- * status.
+ * Has the driver measure and reads the battery ADC's raw value. Returns 0, or PUB_ERR_FAIL for an absent
+ * pointer and when the value cannot be read. When the driver does not take the measuring command, the status
+ * is 0 and *value_ptr is left alone: the caller reports what it has set there.
  */
-int amt_device_battery_voltage_check(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr);
+int amt_read_adc(uint32_t *value_ptr);
+
+/*
+ * Stores the four calibration values durably in "/amt/vbatt", in the form the driver takes them at boot.
+ * Returns 0, or PUB_ERR_FAIL when the file cannot be opened or written.
+ */
+int amt_write_adc_diff_value(int32_t a, int32_t b, int32_t c, int32_t d);

@@ -1,10 +1,9 @@
-#include "amt/amt-device/bluetooth.h"
-
 #include <unistd.h>
 
 #include "amt/amt-command.h"
 #include "amt/amt-device/child-reaper.h"
 #include "amt/amt-device/device-fail.h"
+#include "amt/amt-device/device-request.h"
 #include "amt/amt-device/radio-step.h"
 #include "amt/amt-handle/channel/response.h"
 #include "platform/include/ldt.h"

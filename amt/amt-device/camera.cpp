@@ -1,5 +1,3 @@
-#include "amt/amt-device/camera.h"
-
 #include <errno.h>
 #include <fcntl.h>
 #include <sys/ioctl.h>
@@ -8,6 +6,7 @@
 #include "amt/amt-atom.h"
 #include "amt/amt-command.h"
 #include "amt/amt-device/device-fail.h"
+#include "amt/amt-device/device-request.h"
 #include "amt/amt-handle/channel/response.h"
 #include "amt/amt-handle/request/request-frame.h"
 #include "amt/amt-packet.h"

@@ -2,6 +2,7 @@
 
 #include <stdlib.h>
 
+#include "amt/amt-device/embed/embedded-data.h"
 #include "amt/amt-device/framebuffer.h"
 #include "amt/amt-device/picture.h"
 #include "amt/amt-log.h"

@@ -2,17 +2,11 @@
 
 #include <stdint.h>
 
-/*
- * The handshake picture: RGB565, little-endian, rows from top to bottom without padding. The build turns
- * picture/handshake-picture.png into the stored gzip member.
- */
+/* The form of the handshake picture: RGB565, little-endian, rows from top to bottom without padding. */
 constexpr uint32_t AMT_PICTURE_WIDTH = 346;
 constexpr uint32_t AMT_PICTURE_HEIGHT = 390;
 constexpr uint32_t AMT_PIXEL_SIZE = 2;
 constexpr uint32_t AMT_PICTURE_SIZE = AMT_PICTURE_WIDTH * AMT_PICTURE_HEIGHT * AMT_PIXEL_SIZE;
-
-extern const uint8_t g_handshake_picture_a[];
-extern const uint32_t g_handshake_picture_length;
 
 /*
  * Unpacks a gzip member (length bytes) of a picture into pixel, AMT_PICTURE_SIZE bytes. A member whose

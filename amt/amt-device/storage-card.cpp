@@ -1,8 +1,7 @@
-#include "amt/amt-device/storage-card.h"
-
 #include "amt/amt-atom.h"
 #include "amt/amt-command.h"
 #include "amt/amt-device/device-file.h"
+#include "amt/amt-device/device-request.h"
 #include "amt/amt-handle/channel/response.h"
 #include "amt/amt-handle/request/request-frame.h"
 #include "amt/amt-packet.h"

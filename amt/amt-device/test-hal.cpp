@@ -1,8 +1,11 @@
 #include "amt/amt-device/test-hal.h"
 
+#include <inttypes.h>
+
 #include "amt/amt-atom.h"
 #include "amt/amt-command.h"
 #include "amt/amt-device/device-fail.h"
+#include "amt/amt-device/device-request.h"
 #include "amt/amt-device/hal-library.h"
 #include "amt/amt-handle/channel/response.h"
 #include "amt/amt-handle/request/request-frame.h"
@@ -111,6 +114,24 @@ int amt_enter_idle(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
     }
     PUB_LOG(g_amt_device_log, "enter_idle return OK.");
     return amt_handle_send_rsp_ok(channel, rsp_ptr, AMT_ENTER_IDLE_RSPCMD);
+}
+
+int amt_modem_boot_dl_fin_read(uint32_t channel, amt_buf_st *, amt_buf_st *rsp_ptr)
+{
+    pub_log_entry(g_amt_handle_log);
+    PUB_LOG(g_amt_handle_log, "amt_modem_boot_dl_fin_read.");
+    amt_reply_start(rsp_ptr, AMT_READ_BOOT_DOWNLOAD_RSPCMD);
+    int32_t flag = 0;
+    const int status = amt_boot_dl_fin_read(&flag);
+    PUB_LOG(g_amt_handle_log, "amt_modem_boot_dl_fin_read finished. flag:%" PRId32 "; ret_val:%d.", flag,
+            status);
+    if (status != PUB_ERR_NONE) {
+        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
+        PUB_LOG(g_amt_handle_log, "read error");
+        return PUB_ERR_FAIL;
+    }
+    amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_BOOT_DOWNLOAD, flag);
+    return amt_reply_finish_ok(channel, rsp_ptr);
 }
 
 int amt_device_emmc_info(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)

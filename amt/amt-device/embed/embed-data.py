@@ -92,12 +92,14 @@ def format_bytes(data: bytes) -> str:
     return "\n".join("    " + ", ".join(str(byte) for byte in line) + "," for line in lines)
 
 
+HEADER = '#include "amt/amt-device/embed/embedded-data.h"\n\n'
+
+
 def picture_source(content: bytes) -> str:
     """The source that holds a picture."""
     member = pack_member(to_rgb565(read_pixels(content)))
     return (
-        '#include "amt/amt-device/picture.h"\n\n'
-        f"const uint8_t g_handshake_picture_a[] = {{\n{format_bytes(member)}\n}};\n"
+        f"{HEADER}const uint8_t g_handshake_picture_a[] = {{\n{format_bytes(member)}\n}};\n"
         "const uint32_t g_handshake_picture_length = sizeof(g_handshake_picture_a);\n"
     )
 
@@ -106,10 +108,7 @@ def script_source(content: bytes) -> str:
     """The source that holds the text of the radio test script, which must be plain ASCII."""
     content.decode("ascii")
     data = format_bytes(content + b"\0")
-    return (
-        '#include "amt/amt-device/wifi.h"\n\n'
-        f"const char g_wifi_radio_test_script_a[] = {{\n{data}\n}};\n"
-    )
+    return f"{HEADER}const char g_wifi_radio_test_script_a[] = {{\n{data}\n}};\n"
 
 
 SOURCES = {"picture": picture_source, "script": script_source}

@@ -3,17 +3,7 @@
 #include <iterator>
 
 #include "amt/amt-command.h"
-#include "amt/amt-device/audio.h"
-#include "amt/amt-device/backlight.h"
-#include "amt/amt-device/battery.h"
-#include "amt/amt-device/bluetooth.h"
-#include "amt/amt-device/camera.h"
-#include "amt/amt-device/channel-request.h"
-#include "amt/amt-device/display.h"
-#include "amt/amt-device/storage-card.h"
-#include "amt/amt-device/test-hal.h"
-#include "amt/amt-device/vibrator.h"
-#include "amt/amt-device/wifi.h"
+#include "amt/amt-device/device-request.h"
 #include "amt/amt-gps.h"
 #include "amt/amt-handle/channel/context.h"
 #include "amt/amt-handle/request/identity-request.h"

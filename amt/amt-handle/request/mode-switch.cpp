@@ -6,7 +6,6 @@
 #include <unistd.h>
 
 #include "amt/amt-command.h"
-#include "amt/amt-device/test-hal.h"
 #include "amt/amt-handle/channel/at-exchange.h"
 #include "amt/amt-handle/channel/handshake.h"
 #include "amt/amt-handle/request/power-off.h"
@@ -20,12 +19,9 @@ namespace {
 
 constexpr uint8_t ATOM_HANDSHAKE = 192; /* operation in a request, flag in a response */
 constexpr uint8_t ATOM_WANTED_MODE = 201;
-constexpr uint8_t ATOM_BOOT_DOWNLOAD = 204;
 constexpr uint8_t RSP_POWER_OFF = 237;
-constexpr uint8_t RSP_BOOT_DOWNLOAD = 245;
 
 constexpr int HANDSHAKE_NOT_PERMITTED = 0;
-constexpr int32_t BOOT_DOWNLOAD_UNKNOWN = 2;
 
 constexpr const char *SWITCH_PROPERTY = "amt.normal.amt.switch_status";
 constexpr const char *USB_PROPERTY = "sys.usb.config";
@@ -156,22 +152,4 @@ int amt_handle_power_off(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_
     const int status = amt_handle_send_rsp_ok(channel, rsp_ptr, RSP_POWER_OFF);
     amt_power_off_handset();
     return status;
-}
-
-int amt_modem_boot_dl_fin_read(uint32_t channel, amt_buf_st *, amt_buf_st *rsp_ptr)
-{
-    pub_log_entry(g_amt_handle_log);
-    PUB_LOG(g_amt_handle_log, "amt_modem_boot_dl_fin_read.");
-    amt_reply_start(rsp_ptr, RSP_BOOT_DOWNLOAD);
-    int32_t flag = BOOT_DOWNLOAD_UNKNOWN;
-    const int status = amt_boot_dl_fin_read(&flag);
-    PUB_LOG(g_amt_handle_log, "amt_modem_boot_dl_fin_read finished. flag:%" PRId32 "; ret_val:%d.", flag,
-            status);
-    if (status != PUB_ERR_NONE) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
-        PUB_LOG(g_amt_handle_log, "read error");
-        return PUB_ERR_FAIL;
-    }
-    amt_packet_add_int(rsp_ptr->m_buf_a, ATOM_BOOT_DOWNLOAD, flag);
-    return amt_reply_finish_ok(channel, rsp_ptr);
 }

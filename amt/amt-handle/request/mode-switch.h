@@ -36,10 +36,3 @@ int amt_handle_not_permit_handshake(uint32_t channel, amt_buf_st *req_ptr, amt_b
  * Returns the status of the answer if the system refuses to power off.
  */
 int amt_handle_power_off(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr);
-
-/*
- * Id 244 from the PC: whether the boot download has finished, as the test library tells. Needs no modem.
- * Returns -100 without an answer when the library cannot be asked. Requires req_ptr and rsp_ptr to be
- * present.
- */
-int amt_modem_boot_dl_fin_read(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr);

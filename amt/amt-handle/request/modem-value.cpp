@@ -4,6 +4,7 @@
 #include <stdio.h>
 #include <string.h>
 
+#include "amt/amt-atom.h"
 #include "amt/amt-command.h"
 #include "amt/amt-handle/channel/at-exchange.h"
 #include "amt/amt-handle/channel/at-io.h"
@@ -166,4 +167,16 @@ int amt_channel_switch(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_pt
         return PUB_ERR_FAIL;
     }
     return amt_reply_finish_ok(channel, rsp_ptr);
+}
+
+int amt_at_to_modem(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
+{
+    pub_log_entry(g_amt_device_log);
+    if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+        return PUB_ERR_PARAM;
+    }
+    if (amt_packet_get_cmd(req_ptr->m_buf_a) != AMT_SWITCH_CHANNEL_CMD) {
+        return PUB_ERR_NONE;
+    }
+    return amt_channel_switch(channel, req_ptr, rsp_ptr);
 }

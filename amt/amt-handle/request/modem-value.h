@@ -25,3 +25,9 @@ int amt_modem_handle_temperature(uint32_t channel, amt_buf_st *req_ptr, amt_buf_
  * answer holds no "OK", or the failing status of the channel. Requires req_ptr and rsp_ptr to be present.
  */
 int amt_channel_switch(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr);
+
+/*
+ * Id 232 from the app: hands on to amt_channel_switch and returns its status. Any other id is answered with 0
+ * and nothing is sent. PUB_ERR_PARAM for bad arguments.
+ */
+int amt_at_to_modem(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr);

@@ -241,18 +241,4 @@ TEST(not_permit_handshake, checks_the_presence_of_its_arguments)
     EXPECT_EQ(capture.texts().back(), "0, 0, 1");
 }
 
-TEST(boot_download, is_not_answered_without_the_test_library)
-{
-    if (access("/system/lib/hw/amt.tq5530.misc.so", F_OK) == 0) {
-        GTEST_SKIP() << "the test library exists";
-    }
-    const modem_line_c line;
-    const log_capture_c capture;
-    EXPECT_EQ(line.handle(amt_modem_boot_dl_fin_read, wire_packet(244, ""), AMT_CHANNEL_PC), PUB_ERR_FAIL);
-    EXPECT_TRUE(capture.has("amt_modem_boot_dl_fin_read."));
-    EXPECT_TRUE(capture.has("amt_modem_boot_dl_fin_read finished. flag:0; ret_val:-118."));
-    EXPECT_EQ(capture.texts().back(), "read error");
-    EXPECT_TRUE(line.pc_frames().empty());
-}
-
 } // namespace

@@ -1,4 +1,4 @@
-#include "amt/amt-device/bluetooth.h"
+#include "amt/amt-device/device-request.h"
 
 #include <errno.h>
 #include <poll.h>

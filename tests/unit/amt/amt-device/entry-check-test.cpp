@@ -3,18 +3,9 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "amt/amt-device/audio.h"
-#include "amt/amt-device/backlight.h"
-#include "amt/amt-device/battery.h"
-#include "amt/amt-device/bluetooth.h"
-#include "amt/amt-device/camera.h"
-#include "amt/amt-device/channel-request.h"
-#include "amt/amt-device/display.h"
-#include "amt/amt-device/storage-card.h"
-#include "amt/amt-device/test-hal.h"
-#include "amt/amt-device/vibrator.h"
-#include "amt/amt-device/wifi.h"
+#include "amt/amt-device/device-request.h"
 #include "amt/amt-gps.h"
+#include "amt/amt-handle/request/modem-value.h"
 #include "pub/error.h"
 #include "tests/unit/amt/amt-device/radio-library.h"
 #include "tests/unit/amt/amt-device/shell-record.h"

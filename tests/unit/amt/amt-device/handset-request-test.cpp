@@ -5,14 +5,11 @@
 #include <gtest/gtest.h>
 
 #include "amt/amt-cfg.h"
-#include "amt/amt-device/audio.h"
-#include "amt/amt-device/battery-adc.h"
 #include "amt/amt-device/battery.h"
-#include "amt/amt-device/camera.h"
-#include "amt/amt-device/channel-request.h"
-#include "amt/amt-device/display.h"
+#include "amt/amt-device/device-request.h"
 #include "amt/amt-device/test-hal.h"
 #include "amt/amt-handle/channel/context.h"
+#include "amt/amt-handle/request/modem-value.h"
 #include "platform/include/amt-misc-hal.h"
 #include "platform/include/audio-loop-hal.h"
 #include "pub/error.h"
@@ -204,6 +201,16 @@ TEST_F(missing_platform, the_hal_requests_fail_without_their_library)
     EXPECT_EQ(request(amt_device_audio_loop, 31, ""), PUB_ERR_FILE);
     expect_loader_failure(capture, "amt_device_audio_loop", AUDIO_LOOP_HAL_LIBRARY);
     EXPECT_THAT(m_line.app_packets(), IsEmpty());
+}
+
+TEST_F(missing_platform, the_boot_download_is_not_answered_without_the_library)
+{
+    const log_capture_c capture;
+    EXPECT_EQ(m_line.handle(amt_modem_boot_dl_fin_read, wire_packet(244, ""), AMT_CHANNEL_PC), PUB_ERR_FAIL);
+    EXPECT_TRUE(capture.has("amt_modem_boot_dl_fin_read."));
+    EXPECT_TRUE(capture.has("amt_modem_boot_dl_fin_read finished. flag:0; ret_val:-118."));
+    EXPECT_EQ(capture.texts().back(), "read error");
+    EXPECT_THAT(m_line.pc_frames(), IsEmpty());
 }
 
 TEST_F(missing_platform, the_player_and_the_sound_file_are_both_named)

@@ -7,6 +7,8 @@
 
 #include <gtest/gtest.h>
 
+#include "amt/amt-device/embed/embedded-data.h"
+
 namespace {
 
 using bytes = std::vector<uint8_t>;

@@ -3,8 +3,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "amt/amt-device/bluetooth.h"
-#include "amt/amt-device/wifi.h"
+#include "amt/amt-device/device-request.h"
 #include "amt/amt-gps.h"
 #include "pub/error.h"
 #include "tests/unit/amt/amt-device/radio-library.h"

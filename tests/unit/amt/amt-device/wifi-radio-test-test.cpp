@@ -1,4 +1,5 @@
-#include "amt/amt-device/wifi.h"
+#include "amt/amt-device/device-request.h"
+#include "amt/amt-device/embed/embedded-data.h"
 
 #include <string.h>
 

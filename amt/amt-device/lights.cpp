@@ -1,19 +1,22 @@
-#include "amt/amt-device/backlight.h"
-
 #include "amt/amt-atom.h"
 #include "amt/amt-command.h"
 #include "amt/amt-device/device-file.h"
+#include "amt/amt-device/device-request.h"
 #include "amt/amt-handle/channel/response.h"
 #include "amt/amt-packet.h"
 #include "pub/error.h"
 
+/* What an operator sees or feels: display, lights, vibrator. */
 namespace {
 
 constexpr char LCD_FILE[] = "/sys/class/leds/lcd-backlight/brightness";
 constexpr char BUTTON_FILE[] = "/sys/class/leds/button-backlight/brightness";
+constexpr char VIBRATOR_FILE[] = "/sys/class/timed_output/vibrator/enable";
+
 constexpr uint32_t LEVEL_MAX = 255;
 constexpr int32_t LEVEL_UNKNOWN = -1;
 constexpr int32_t LEVEL_DEFAULT = 200;
+constexpr int32_t VIBRATION_MS = 3000;
 
 /* The LCD level found before the first request. Only the reader thread that serves requests uses it. */
 int32_t src_lcd_brightness = LEVEL_UNKNOWN;
@@ -33,6 +36,15 @@ int32_t level_to_write(int32_t requested)
 }
 
 } // namespace
+
+int amt_device_lcd_color(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
+{
+    pub_log_entry(g_amt_device_log);
+    if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+        return PUB_ERR_PARAM;
+    }
+    return amt_handle_send_rsp_ok(channel, rsp_ptr, AMT_SHOWLCD_RSPCMD);
+}
 
 int amt_device_lcd_brightness(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
@@ -64,4 +76,19 @@ int amt_device_button_backlight(uint32_t channel, amt_buf_st *req_ptr, amt_buf_s
     }
     PUB_LOG(g_amt_device_log, "%s button backlight", flag == 1 ? "open" : "close");
     return amt_handle_send_rsp_ok(channel, rsp_ptr, AMT_BACKLIGHT_RSPCMD);
+}
+
+int amt_device_vibrator(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
+{
+    pub_log_entry(g_amt_device_log);
+    if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+        return PUB_ERR_PARAM;
+    }
+    const int32_t flag = amt_packet_get_bool(req_ptr->m_buf_a, AMT_ATOM_SWITCH);
+    if (amt_device_file_write_int(VIBRATOR_FILE, flag != 0 ? VIBRATION_MS : 0) != PUB_ERR_NONE) {
+        return PUB_ERR_FILE;
+    }
+    /* Any other value has started it too, but only 1 is called so. */
+    PUB_LOG(g_amt_device_log, "%s vibrator", flag == 1 ? "start" : "stop");
+    return amt_handle_send_rsp_ok(channel, rsp_ptr, AMT_VIBRATION_RSPCMD);
 }

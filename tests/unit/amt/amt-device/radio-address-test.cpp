@@ -1,4 +1,4 @@
-#include "amt/amt-device/device-text.h"
+#include "amt/amt-device/radio-address.h"
 
 #include <string.h>
 #include <string>
@@ -10,7 +10,7 @@
 namespace {
 
 constexpr uint8_t ATOM = 111;
-constexpr uint32_t CAPACITY = 60;
+constexpr uint32_t CAPACITY = AMT_RADIO_ADDRESS_SIZE;
 
 struct taken_st
 {
@@ -26,13 +26,13 @@ taken_st take(const std::string &atoms)
     packet.copy(reinterpret_cast<char *>(req.m_buf_a), AMT_PACKET_SIZE);
     char area_a[CAPACITY + 2];
     memset(area_a, '#', sizeof(area_a));
-    const uint32_t count = amt_device_get_text(&req, ATOM, area_a + 1, CAPACITY);
+    const uint32_t count = amt_radio_address_get(&req, ATOM, area_a + 1);
     EXPECT_EQ(area_a[0], '#');
     EXPECT_EQ(area_a[CAPACITY + 1], '#');
     return {count, area_a + 1};
 }
 
-TEST(device_text, a_missing_or_empty_atom_is_an_empty_text)
+TEST(radio_address, a_missing_or_empty_atom_is_an_empty_text)
 {
     EXPECT_EQ(take("").m_count, 0U);
     EXPECT_EQ(take("").m_text, "");
@@ -40,7 +40,7 @@ TEST(device_text, a_missing_or_empty_atom_is_an_empty_text)
     EXPECT_EQ(take(text_atom(ATOM, "")).m_text, "");
 }
 
-TEST(device_text, takes_at_most_one_less_than_the_capacity)
+TEST(radio_address, takes_at_most_one_less_than_the_capacity)
 {
     for (const uint32_t length : {1U, 17U, 58U, 59U, 60U, 61U, 200U}) {
         const uint32_t expected = length < CAPACITY ? length : CAPACITY - 1;
@@ -50,7 +50,7 @@ TEST(device_text, takes_at_most_one_less_than_the_capacity)
     }
 }
 
-TEST(device_text, counts_what_follows_a_zero_byte)
+TEST(radio_address, counts_what_follows_a_zero_byte)
 {
     const taken_st taken = take(text_atom(ATOM, std::string("12\0"
                                                             "34",
