@@ -5,8 +5,7 @@
 #include "amt/amt-convert.h"
 #include "amt/amt-device/command.h"
 #include "amt/amt-device/radio-step.h"
-#include "amt/amt-handle/channel/response.h"
-#include "amt/amt-handle/request/request-frame.h"
+#include "amt/amt-handle/channel/reply.h"
 #include "amt/amt-log.h"
 #include "amt/amt-packet.h"
 #include "platform/include/ldt.h"
@@ -60,19 +59,18 @@ int operate(int32_t operation)
 
 int amt_gps_control(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    pub_log_entry(g_amt_gps_log);
-    if (AMT_CHECK_REQUEST(g_amt_gps_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+    if (amt_reply_enter(g_amt_gps_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
     const int32_t operation = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_GPS_OPERATION);
     PUB_LOG(g_amt_gps_log, "amt_gps_control is_start:%d", operation);
-    const int result = operate(operation);
-    return result == PUB_ERR_NONE ? amt_handle_send_rsp_ok(channel, rsp_ptr, AMT_GPS_CONTROL_RSPCMD) : result;
+    const int status = operate(operation);
+    return status == PUB_ERR_NONE ? amt_handle_send_rsp_ok(channel, rsp_ptr, AMT_GPS_CONTROL_RSPCMD) : status;
 }
 
 int amt_gps_test(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    if (AMT_CHECK_REQUEST(g_amt_gps_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+    if (amt_reply_check(g_amt_gps_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
     /* Not AMT_GPS_TEST_RSPCMD: stations expect the id of the GPS control here. */
@@ -81,8 +79,7 @@ int amt_gps_test(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 
 int amt_gps_read_result(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    pub_log_entry(g_amt_gps_log);
-    if (AMT_CHECK_REQUEST(g_amt_gps_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+    if (amt_reply_enter(g_amt_gps_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         amt_device_run("echo gps read result:invalid param > /data/local/wifi/gps_get_result.txt");
         return PUB_ERR_PARAM;
     }
@@ -99,7 +96,7 @@ int amt_gps_read_result(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_p
     amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_GPS_CARRIER_TO_NOISE, cnr);
     amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_GPS_SATELLITE, svid);
     amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_RESULT, 0);
-    const int result = channel == AMT_CHANNEL_PC ? amt_convert_app_2_pc(rsp_ptr) : PUB_ERR_NONE;
+    const int status = channel == AMT_CHANNEL_PC ? amt_convert_app_2_pc(rsp_ptr) : PUB_ERR_NONE;
     amt_handle_send_rsp(channel, rsp_ptr);
-    return result;
+    return status;
 }

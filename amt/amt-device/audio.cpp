@@ -11,7 +11,7 @@
 #include "amt/amt-device/device-fail.h"
 #include "amt/amt-device/device-request.h"
 #include "amt/amt-device/hal-library.h"
-#include "amt/amt-handle/channel/response.h"
+#include "amt/amt-handle/channel/reply.h"
 #include "amt/amt-packet.h"
 #include "platform/include/audio-loop-hal.h"
 #include "pub/error.h"
@@ -29,16 +29,16 @@ constexpr char AUDIO_HANDLER[] = "amt_device_audio";
 /* Each missing one has its line. */
 int check_player()
 {
-    int result = PUB_ERR_NONE;
+    int status = PUB_ERR_NONE;
     if (access(PLAYER_PATH, F_OK) != 0) {
-        result = amt_device_fail({AUDIO_HANDLER}, PUB_ERR_FILE, "access(\"" PLAYER_PATH "\") fail: %d - %s",
+        status = amt_device_fail({AUDIO_HANDLER}, PUB_ERR_FILE, "access(\"" PLAYER_PATH "\") fail: %d - %s",
                                  errno, strerror(errno));
     }
     if (access(g_amt_cfg.m_audio_file_a, F_OK) != 0) {
-        result = amt_device_fail({AUDIO_HANDLER}, PUB_ERR_FILE, "access(\"%s\") fail: %d - %s",
+        status = amt_device_fail({AUDIO_HANDLER}, PUB_ERR_FILE, "access(\"%s\") fail: %d - %s",
                                  g_amt_cfg.m_audio_file_a, errno, strerror(errno));
     }
-    return result;
+    return status;
 }
 
 /* The player puts itself in the background and records its pid, so the command ends at once. */
@@ -75,8 +75,7 @@ void stop_player()
 
 int amt_device_audio(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    pub_log_entry(g_amt_device_log);
-    if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+    if (amt_reply_enter(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
     const int32_t flag = amt_packet_get_bool(req_ptr->m_buf_a, AMT_ATOM_SWITCH);
@@ -92,8 +91,7 @@ int amt_device_audio(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 
 int amt_device_audio_loop(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    pub_log_entry(g_amt_device_log);
-    if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+    if (amt_reply_enter(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
     const int32_t enable = amt_packet_get_bool(req_ptr->m_buf_a, AMT_ATOM_SWITCH) == 1 ? 1 : 0;

@@ -9,9 +9,8 @@
 #include "amt/amt-device/device-fail.h"
 #include "amt/amt-device/device-file.h"
 #include "amt/amt-device/device-request.h"
-#include "amt/amt-handle/channel/response.h"
+#include "amt/amt-handle/channel/reply.h"
 #include "amt/amt-handle/request/factory-file.h"
-#include "amt/amt-handle/request/request-frame.h"
 #include "amt/amt-packet.h"
 #include "pub/error.h"
 #include "pub/file/scan.h"
@@ -38,12 +37,11 @@ int build_adc_rsp(amt_buf_st *rsp_ptr)
 {
     amt_reply_start(rsp_ptr, AMT_READ_ADC_RSPCMD);
     uint32_t value = 0;
-    const int result = amt_read_adc(&value);
-    if (result != PUB_ERR_NONE) {
-        return result;
+    const int status = amt_read_adc(&value);
+    if (status != PUB_ERR_NONE) {
+        return status;
     }
     amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_BATTERY_ADC, static_cast<int32_t>(value));
-    amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_RESULT, 0);
     return PUB_ERR_NONE;
 }
 
@@ -52,9 +50,9 @@ void hand_to_driver(int32_t a, int32_t b, int32_t c, int32_t d)
 {
     char command_a[COMMAND_SIZE];
     snprintf(command_a, sizeof(command_a), "echo \"" CALIBRATION_FORMAT "\" > " DRIVER_FILE, a, b, c, d);
-    const int result = system(command_a);
+    const int status = system(command_a);
     PUB_LOG(g_amt_device_log, "%s", command_a);
-    if (result < 0) {
+    if (status < 0) {
         pub_log_sys_call(g_amt_device_log, "system");
         pub_log_error(g_amt_device_log, PUB_ERR_SYS_CALL, CHECK_HANDLER);
     }
@@ -67,11 +65,10 @@ int build_calibration_rsp(const amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
     const int32_t b = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_ADC_CALIBRATION_B);
     const int32_t c = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_ADC_CALIBRATION_C);
     const int32_t d = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_ADC_CALIBRATION_D);
-    const int result = amt_write_adc_diff_value(a, b, c, d);
-    if (result != PUB_ERR_NONE) {
-        return result;
+    const int status = amt_write_adc_diff_value(a, b, c, d);
+    if (status != PUB_ERR_NONE) {
+        return status;
     }
-    amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_RESULT, 0);
     hand_to_driver(a, b, c, d);
     return PUB_ERR_NONE;
 }
@@ -127,8 +124,7 @@ int amt_write_adc_diff_value(int32_t a, int32_t b, int32_t c, int32_t d)
 
 int amt_device_battery_voltage(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    pub_log_entry(g_amt_device_log);
-    if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+    if (amt_reply_enter(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
     int32_t voltage = 0;
@@ -144,10 +140,9 @@ int amt_device_battery_voltage(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st
 
 int amt_device_battery_voltage_check(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    pub_log_entry(g_amt_device_log);
-    if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+    if (amt_reply_enter(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
-    const int result = build_check_rsp(req_ptr, rsp_ptr);
-    return result == PUB_ERR_NONE ? amt_handle_finish_rsp(channel, rsp_ptr) : result;
+    const int status = build_check_rsp(req_ptr, rsp_ptr);
+    return status == PUB_ERR_NONE ? amt_reply_finish_ok(channel, rsp_ptr) : status;
 }

@@ -5,7 +5,7 @@
 #include "amt/amt-device/device-fail.h"
 #include "amt/amt-device/device-request.h"
 #include "amt/amt-device/radio-step.h"
-#include "amt/amt-handle/channel/response.h"
+#include "amt/amt-handle/channel/reply.h"
 #include "platform/include/ldt.h"
 #include "pub/error.h"
 
@@ -25,8 +25,8 @@ constexpr amt_radio_step_st START_STEP = {&g_amt_device_log, HANDLER, "BT-start"
 int switch_on_in_child(uint32_t channel, amt_buf_st *rsp_ptr)
 {
     amt_radio_step_start(START_STEP);
-    const int32_t result = ldt_btCtrl(1);
-    if (amt_radio_step_end(START_STEP, result) != PUB_ERR_NONE) {
+    const int32_t answer = ldt_btCtrl(1);
+    if (amt_radio_step_end(START_STEP, answer) != PUB_ERR_NONE) {
         return amt_device_fail({HANDLER}, PUB_ERR_FILE, START_FAILED_TEXT);
     }
     return amt_handle_send_rsp_ok(channel, rsp_ptr, AMT_BLUETOOTH_RSPCMD);
@@ -36,8 +36,7 @@ int switch_on_in_child(uint32_t channel, amt_buf_st *rsp_ptr)
 
 int amt_device_bt(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    pub_log_entry(g_amt_device_log);
-    if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+    if (amt_reply_enter(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
     const pid_t service_pid = getpid();
@@ -49,7 +48,7 @@ int amt_device_bt(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
         amt_child_die_with(service_pid);
         return switch_on_in_child(channel, rsp_ptr);
     }
-    const int result = amt_handle_send_rsp_ok(channel, rsp_ptr, AMT_BLUETOOTH_RSPCMD);
+    const int status = amt_handle_send_rsp_ok(channel, rsp_ptr, AMT_BLUETOOTH_RSPCMD);
     amt_child_reap(child_pid);
-    return result;
+    return status;
 }

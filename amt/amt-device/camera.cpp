@@ -7,8 +7,7 @@
 #include "amt/amt-command.h"
 #include "amt/amt-device/device-fail.h"
 #include "amt/amt-device/device-request.h"
-#include "amt/amt-handle/channel/response.h"
-#include "amt/amt-handle/request/request-frame.h"
+#include "amt/amt-handle/channel/reply.h"
 #include "amt/amt-packet.h"
 #include "platform/include/device-requests.h"
 #include "pub/error.h"
@@ -42,12 +41,12 @@ int select_preview(int32_t camera)
         return PUB_ERR_FAIL;
     }
     int32_t value = camera;
-    int result = PUB_ERR_NONE;
+    int status = PUB_ERR_NONE;
     if (ioctl(fd, SARVOCAM_IOCTL_PREVIEW, &value) < 0) {
-        result = amt_device_fail_call({PREVIEW_HANDLER}, "ioctl");
+        status = amt_device_fail_call({PREVIEW_HANDLER}, "ioctl");
     }
     close(fd);
-    return result;
+    return status;
 }
 
 /* The test itself, on the open camera. */
@@ -79,9 +78,9 @@ int test_camera(int32_t control_id, int32_t *verdict_ptr)
     if (fd < 0) {
         return amt_device_fail_call({CONTROL_HANDLER}, "open");
     }
-    const int result = run_test(fd, control_id, verdict_ptr);
+    const int status = run_test(fd, control_id, verdict_ptr);
     close(fd);
-    return result;
+    return status;
 }
 
 /* The format is kept as the logs' readers know it: an old "%ld", which some C libraries print as it stands.
@@ -99,8 +98,7 @@ void log_control_id(int32_t control_id)
 
 int amt_device_camera(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    pub_log_entry(g_amt_device_log);
-    if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+    if (amt_reply_enter(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
     const uint8_t command_id = amt_packet_get_cmd(req_ptr->m_buf_a);
@@ -108,17 +106,16 @@ int amt_device_camera(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr
         pub_log_error(g_amt_device_log, PUB_ERR_FAIL);
         return PUB_ERR_FAIL;
     }
-    const int result = select_preview(command_id == AMT_CAMERA_PREVIEW_CMD ? PREVIEW_MAIN : PREVIEW_SECOND);
-    if (result != PUB_ERR_NONE) {
-        return result;
+    const int status = select_preview(command_id == AMT_CAMERA_PREVIEW_CMD ? PREVIEW_MAIN : PREVIEW_SECOND);
+    if (status != PUB_ERR_NONE) {
+        return status;
     }
     return amt_handle_send_rsp_ok(channel, rsp_ptr, static_cast<uint8_t>(command_id + 1));
 }
 
 int amt_device_camera_control(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    pub_log_entry(g_amt_device_log);
-    if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+    if (amt_reply_enter(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
     const int32_t control_id = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_CAMERA_CONTROL);
@@ -127,9 +124,9 @@ int amt_device_camera_control(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st 
         return amt_device_fail({}, PUB_ERR_FAIL, "invalid control_id: %d", control_id);
     }
     int32_t verdict = 0;
-    const int result = test_camera(control_id, &verdict);
-    if (result != PUB_ERR_NONE) {
-        return result;
+    const int status = test_camera(control_id, &verdict);
+    if (status != PUB_ERR_NONE) {
+        return status;
     }
     amt_reply_start(rsp_ptr, AMT_CAMERA_CONTROL_RSPCMD);
     amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_CAMERA_RESULT, verdict);

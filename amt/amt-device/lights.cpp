@@ -2,7 +2,7 @@
 #include "amt/amt-command.h"
 #include "amt/amt-device/device-file.h"
 #include "amt/amt-device/device-request.h"
-#include "amt/amt-handle/channel/response.h"
+#include "amt/amt-handle/channel/reply.h"
 #include "amt/amt-packet.h"
 #include "pub/error.h"
 
@@ -39,8 +39,7 @@ int32_t level_to_write(int32_t requested)
 
 int amt_device_lcd_color(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    pub_log_entry(g_amt_device_log);
-    if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+    if (amt_reply_enter(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
     return amt_handle_send_rsp_ok(channel, rsp_ptr, AMT_SHOWLCD_RSPCMD);
@@ -48,8 +47,7 @@ int amt_device_lcd_color(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_
 
 int amt_device_lcd_brightness(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    pub_log_entry(g_amt_device_log);
-    if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+    if (amt_reply_enter(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
     if (src_lcd_brightness < 0) {
@@ -66,8 +64,7 @@ int amt_device_lcd_brightness(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st 
 
 int amt_device_button_backlight(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    pub_log_entry(g_amt_device_log);
-    if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+    if (amt_reply_enter(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
     const int32_t flag = amt_packet_get_bool(req_ptr->m_buf_a, AMT_ATOM_SWITCH);
@@ -80,8 +77,7 @@ int amt_device_button_backlight(uint32_t channel, amt_buf_st *req_ptr, amt_buf_s
 
 int amt_device_vibrator(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    pub_log_entry(g_amt_device_log);
-    if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+    if (amt_reply_enter(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
     const int32_t flag = amt_packet_get_bool(req_ptr->m_buf_a, AMT_ATOM_SWITCH);

@@ -10,10 +10,9 @@
 #include "amt/amt-device/device-fail.h"
 #include "amt/amt-device/device-request.h"
 #include "amt/amt-device/radio-step.h"
-#include "amt/amt-handle/channel/response.h"
+#include "amt/amt-handle/channel/reply.h"
 #include "amt/amt-handle/request/factory-file.h"
 #include "amt/amt-handle/request/identity-store.h"
-#include "amt/amt-handle/request/request-frame.h"
 #include "amt/amt-packet.h"
 #include "platform/include/ldt.h"
 #include "pub/error.h"
@@ -207,8 +206,7 @@ uint32_t amt_radio_address_get(const amt_buf_st *req_ptr, uint8_t atom_id, char 
 
 int amt_device_bt_address(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    pub_log_entry(g_amt_device_log);
-    if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+    if (amt_reply_enter(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
     return serve(BT_RADIO, channel, req_ptr, rsp_ptr);
@@ -216,8 +214,7 @@ int amt_device_bt_address(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp
 
 int amt_device_wifi_address(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    pub_log_entry(g_amt_device_log);
-    if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+    if (amt_reply_enter(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
     return serve(WIFI_RADIO, channel, req_ptr, rsp_ptr);

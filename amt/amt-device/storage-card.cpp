@@ -2,8 +2,7 @@
 #include "amt/amt-command.h"
 #include "amt/amt-device/device-file.h"
 #include "amt/amt-device/device-request.h"
-#include "amt/amt-handle/channel/response.h"
-#include "amt/amt-handle/request/request-frame.h"
+#include "amt/amt-handle/channel/reply.h"
 #include "amt/amt-packet.h"
 #include "pub/error.h"
 #include "pub/util/util.h"
@@ -35,8 +34,7 @@ uint32_t card_capacity(const char *path)
 
 int amt_device_tf_card(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    pub_log_entry(g_amt_device_log);
-    if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+    if (amt_reply_enter(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
     PUB_LOG(g_amt_device_log, "amt_device_tf_card--->will open storage config file: %s", SETTING_FILE);

@@ -7,8 +7,7 @@
 #include "amt/amt-device/device-fail.h"
 #include "amt/amt-device/device-request.h"
 #include "amt/amt-device/hal-library.h"
-#include "amt/amt-handle/channel/response.h"
-#include "amt/amt-handle/request/request-frame.h"
+#include "amt/amt-handle/channel/reply.h"
 #include "amt/amt-handle/request/version.h"
 #include "amt/amt-packet.h"
 #include "platform/include/amt-misc-hal.h"
@@ -44,10 +43,10 @@ int amt_make_ue_enter_idle()
 {
     pub_log_entry(g_amt_device_log);
     int32_t answer = 0;
-    const int result = call_hal<amt_misc_hal_enter_idle_func>(AMT_MISC_HAL_ENTER_IDLE, &answer,
+    const int status = call_hal<amt_misc_hal_enter_idle_func>(AMT_MISC_HAL_ENTER_IDLE, &answer,
                                                               [](auto entry) { return entry(); });
-    if (result != PUB_ERR_NONE) {
-        return result;
+    if (status != PUB_ERR_NONE) {
+        return status;
     }
     if (answer == 0) {
         PUB_LOG(g_amt_device_log, "enter_idle return OK.");
@@ -62,10 +61,10 @@ int amt_usb_charge_ctrl(int32_t mode)
         return amt_device_fail({}, PUB_ERR_PARAM, "parameter type(%d) is not valid.", mode);
     }
     int32_t answer = 0;
-    const int result = call_hal<amt_misc_hal_usb_charger_enable_func>(
+    const int status = call_hal<amt_misc_hal_usb_charger_enable_func>(
         AMT_MISC_HAL_USB_CHARGER_ENABLE, &answer, [mode](auto entry) { return entry(mode); });
-    if (result != PUB_ERR_NONE) {
-        return result;
+    if (status != PUB_ERR_NONE) {
+        return status;
     }
     if (answer == 0) {
         PUB_LOG(g_amt_device_log, "amt_usb_charger_enable return OK.");
@@ -83,18 +82,17 @@ int amt_boot_dl_fin_read(int32_t *verdict_ptr)
 
 int amt_read_dev_info(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    pub_log_entry(g_amt_device_log);
-    if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+    if (amt_reply_enter(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
     amt_reply_start(rsp_ptr, AMT_READ_DEV_INFO_RSPCMD);
     char text_a[DEVICE_INFO_CAPACITY + 1] = {};
     int32_t answer = 0;
-    const int result = call_hal<amt_misc_hal_create_devinfo_func>(
+    const int status = call_hal<amt_misc_hal_create_devinfo_func>(
         AMT_MISC_HAL_CREATE_DEVINFO, &answer,
         [&text_a](auto entry) { return entry(text_a, DEVICE_INFO_CAPACITY); });
-    if (result != PUB_ERR_NONE || answer != 0) {
-        return result != PUB_ERR_NONE ? result : answer;
+    if (status != PUB_ERR_NONE || answer != 0) {
+        return status != PUB_ERR_NONE ? status : answer;
     }
     PUB_LOG(g_amt_device_log, "create_devinfo return OK. %s", text_a);
     amt_packet_add_string(rsp_ptr->m_buf_a, AMT_ATOM_DEVICE_INFO, text_a);
@@ -104,13 +102,12 @@ int amt_read_dev_info(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr
 
 int amt_enter_idle(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    pub_log_entry(g_amt_device_log);
-    if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+    if (amt_reply_enter(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
-    const int result = amt_make_ue_enter_idle();
-    if (result != PUB_ERR_NONE) {
-        return result;
+    const int status = amt_make_ue_enter_idle();
+    if (status != PUB_ERR_NONE) {
+        return status;
     }
     PUB_LOG(g_amt_device_log, "enter_idle return OK.");
     return amt_handle_send_rsp_ok(channel, rsp_ptr, AMT_ENTER_IDLE_RSPCMD);
@@ -136,8 +133,7 @@ int amt_modem_boot_dl_fin_read(uint32_t channel, amt_buf_st *, amt_buf_st *rsp_p
 
 int amt_device_emmc_info(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    pub_log_entry(g_amt_device_log);
-    if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+    if (amt_reply_enter(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
     amt_reply_start(rsp_ptr, AMT_READ_EMMC_INFO_RSPCMD);

@@ -7,8 +7,7 @@
 #include "amt/amt-device/device-request.h"
 #include "amt/amt-device/embed/embedded-data.h"
 #include "amt/amt-device/radio-step.h"
-#include "amt/amt-handle/channel/response.h"
-#include "amt/amt-handle/request/request-frame.h"
+#include "amt/amt-handle/channel/reply.h"
 #include "amt/amt-packet.h"
 #include "platform/include/ldt.h"
 #include "pub/error.h"
@@ -66,9 +65,9 @@ int start_wifi(const amt_buf_st *, amt_buf_st *)
         return PUB_ERR_NONE;
     }
     amt_radio_step_start(START_STEP);
-    const int result = amt_radio_step_end(START_STEP, ldt_wifiCtrl(1));
-    wifi_running = result == PUB_ERR_NONE;
-    return result;
+    const int status = amt_radio_step_end(START_STEP, ldt_wifiCtrl(1));
+    wifi_running = status == PUB_ERR_NONE;
+    return status;
 }
 
 int stop_wifi(const amt_buf_st *, amt_buf_st *)
@@ -77,9 +76,9 @@ int stop_wifi(const amt_buf_st *, amt_buf_st *)
         return PUB_ERR_NONE;
     }
     amt_radio_step_start(STOP_STEP);
-    const int result = amt_radio_step_end(STOP_STEP, ldt_wifiCtrl(0));
-    wifi_running = result != PUB_ERR_NONE;
-    return result;
+    const int status = amt_radio_step_end(STOP_STEP, ldt_wifiCtrl(0));
+    wifi_running = status != PUB_ERR_NONE;
+    return status;
 }
 
 int start_tx(const amt_buf_st *req_ptr, amt_buf_st *)
@@ -117,11 +116,11 @@ int start_rx(const amt_buf_st *req_ptr, amt_buf_st *)
         return fail("Rx get rate error");
     }
     PUB_LOG(g_amt_device_log, "WIFI-RX-start start. channel:%d; rate:%d", channel, rate);
-    const int result = amt_radio_step_end(RX_START_STEP, ldt_RxTest(1, channel, rate, nullptr));
-    if (result == PUB_ERR_NONE) {
+    const int status = amt_radio_step_end(RX_START_STEP, ldt_RxTest(1, channel, rate, nullptr));
+    if (status == PUB_ERR_NONE) {
         wifi_rx_channel = static_cast<uint8_t>(channel);
     }
-    return result;
+    return status;
 }
 
 /* Stops on the channel of the last start, whatever the request says. */
@@ -131,11 +130,11 @@ int stop_rx(const amt_buf_st *, amt_buf_st *rsp_ptr)
     PUB_LOG(g_amt_device_log, "WIFI-RX-stop start. channel:%d", wifi_rx_channel);
     const int32_t stopped = ldt_RxTest(0, wifi_rx_channel, 0, &count);
     PUB_LOG(g_amt_device_log, "WIFI-RX-stop end. return:%d; cnt:%d.", stopped, count);
-    const int result = amt_radio_step_check(RX_STOP_STEP, stopped);
-    if (result == PUB_ERR_NONE) {
+    const int status = amt_radio_step_check(RX_STOP_STEP, stopped);
+    if (status == PUB_ERR_NONE) {
         amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_WIFI_PACKET_COUNT, count);
     }
-    return result;
+    return status;
 }
 
 struct sub_command_st
@@ -178,8 +177,7 @@ void trace_sub_command(uint8_t sub_command)
 
 int amt_device_wifi_rtx_test(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    pub_log_entry(g_amt_device_log);
-    if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+    if (amt_reply_enter(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
     amt_reply_start(rsp_ptr, AMT_WIFI_RTX_TEST_RSPCMD);
@@ -187,9 +185,9 @@ int amt_device_wifi_rtx_test(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *
     amt_packet_get_bytes(req_ptr->m_buf_a, AMT_ATOM_WIFI_SUB_COMMAND, &sub_command, sizeof(sub_command));
     trace_sub_command(sub_command);
     amt_packet_add_bytes(rsp_ptr->m_buf_a, AMT_ATOM_WIFI_SUB_COMMAND, &sub_command, sizeof(sub_command));
-    const int result = operate(sub_command, req_ptr, rsp_ptr);
-    if (result != PUB_ERR_NONE) {
-        return result;
+    const int status = operate(sub_command, req_ptr, rsp_ptr);
+    if (status != PUB_ERR_NONE) {
+        return status;
     }
     return amt_reply_finish_ok(channel, rsp_ptr);
 }

@@ -48,20 +48,6 @@ int send_result(uint32_t channel, amt_buf_st *rsp_ptr, uint8_t rsp_id, int32_t c
     return amt_reply_finish(channel, rsp_ptr);
 }
 
-/* The faults that each handler looks for first. */
-int check_request(const pub_log_source_st &source, uint32_t channel, const amt_buf_st *req_ptr,
-                  const amt_buf_st *rsp_ptr, const char *func, int line)
-{
-    const bool is_channel_none = channel == AMT_CHANNEL_NONE;
-    const bool is_req_empty = req_ptr != nullptr && req_ptr->m_buf_len == 0;
-    if (!is_channel_none && req_ptr != nullptr && !is_req_empty && rsp_ptr != nullptr) {
-        return PUB_ERR_NONE;
-    }
-    pub_log_error(source, PUB_ERR_PARAM, func, line);
-    pub_log_flags(source, {is_channel_none, req_ptr == nullptr, is_req_empty, rsp_ptr == nullptr});
-    return PUB_ERR_PARAM;
-}
-
 int write_rsp(int fd, const amt_buf_st *rsp_ptr)
 {
     const ssize_t written = write(fd, rsp_ptr->m_buf_a, rsp_ptr->m_buf_len);
@@ -82,11 +68,24 @@ int write_rsp(int fd, const amt_buf_st *rsp_ptr)
 
 } // namespace
 
+int amt_reply_check(const pub_log_source_st &source, uint32_t channel, const amt_buf_st *req_ptr,
+                    const amt_buf_st *rsp_ptr, const char *func, int line)
+{
+    const bool is_channel_none = channel == AMT_CHANNEL_NONE;
+    const bool is_req_empty = req_ptr != nullptr && req_ptr->m_buf_len == 0;
+    if (!is_channel_none && req_ptr != nullptr && !is_req_empty && rsp_ptr != nullptr) {
+        return PUB_ERR_NONE;
+    }
+    pub_log_error(source, PUB_ERR_PARAM, func, line);
+    pub_log_flags(source, {is_channel_none, req_ptr == nullptr, is_req_empty, rsp_ptr == nullptr});
+    return PUB_ERR_PARAM;
+}
+
 int amt_reply_enter(const pub_log_source_st &source, uint32_t channel, const amt_buf_st *req_ptr,
                     const amt_buf_st *rsp_ptr, const char *func, int line)
 {
     pub_log_entry(source, func);
-    return check_request(source, channel, req_ptr, rsp_ptr, func, line);
+    return amt_reply_check(source, channel, req_ptr, rsp_ptr, func, line);
 }
 
 int amt_reply_enter_modem(const pub_log_source_st &source, uint32_t channel, const amt_buf_st *req_ptr,
@@ -194,5 +193,5 @@ int amt_handle_check_request(const pub_log_source_st &source, int line, const ch
 int amt_handle_check_request(const pub_log_source_st &source, int line, const char *func, uint32_t channel,
                              const amt_buf_st *req_ptr, const amt_buf_st *rsp_ptr)
 {
-    return check_request(source, channel, req_ptr, rsp_ptr, func, line);
+    return amt_reply_check(source, channel, req_ptr, rsp_ptr, func, line);
 }

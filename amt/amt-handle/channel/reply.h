@@ -25,6 +25,11 @@ int amt_reply_enter(const pub_log_source_st &source, uint32_t channel, const amt
                     const amt_buf_st *rsp_ptr, const char *func = __builtin_FUNCTION(),
                     int line = __builtin_LINE());
 
+/* The check alone, for a handler that logs no entry line. */
+int amt_reply_check(const pub_log_source_st &source, uint32_t channel, const amt_buf_st *req_ptr,
+                    const amt_buf_st *rsp_ptr, const char *func = __builtin_FUNCTION(),
+                    int line = __builtin_LINE());
+
 /* As amt_reply_enter, for a handler that needs the modem: PUB_ERR_NO_MODEM when there is none. */
 int amt_reply_enter_modem(const pub_log_source_st &source, uint32_t channel, const amt_buf_st *req_ptr,
                           const amt_buf_st *rsp_ptr, const char *func = __builtin_FUNCTION(),
