@@ -16,15 +16,14 @@
 #include "amt/amt-packet.h"
 #include "platform/include/ldt.h"
 #include "pub/error.h"
+#include "pub/file/file.h"
 
 namespace {
 
 constexpr char BT_HANDLER[] = "amt_device_bt_address";
 constexpr char WIFI_HANDLER[] = "amt_device_wifi_address";
 
-/* The longest address, as fscanf wants it. */
-#define ADDRESS_WORD_FORMAT "%59s"
-static_assert(AMT_RADIO_ADDRESS_SIZE == 60 && AMT_WIFI_ADDRESS_SIZE == AMT_RADIO_ADDRESS_SIZE);
+static_assert(AMT_WIFI_ADDRESS_SIZE == AMT_RADIO_ADDRESS_SIZE);
 
 constexpr uint32_t COMMAND_SIZE = 40;
 
@@ -45,17 +44,13 @@ int fail_bt_open(const amt_device_place_st &place = {BT_HANDLER})
 
 int read_bt_address(char *address_a)
 {
-    FILE *stream = fopen(AMT_BT_ADDRESS_FILE, "re");
-    if (stream == nullptr) {
+    const pub_file_step_en step = pub_file_read_word(AMT_BT_ADDRESS_FILE, address_a, AMT_RADIO_ADDRESS_SIZE);
+    if (step == pub_file_step_en::OPEN_FAILED) {
         fail_bt_open();
         /* On purpose: a missing file is reported as a bad request. */
         return PUB_ERR_PARAM;
     }
-    /* An empty file is no error of the system; an older errno would mislead. */
-    errno = 0;
-    const int count = fscanf(stream, ADDRESS_WORD_FORMAT, address_a);
-    fclose(stream);
-    if (count != 1) {
+    if (step != pub_file_step_en::DONE) {
         return amt_device_fail({BT_HANDLER}, PUB_ERR_FAIL, "read not completed");
     }
     PUB_LOG(g_amt_device_log, "read BT address: %s", address_a);
