@@ -165,9 +165,8 @@ int init_for_amt_1_4()
 
 void open_at_mux()
 {
-    if (amt_tty_open_at() == PUB_ERR_NONE) {
-        disable_unsolicited_code(g_handle_context.m_fd_at);
-        return;
+    if (amt_at_open() == PUB_ERR_NONE || g_handle_context.m_fd_at > 0) {
+        return; /* one that was lost again is open, and found again by the first request that needs it */
     }
     g_handle_state.m_is_no_modem = 1;
     PUB_LOG(g_amt_handle_log, "WARNING !");

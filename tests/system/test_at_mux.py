@@ -106,6 +106,21 @@ def test_silent_modem_is_waited_for(make_handset: HandsetFactory) -> None:
     expect_board(handset, AppChannel(handset))
 
 
+def test_tty_lost_while_the_start_awaits_silence(make_handset: HandsetFactory) -> None:
+    handset = starting(make_handset)
+    handset.mux.hang_up()
+    # Away for a while: it is asked for once a second.
+    handset.log.wait('(1/30)try to open device "/dev/ttyMUX0"')
+    assert handset.log.find(error_line(SILENCE_FUNC, -118))
+    handset.mux.come_back(held=True)
+    assert handset.mux.read_exactly(len(SILENCE)) == SILENCE
+    assert not handset.log.find(READER)
+    handset.mux.write(OK)
+    handset.wait_ready()
+    assert not handset.log.find("The AT device is not opened with modem.")
+    expect_board(handset, AppChannel(handset))
+
+
 # the tty is lost
 
 
@@ -182,6 +197,27 @@ def test_tty_lost_and_found_again_and_again(make_handset: HandsetFactory) -> Non
         handset.mux.write(ANSWER)
         assert app.read_packet() == BOARD
     # No descriptor of a lost tty is kept.
+    assert len(handset.inspect().descriptors) == before
+
+
+def test_tty_lost_again_before_it_was_silent(make_handset: HandsetFactory) -> None:
+    handset, app = serving(make_handset)
+    before = len(handset.inspect().descriptors)
+    handset.mux.hang_up()
+    handset.mux.come_back(held=True)
+    app.send_packet(85)
+    assert handset.mux.read_exactly(len(SILENCE)) == SILENCE
+    # The modem that came back says nothing, and goes again.
+    handset.mux.expect_silence(0.1)
+    handset.mux.hang_up()
+    handset.mux.come_back(held=True)
+    assert handset.mux.read_exactly(len(SILENCE)) == SILENCE
+    handset.mux.write(OK)
+    assert handset.mux.read_exactly(len(ASK)) == ASK
+    handset.mux.write(ANSWER)
+    assert app.read_packet() == BOARD
+    assert app.request(9).result == 0
+    expect_board(handset, app)
     assert len(handset.inspect().descriptors) == before
 
 

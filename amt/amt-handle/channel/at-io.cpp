@@ -1,7 +1,8 @@
 #include "amt/amt-handle/channel/at-io.h"
 
 #include <errno.h>
-#include <string.h>
+#include <poll.h>
+#include <string_view>
 #include <time.h>
 #include <unistd.h>
 
@@ -17,7 +18,7 @@ namespace {
 
 constexpr char PROGRAM[] = "vx-kel-amt";
 
-/* The line number that write_at's progress text has always shown. */
+/* The line number in write_at's progress text, which stations' scripts look for: it does not move with the code. */
 constexpr int WRITE_AT_LINE = 912;
 
 constexpr char UNSOLICITED_OFF[] = "AT^DLKS=0\r";
@@ -25,8 +26,8 @@ constexpr int WAIT_SECONDS = 5;
 constexpr uint32_t ANSWER_SIZE = 20;
 constexpr uint32_t ANSWER_ROOM = 18;
 
-/* How long to wait before a lost tty is asked again, in milliseconds: the routine must not spin on it. */
-constexpr uint32_t LOST_TTY_PAUSE_MS = 100;
+/* How long to wait before a tty that fails at once is asked again, in milliseconds: nothing may spin on it. */
+constexpr uint32_t FAILED_TTY_PAUSE_MS = 100;
 
 /* What a failed transfer on the AT tty means: -118 when the tty is lost and may be reopened. */
 int get_transfer_error(bool is_write)
@@ -37,13 +38,11 @@ int get_transfer_error(bool is_write)
     return errno == EIO ? PUB_ERR_FILE : PUB_ERR_FAIL;
 }
 
-int reopen()
+/* Whether the line has hung up: then only a reopening brings it back. */
+bool is_hung_up(int fd)
 {
-    const int status = amt_tty_open_at();
-    if (status == PUB_ERR_NONE) {
-        disable_unsolicited_code(g_handle_context.m_fd_at);
-    }
-    return status;
+    pollfd line = {fd, 0, 0};
+    return poll(&line, 1, 0) > 0 && (line.revents & (POLLHUP | POLLERR)) != 0;
 }
 
 /* One write of the whole text, with errno set on failure. Descriptor 0 is never the modem's. */
@@ -57,7 +56,17 @@ ssize_t write_once(const char *text, uint32_t length)
     return write(fd, text, length);
 }
 
-/* One read. The end of data means the same as EIO: the line was hung up, and only a reopen brings it back. */
+/* One read. A line that has hung up reads as empty for ever: that is the EIO of a lost tty. */
+ssize_t read_line(int fd, char *buf, uint32_t length)
+{
+    const ssize_t count = amt_wait_read(fd, buf, length);
+    if (count == 0 && is_hung_up(fd)) {
+        errno = EIO;
+        return -1;
+    }
+    return count;
+}
+
 ssize_t read_once(char *buf, uint32_t length)
 {
     const int fd = g_handle_context.m_fd_at;
@@ -65,24 +74,26 @@ ssize_t read_once(char *buf, uint32_t length)
         errno = EBADF;
         return -1;
     }
-    return amt_wait_read(fd, buf, length);
+    return read_line(fd, buf, length);
 }
 
 int rewrite_after_reopen(const char *text, uint32_t length)
 {
-    const int status = reopen();
+    const int status = amt_at_open();
     if (status != PUB_ERR_NONE) {
         return status;
     }
+    errno = 0; /* a short write has no errno, and shows none of the reopening */
     return write_once(text, length) == static_cast<ssize_t>(length) ? PUB_ERR_NONE : PUB_ERR_FAIL;
 }
 
 int reread_after_reopen(char *buf, uint32_t length, ssize_t *count_ptr)
 {
-    const int status = reopen();
+    const int status = amt_at_open();
     if (status != PUB_ERR_NONE) {
         return status;
     }
+    errno = 0;
     *count_ptr = read_once(buf, length);
     return *count_ptr > 0 ? PUB_ERR_NONE : PUB_ERR_FAIL;
 }
@@ -120,17 +131,33 @@ int send_switch_off(int fd)
     return PUB_ERR_NONE;
 }
 
-int read_answer_piece(int fd, char *answer)
+/* What one wait for the modem's answer has given. */
+struct answer_st
 {
-    const ssize_t count = amt_wait_read(fd, answer, ANSWER_ROOM);
+    int m_status;
+    bool m_is_line_lost;
+    uint32_t m_length;
+    char m_text_a[ANSWER_SIZE];
+
+    bool holds(std::string_view text) const
+    {
+        return std::string_view(m_text_a, m_length).find(text) != std::string_view::npos;
+    }
+};
+
+void read_answer_piece(int fd, answer_st *answer_ptr)
+{
+    const ssize_t count = read_line(fd, answer_ptr->m_text_a, ANSWER_ROOM);
+    if (count > 0) {
+        answer_ptr->m_length = static_cast<uint32_t>(count);
+        return;
+    }
     if (count < 0) {
+        answer_ptr->m_is_line_lost = errno == EIO;
         pub_log_sys_call(g_amt_handle_log, "read");
-        fail_switch_off(__LINE__, PUB_ERR_FILE);
+        answer_ptr->m_status = fail_switch_off(__LINE__, PUB_ERR_FILE);
     }
-    if (count <= 0) {
-        pub_util_sleep_ms(LOST_TTY_PAUSE_MS);
-    }
-    return count < 0 ? PUB_ERR_FILE : PUB_ERR_NONE;
+    pub_util_sleep_ms(FAILED_TTY_PAUSE_MS);
 }
 
 int report_time_out(const timespec &start)
@@ -146,32 +173,28 @@ int report_time_out(const timespec &start)
 }
 
 /* Waits for one piece of the answer. Each piece replaces the one before it. */
-int wait_for_answer_piece(int fd, char *answer)
+answer_st wait_for_answer_piece(int fd)
 {
+    answer_st answer = {};
     timespec start = {};
     clock_gettime(CLOCK_REALTIME, &start);
     const int ready = amt_wait_readable(fd, WAIT_SECONDS * 1000);
     if (ready > 0) {
-        return read_answer_piece(fd, answer);
+        read_answer_piece(fd, &answer);
+    } else if (ready == 0) {
+        answer.m_status = report_time_out(start);
+    } else {
+        pub_log_sys_call(g_amt_handle_log, "select");
+        answer.m_status = fail_switch_off(__LINE__, PUB_ERR_FILE);
+        pub_util_sleep_ms(FAILED_TTY_PAUSE_MS);
     }
-    if (ready == 0) {
-        return report_time_out(start);
-    }
-    pub_log_sys_call(g_amt_handle_log, "select");
-    const int status = fail_switch_off(__LINE__, PUB_ERR_FILE);
-    pub_util_sleep_ms(LOST_TTY_PAUSE_MS);
-    return status;
+    return answer;
 }
 
-bool holds_error_result(const char *answer)
+bool holds_error_result(const answer_st &answer)
 {
-    static constexpr const char *error_a[] = {"\r\nERROR\r\n", "\r\n+CME ERROR: ", "\r\n+CMS ERROR: "};
-    for (const char *const error : error_a) {
-        if (strstr(answer, error) != nullptr) {
-            return true;
-        }
-    }
-    return false;
+    return answer.holds("\r\nERROR\r\n") || answer.holds("\r\n+CME ERROR: ") ||
+           answer.holds("\r\n+CMS ERROR: ");
 }
 
 } // namespace
@@ -210,10 +233,7 @@ int read_at(char *buf, uint32_t length, int32_t *count_ptr)
     }
     pub_print("[%s]read_at\n", PROGRAM);
     ssize_t count = read_once(buf, length);
-    if (count == 0) {
-        errno = EIO;
-    }
-    int status = count <= 0 ? get_transfer_error(false) : PUB_ERR_NONE;
+    int status = count < 0 ? get_transfer_error(false) : PUB_ERR_NONE;
     buf[count > 0 ? count : 0] = '\0';
     *count_ptr = static_cast<int32_t>(count);
     pub_print("[%s]read_at return:%s\n", PROGRAM, buf);
@@ -239,20 +259,36 @@ int disable_unsolicited_code(int fd)
     if (fd <= 0) {
         return fail_switch_off(__LINE__, PUB_ERR_PARAM);
     }
-    int status = send_switch_off(fd);
+    const int status = send_switch_off(fd);
     if (status != PUB_ERR_NONE) {
         return status;
     }
     /* A silent modem is waited for without limit: without its answer nothing that follows could be told
-     * apart. */
+     * apart. A line that is lost has no answer any more. */
     for (;;) {
-        char answer_a[ANSWER_SIZE] = {};
-        status = wait_for_answer_piece(fd, answer_a);
-        if (strstr(answer_a, "\r\nOK\r\n") != nullptr) {
-            return status;
+        const answer_st answer = wait_for_answer_piece(fd);
+        if (answer.m_is_line_lost || answer.holds("\r\nOK\r\n")) {
+            return answer.m_status;
         }
-        if (holds_error_result(answer_a)) {
+        if (holds_error_result(answer)) {
             return fail_switch_off(__LINE__, PUB_ERR_FAIL);
         }
     }
+}
+
+int amt_at_open()
+{
+    for (int32_t i = 0; i < AMT_TTY_AT_ATTEMPTS; i++) {
+        const int status = amt_tty_open_at();
+        if (status != PUB_ERR_NONE) {
+            return status;
+        }
+        disable_unsolicited_code(g_handle_context.m_fd_at);
+        if (!is_hung_up(g_handle_context.m_fd_at)) {
+            return PUB_ERR_NONE;
+        }
+        pub_util_sleep_ms(FAILED_TTY_PAUSE_MS);
+    }
+    errno = EIO;
+    return PUB_ERR_FILE;
 }

@@ -4,6 +4,7 @@
 #include <fcntl.h>
 #include <stdio.h>
 #include <string.h>
+#include <sys/socket.h>
 #include <unistd.h>
 
 #include <gtest/gtest.h>
@@ -282,6 +283,35 @@ TEST(at_read, a_lost_tty_is_opened_silenced_and_heard_again)
         EXPECT_EQ(capture.texts().back(), "receive <== \r\n^DMSN: 7\r\n");
         EXPECT_TRUE(capture.has("read_at ret_val[-118]"));
     }
+}
+
+TEST(at_read, of_nothing_is_a_good_one)
+{
+    const modem_line_c line;
+    line.answer("");
+    const log_capture_c capture;
+    const read_st result = read_some(100);
+    EXPECT_EQ(result.m_status, PUB_ERR_NONE);
+    EXPECT_EQ(result.m_count, 0);
+    EXPECT_EQ(result.m_text, "");
+    EXPECT_EQ(capture.texts(), (texts_t{"read_at read_len_ptr[0] buf_ptr[]", "receive <== "}));
+    EXPECT_EQ(line.commands(), texts_t{});
+}
+
+TEST(at_read, of_nothing_after_a_hang_up_is_a_loss)
+{
+    const lost_channel_c channel;
+    int fd_a[2];
+    ASSERT_EQ(socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0, fd_a), 0);
+    close(fd_a[1]);
+    amt_handle_close_fd(&g_handle_context.m_fd_at);
+    g_handle_context.m_fd_at = fd_a[0];
+    channel.m_tty.say(std::string(CONSENT) + "\r\n^DMSN: 7\r\n");
+    const log_capture_c capture;
+    EXPECT_EQ(read_some(100).m_text, "\r\n^DMSN: 7\r\n");
+    EXPECT_EQ(channel.m_tty.hear(10), SILENCE);
+    EXPECT_TRUE(capture.has("read_at read_len_ptr[-1] buf_ptr[]"));
+    EXPECT_TRUE(capture.has("read_at ret_val[-118]"));
 }
 
 TEST(at_read, a_tty_that_stays_lost_gives_the_error_of_its_opening)

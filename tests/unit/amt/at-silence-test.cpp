@@ -125,6 +125,29 @@ TEST(at_silence, does_not_wait_for_ever_to_be_heard)
     close(fd_a[1]);
 }
 
+TEST(at_silence, covers_a_piece_behind_its_zero_bytes)
+{
+    EXPECT_EQ(silence({std::string("\0\r\nOK\r\n", 7)}), PUB_ERR_NONE);
+    EXPECT_EQ(silence({std::string("\0\0\r\nERROR\r\n", 11)}), PUB_ERR_FAIL);
+}
+
+TEST(at_silence, ends_when_the_line_hangs_up)
+{
+    int fd_a[2];
+    ASSERT_EQ(socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0, fd_a), 0);
+    std::thread modem([&] {
+        char command_a[sizeof(SILENCE)] = {};
+        EXPECT_EQ(read(fd_a[1], command_a, sizeof(command_a)), 10);
+        close(fd_a[1]);
+    });
+    const log_capture_c capture;
+    EXPECT_EQ(disable_unsolicited_code(fd_a[0]), PUB_ERR_FILE);
+    modem.join();
+    EXPECT_EQ(without_line_numbers(capture),
+              (texts_t{"sys call: read() failed! errno = 5", fail_line(-118, EIO)}));
+    close(fd_a[0]);
+}
+
 TEST(at_silence, a_failing_read_is_no_end)
 {
     const modem_line_c line;
