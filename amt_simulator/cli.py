@@ -39,14 +39,14 @@ class HandsetGroup(click.Group):
             ctx.exit(FAILED)
 
 
-@click.group(cls=HandsetGroup)
+@click.group(cls=HandsetGroup, context_settings={"help_option_names": ["-h", "--help"]})
 @click.option("--dir", "directory", type=click.Path(path_type=Path), envvar="HANDSET_DIR",
               help="Directory of the handset to work on, when several are up.")
 @click.pass_context
 def handset(ctx: click.Context, directory: Path | None) -> None:
     """A simulated handset: the real daemon in a handset that a PC makes up."""
     # Parsing a subcommand's --help must not need a handset.
-    if ctx.invoked_subcommand != "up" and not {"--help"} & set(sys.argv[1:]):
+    if ctx.invoked_subcommand != "up" and not {"-h", "--help"} & set(sys.argv[1:]):
         ctx.obj = find(directory)
 
 
