@@ -15,8 +15,10 @@ from amt_simulator.inside.modem import Modem
 from amt_simulator.inside.modem_table import IDENTITIES
 from amt_station import wire
 from tools.bare_modem import bare_modem
+from tools.build import build
+from tools.project import PROJECT
 
-BUILD = Path("build/release")
+BUILD = PROJECT / "build" / "release"
 ROUNDS = "4000"
 EXCHANGE_ROUNDS = "2000"
 THROUGHPUT_BYTES = "40000000"
@@ -133,6 +135,7 @@ def main() -> int:
     parser.add_argument("--all-cores", action="store_true",
                         help="let the system place the processes, and measure that too")
     options = parser.parse_args()
+    build("release")
     print("Both sides take turns. A wake-up costs 5 or 50 microseconds, as the system places\n"
           'processes; "paired" compares turn by turn and takes the median of that.')
     if not options.all_cores:
@@ -148,10 +151,6 @@ def main() -> int:
         bench_pass_through(handset)
         show_size(handset)
     bench_exchange()
-    print("\nLeft out, because a described pause is part of them: every write of a factory file"
+    print("\nLeft out, because a pause is part of them: every write of a factory file"
           "\n(two pauses of 50 ms), power-off (2 s), the battery ADC (20 ms).")
     return 0
-
-
-if __name__ == "__main__":
-    sys.exit(main())

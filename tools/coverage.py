@@ -2,23 +2,24 @@
 
 import argparse
 import json
-import os
 import subprocess
-import sys
 
-from tools.run_tests import (PROJECT, RESULTS, SYSTEM_WORKERS, Count, Suite, ctest, run, say,
-                             system)
+from tools.build import build
+from tools.project import CORES, PROJECT, say
+from tools.results import Count
+from tools.run_tests import run_suite
+from tools.suites import SYSTEM_WORKERS, Suite, system
 
 BUILD = PROJECT / "build" / "coverage"
 REPORT = PROJECT / "build" / "coverage-report"
 ROOMS = ("amt", "pub")
 
 # Counting makes a daemon slower, and it writes hundreds of files when it ends.
-PATIENCE = {"HANDSET_TIME_SCALE": "3"}
+PATIENCE = {"HANDSET_TIME_SCALE": "12"}
 
 SUITES = (
-    Suite("unit", "coverage", ctest("coverage"), {}),
-    Suite("system", "coverage", system("coverage", SYSTEM_WORKERS), PATIENCE),
+    Suite("unit-coverage", "coverage"),
+    system("system-coverage", "coverage", SYSTEM_WORKERS, PATIENCE),
 )
 
 
@@ -31,7 +32,7 @@ def forget_counts() -> None:
 def gcovr(*options: str) -> str:
     """Put the counts together for the daemon's own code."""
     command = [
-        "gcovr", "--root", str(PROJECT), str(BUILD), "-j", str(os.cpu_count() or 1),
+        "gcovr", "--root", str(PROJECT), str(BUILD), "-j", str(CORES),
         "--exclude-throw-branches", "--exclude-unreachable-branches",
         # Counts of threads that meet in a branch can come out a little off.
         "--gcov-ignore-parse-errors"]
@@ -63,17 +64,13 @@ def main() -> int:
                         help="report what the last run has counted")
     total = Count()
     if not parser.parse_args().report_only:
+        build("coverage")
         forget_counts()
-        RESULTS.mkdir(parents=True, exist_ok=True)
         for suite in SUITES:
-            total.add(run(suite))
+            total.add(run_suite(suite))
     say("report")
     verdict = write_report()
     if total.failed:
         print(f"tests: {total}")
     print(verdict)
     return 1 if total.failed else 0
-
-
-if __name__ == "__main__":
-    sys.exit(main())

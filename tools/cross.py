@@ -4,13 +4,13 @@ import argparse
 import os
 import shutil
 import subprocess
-import sys
 import tempfile
 from pathlib import Path
 
-from tools.run_tests import read_count
+from tools.build import build
+from tools.ctest import run_ctest
+from tools.project import PROJECT, note, say
 
-PROJECT = Path(__file__).resolve().parents[1]
 BUILD = PROJECT / "build" / "armhf"
 SYSROOT = PROJECT / "build" / "armhf-sysroot"
 
@@ -30,11 +30,6 @@ LEFT_OUT = {
     r"_death_test\.": "start themselves again",
     r"^pub\..*serial_speed.*/(460801|3000000|2147483647)$": "the emulator does not know B921600",
 }
-
-
-def say(text: str) -> None:
-    """Say what is going on; standard output stays for the results."""
-    print(f"\n== {text}", file=sys.stderr, flush=True)
 
 
 def release() -> str:
@@ -108,27 +103,16 @@ def run_tests() -> int:
     """Run the unit tests that can be run under emulation."""
     say("unit tests under emulation; left out:")
     for pattern, reason in LEFT_OUT.items():
-        print(f"   {pattern:40} {reason}", file=sys.stderr)
-    report = BUILD / "unit.xml"
-    report.unlink(missing_ok=True)
-    status = subprocess.run(
-        ["ctest", "--test-dir", str(BUILD), "--output-on-failure", "--no-tests=error", "-Q",
-         "-j", str(os.cpu_count() or 1), "--timeout", TEST_SECONDS, "--output-junit", str(report),
-         "-E", "|".join(LEFT_OUT)],
-        check=False, stdin=subprocess.DEVNULL).returncode
-    print(read_count(report) if report.exists() else "FAIL: no test ran")
-    return 1 if status else 0
+        note(f"{pattern:40} {reason}")
+    results = run_ctest(BUILD, "unit under emulation", "--timeout", TEST_SECONDS,
+                        "-E", "|".join(LEFT_OUT))
+    print(results.count if results.count.passed else "FAIL: no test ran")
+    return 1 if results.count.failed or not results.count.passed else 0
 
 
 def main() -> int:
-    """Prepare for the build, or test what was built."""
-    parser = argparse.ArgumentParser(prog="./dev cross", description=__doc__)
-    parser.add_argument("step", choices=("prepare", "test"))
-    if parser.parse_args().step == "prepare":
-        make_sysroot()
-        return 0
+    """Fetch, build and test."""
+    argparse.ArgumentParser(prog="./dev cross", description=__doc__).parse_args()
+    make_sysroot()
+    build("armhf")
     return run_tests()
-
-
-if __name__ == "__main__":
-    sys.exit(main())

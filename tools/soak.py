@@ -13,6 +13,7 @@ from amt_station.link import Link
 from amt_station.requests.model import Channel
 from amt_station.requests.operations import Value, operation_packet
 from amt_station.requests.table import find_operation
+from tools.build import build
 
 # How much more than at first the daemon may hold, however long it has worked.
 RESIDENT_BOUND_KIB = 512
@@ -238,13 +239,12 @@ def main() -> int:
     parser = argparse.ArgumentParser(prog="./dev soak", description=__doc__)
     parser.add_argument("minutes", nargs="?", type=float, default=10.0)
     seconds = parser.parse_args().minutes * 60
+    if not 0 < seconds < float("inf"):
+        parser.error("the minutes are a number above 0")
+    build("release", ("--target", "handset"))
     results = soak_all(seconds)
     print(*results.values(), sep="\n")
     failed = [name for name, result in results.items() if result.error]
     print(f"FAIL: {', '.join(failed)}" if failed else
           f"PASS: nothing grew in {seconds:.0f} s (resident set within {RESIDENT_BOUND_KIB} KiB)")
     return 1 if failed else 0
-
-
-if __name__ == "__main__":
-    sys.exit(main())

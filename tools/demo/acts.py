@@ -1,9 +1,7 @@
 """Run the acts: `./dev demo`."""
 
 import argparse
-import sys
 import time
-from pathlib import Path
 
 from amt_simulator import Handset
 from amt_simulator.errors import HandsetError
@@ -11,14 +9,16 @@ from amt_simulator.waiting import wait_until
 from amt_station.link import Link
 from amt_station.requests.model import Channel
 from amt_station.wire.packet import Packet
+from tools.build import build
 from tools.demo.stage import Stage
+from tools.project import PROJECT
 
 IMEI = "490154203237518"
 SERIAL = "KEL0000000042"
 BT_ADDRESS = "00:1A:7D:DA:71:13"
 WIFI_ADDRESS = "00:1A:7D:DA:71:14"
 PCBA = "PCBA-2026-000123"
-PICTURE = Path("build/demo/handshake.png")
+PICTURE = PROJECT / "build" / "demo" / "handshake.png"
 PICTURE_SECONDS = 15.0
 
 
@@ -134,6 +134,7 @@ def insert_cable(stage: Stage) -> None:
 def main() -> int:
     """Play every act and give the verdict."""
     argparse.ArgumentParser(prog="./dev demo", description=__doc__).parse_args()
+    build("release", ("--target", "handset"))
     PICTURE.parent.mkdir(parents=True, exist_ok=True)
     started = time.monotonic()
     stage = Stage()
@@ -142,12 +143,5 @@ def main() -> int:
             act(stage)
     except (HandsetError, TimeoutError) as error:
         stage.check("the handset", str(error), False)
-    except KeyboardInterrupt:
-        print("\ninterrupted", file=sys.stderr)
-        return 130
     print(f"\n{time.monotonic() - started:.0f} seconds", end="")
     return stage.verdict()
-
-
-if __name__ == "__main__":
-    sys.exit(main())

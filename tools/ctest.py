@@ -1,0 +1,41 @@
+"""The unit tests of a build, by ctest: how far they are, and which did not pass."""
+
+import re
+from pathlib import Path
+from typing import Mapping
+
+from tools import children
+from tools.progress import Progress
+from tools.project import CORES, note
+from tools.results import Results, describe, read_results
+
+# ctest's line for a test that has ended.
+STEP = re.compile(rb"^ *(\d+)/(\d+) Test +#", re.MULTILINE)
+
+
+def run_ctest(build: Path, name: str, *options: str, report: Path | None = None,
+              environment: Mapping[str, str] | None = None) -> Results:
+    """Run the tests of a BUILD; the failed ones are printed with their output, and the skipped.
+
+    A runner that ends badly without a failed test counts as one.
+    """
+    report = report or build / "unit.xml"
+    report.unlink(missing_ok=True)
+    progress = Progress(name)
+
+    def take(piece: bytes) -> None:
+        steps = STEP.findall(piece)
+        if steps:
+            progress.show(int(steps[-1][0]), int(steps[-1][1]))
+
+    status = children.run(
+        ["ctest", "--test-dir", str(build), "--no-tests=error", "-j", str(CORES),
+         "--output-junit", str(report), *options], take, environment)
+    progress.close()
+    results = read_results(report)
+    if results.failed or results.skipped:
+        print(describe(results), flush=True)
+    if status != 0 and results.count.failed == 0:
+        note(f"{name}: ctest ended with status {status}")
+        results.count.failed = 1
+    return results

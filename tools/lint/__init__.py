@@ -1,0 +1,1 @@
+"""Looks at every source file without running it."""

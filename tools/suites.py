@@ -1,0 +1,55 @@
+"""The test suites as data: what each runs, on which build, in which order."""
+
+from dataclasses import dataclass, field
+from typing import Mapping
+
+from tools.project import CORES
+
+# Most of a system test is waiting for a pause of the daemon: more than one a core run at once.
+SYSTEM_WORKERS = 6 * CORES
+
+# A sanitized daemon is several times slower, and so is a machine that runs several of them.
+SANITIZED_WORKERS = 4 * CORES
+
+# The deadlines of the tests are for a machine that does nothing else. Here builds run beside them;
+# a deadline is only there to end a test that hangs, and one that is far away costs nothing.
+PATIENCE: Mapping[str, str] = {"HANDSET_TIME_SCALE": "6"}
+SANITIZED_PATIENCE: Mapping[str, str] = {"HANDSET_TIME_SCALE": "12"}
+
+# The part of a build that the simulated handset needs.
+HANDSET, ALL = "handset", "all"
+
+
+@dataclass(frozen=True)
+class Suite:
+    """One run of one test runner on one build."""
+
+    name: str
+    preset: str
+    # What pytest is given; a suite without is the unit tests, which ctest runs.
+    arguments: tuple[str, ...] = ()
+    environment: Mapping[str, str] = field(default_factory=dict)
+    target: str = ALL
+    # Run only when asked for by name.
+    is_extra: bool = False
+
+
+def system(name: str, preset: str, workers: int, patience: Mapping[str, str]) -> Suite:
+    """The whole daemon of a build, in the simulated handset."""
+    return Suite(name, preset, ("tests/system", f"--handset-build={preset}", "-n", str(workers)),
+                 patience, HANDSET)
+
+
+# In the order in which they run: what needs no build first, then what needs a short one, while
+# what the others need is being built.
+SUITES = (
+    Suite("station", "", ("tests/station", "tests/scripts", "-n", str(2 * CORES))),
+    system("system", "release", SYSTEM_WORKERS, PATIENCE),
+    Suite("unit", "release"),
+    Suite("soak", "release", ("tests/soak",), PATIENCE, HANDSET),
+    system("system-asan", "asan", SANITIZED_WORKERS, SANITIZED_PATIENCE),
+    system("system-tsan", "tsan", SANITIZED_WORKERS, SANITIZED_PATIENCE),
+    Suite("fuzz", "fuzz", ("tests/fuzz", "-n", str(CORES))),
+    Suite("unit-asan", "asan", is_extra=True),
+    Suite("unit-tsan", "tsan", is_extra=True),
+)
