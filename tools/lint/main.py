@@ -7,6 +7,7 @@ import time
 from tools.lint.cpp import check_format, check_tidy
 from tools.lint.files import changed_since, has_commit, project_files, relative
 from tools.lint.scripts import check_shell, check_style, check_types
+from tools.lint.structure import check_structure
 from tools.lint.verdict import Check
 from tools.project import die, note
 
@@ -16,7 +17,11 @@ CHECKS: dict[str, Check] = {
     "flake8": check_style,
     "mypy": check_types,
     "clang-tidy": check_tidy,
+    "structure": check_structure,
 }
+
+# Not yet green.
+UNASKED = ("structure",)
 
 
 def choose_files(paths: list[str], since: str | None) -> list[str]:
@@ -41,7 +46,7 @@ def main() -> int:
     parser.add_argument("--check", action="append", choices=CHECKS,
                         help="only this check, or these (given more than once)")
     options = parser.parse_args()
-    chosen = options.check or list(CHECKS)
+    chosen = options.check or [name for name in CHECKS if name not in UNASKED]
     files = choose_files(options.path, options.since)
     failed, checked = [], 0
     for name in chosen:

@@ -1,0 +1,46 @@
+"""The house as data: what stands on what. `./dev lint` holds it; docs/architecture.md explains it.
+
+A floor is a row of rooms. What lies in a room includes, or imports, from its own room and its own
+floor and from the floors above it in these tables, which are below it in the house: never up. Two
+rooms of one floor do not include each other. A path belongs to the longest name that fits.
+"""
+
+Floors = tuple[tuple[str, ...], ...]
+
+CPP_FLOORS: Floors = (
+    ("platform/include",),
+    ("pub/error.h",),
+    ("pub/log", "pub/pub-log.h"),
+    ("pub/file",),
+    ("pub/util", "pub/cfg"),
+    ("pub/pty",),
+    ("amt/amt-buf.h", "amt/amt-byte-order.h", "amt/amt-log.h", "amt/amt-atom", "amt/amt-command",
+     "amt/amt-checksum", "amt/amt-packet", "amt/amt-convert"),
+    ("amt/amt-cfg",),
+    ("amt/amt-handle/channel",),
+    ("amt/amt-handle/request", "amt/amt-device", "amt/amt-gps"),
+    ("amt/amt-handle/at",),
+    ("amt/amt-handle/reader",),
+    ("amt/amt-handle",),
+    ("amt/main.cpp",),
+    # What the daemon never includes.
+    ("platform/host", "cmake"),
+    ("tests",),
+)
+
+PYTHON_FLOORS: Floors = (
+    ("amt_station/wire",),
+    ("amt_station/requests",),
+    ("amt_station",),
+    ("amt_station/cli", "amt_simulator/inside"),
+    ("amt_simulator",),
+    ("tools", "amt", "platform"),
+    ("tests",),
+)
+
+# Headers of fewer lines than HEADER_LINES, each with its reason.
+HEADER_LINES = 13
+SHORT_HEADERS: dict[str, str] = {}
+
+# No file is longer, but for texts and data.
+FILE_LINES = 500
