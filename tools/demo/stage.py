@@ -1,6 +1,7 @@
 """What the demo shows: every exchange decoded, timed, and whether it came out as it should."""
 
 import sys
+import textwrap
 from dataclasses import dataclass, field
 from pathlib import Path
 from typing import Callable, Mapping
@@ -14,7 +15,11 @@ from amt_station.requests.table import display_name, find_operation, requests_by
 from amt_station.wire.decoder import Acknowledgement, Frame, Item, Text
 from amt_station.wire.packet import Packet
 
-WIDTHS = (26, 56)
+WIDTH = 100
+NAME_WIDTH = 26
+INDENT = " " * (8 + 2 + 6 + 2 + NAME_WIDTH + 2)
+# A short exchange stands in one line, its answer in a column of its own.
+SENT_WIDTH = 30
 
 
 @dataclass
@@ -30,17 +35,16 @@ class Stage:
 
     def say(self, text: str) -> None:
         """A line between two exchanges."""
-        print(f"{'':8}  {text}", flush=True)
+        print(f"{'':18}{text}", flush=True)
 
     def row(self, milliseconds: float | None, what: str, sent: str, received: list[str],
             good: bool) -> None:
         """One exchange."""
         time = f"{milliseconds:5.1f} ms" if milliseconds is not None else ""
-        mark = "ok" if good else "FAILED"
-        first, *rest = received or ["(nothing)"]
-        print(f"{time:>8}  {what:{WIDTHS[0]}}  {sent:{WIDTHS[1]}}  {first}  [{mark}]")
-        for line in rest:
-            print(f"{'':8}  {'':{WIDTHS[0]}}  {'':{WIDTHS[1]}}  {line}")
+        head = f"{time:>8}  {'ok' if good else 'FAILED':6}  {what:{NAME_WIDTH}}"
+        for line in _fitted(sent, received or ["(nothing)"]):
+            print(f"{head:{len(INDENT)}}{line}".rstrip())
+            head = ""
         sys.stdout.flush()
         if good:
             self.passed += 1
@@ -121,6 +125,19 @@ class Stage:
             return 1
         print(f"PASS: {total} steps")
         return 0
+
+
+def _fitted(sent: str, received: list[str]) -> list[str]:
+    """An exchange in lines that fit behind the name."""
+    room = WIDTH - len(INDENT)
+    first, *rest = received
+    if len(joined := f"{sent:{SENT_WIDTH}}  {first}".strip()) <= room:
+        lines = [joined, *rest]
+    else:
+        lines = [sent, *received]
+    return [piece for line in lines if line
+            for piece in textwrap.wrap(line, room, subsequent_indent="   ",
+                                       break_on_hyphens=False)]
 
 
 def _plain(value: object) -> object:
