@@ -9,10 +9,10 @@
 #include "amt/amt-cfg.h"
 #include "amt/amt-handle/channel/at-io.h"
 #include "amt/amt-handle/channel/context.h"
-#include "amt/amt-handle/channel/handshake.h"
 #include "amt/amt-handle/channel/identity-slots.h"
 #include "amt/amt-handle/channel/service-process.h"
 #include "amt/amt-handle/channel/tty.h"
+#include "amt/amt-handle/handshake.h"
 #include "amt/amt-handle/reader/app-reader.h"
 #include "amt/amt-handle/reader/modem-reader.h"
 #include "amt/amt-handle/reader/pc-reader.h"
@@ -39,16 +39,6 @@ constexpr char WIFI_FOLDER[] = "/amt/WIFI";
 constexpr uint32_t PC_TTY_PAUSE_MS = 1000;
 
 std::atomic<int> g_is_deinit_done;
-
-int check_handshake()
-{
-    PUB_LOG(g_amt_handle_log, "will treat handshake.");
-    g_handshake_state.m_is_done = 0;
-    g_handshake_state.m_is_ready = 0;
-    g_handshake_state.m_usb_enum_timer.m_id = -1;
-    g_handshake_state.m_handshake_timer.m_id = -1;
-    return amt_handshake_check_permission();
-}
 
 void prepare_factory_data()
 {
@@ -148,9 +138,7 @@ int open_pc_path()
 int init_for_amt_1_4()
 {
     pub_log_entry(g_amt_handle_log);
-    if (g_usb_activate != 0) {
-        amt_handshake_start_usb_enum_timer();
-    }
+    amt_handshake_begin();
     const int status = open_pc_path();
     if (status == PUB_ERR_NONE) {
         return PUB_ERR_NONE;
@@ -217,9 +205,7 @@ int amt_handle_init(int normal_mode)
     pub_log_entry(g_amt_handle_log);
     amt_service_process_mark();
     g_handle_state.m_amt_mode = AMT_MODE_1;
-    g_handshake_state.m_is_property_set = 0;
-    g_handshake_state.m_is_ac_power = 0;
-    if (g_usb_activate != 0 && check_handshake() != PUB_ERR_NONE) {
+    if (amt_handshake_ask_permission() != PUB_ERR_NONE) {
         return PUB_ERR_FAIL;
     }
     prepare_factory_data();
@@ -246,10 +232,6 @@ int amt_handle_deinit()
     amt_handle_close_fd(&g_handle_context.m_fd_pc);
     amt_handle_close_fd(&g_handle_context.m_fd_at);
     amt_handle_close_fd(&g_handle_context.m_fd_modem);
-    amt_timer_delete(&g_handshake_state.m_usb_enum_timer);
-    amt_timer_delete(&g_handshake_state.m_handshake_timer);
-    if (g_usb_activate != 0 && g_handshake_state.m_is_property_set.exchange(1) == 0) {
-        amt_set_handshake_property();
-    }
+    amt_handshake_end();
     return PUB_ERR_NONE;
 }

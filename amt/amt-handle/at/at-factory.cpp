@@ -8,8 +8,8 @@
 
 #include "amt/amt-handle/at/at-operand.h"
 #include "amt/amt-handle/at/at-reply.h"
-#include "amt/amt-handle/channel/handshake.h"
 #include "amt/amt-handle/request/factory-file.h"
+#include "amt/amt-handle/request/handshake-permission.h"
 #include "amt/amt-handle/request/identity-store.h"
 #include "amt/amt-log.h"
 #include "pub/error.h"
@@ -21,7 +21,6 @@ constexpr uint32_t LINE_SIZE = 100;
 
 constexpr int PCBA_READ = 1;
 constexpr int PCBA_WRITE = 2;
-constexpr int PERMISSION_READ = 2;
 
 int fail_param(const char *func, int line, const char *text)
 {
@@ -177,7 +176,7 @@ int amt_at_control_permission(const char *operands)
     if (handle_amt_damt1_operation(type, &flag) != PUB_ERR_NONE) {
         return amt_at_reply_error();
     }
-    return type == PERMISSION_READ ? amt_at_reply("\r\n^DAMT1: %d\r\n\r\nOK\r\n", flag) : amt_at_reply_ok();
+    return type == static_cast<int>(amt_permission_en::READ) ? amt_at_reply("\r\n^DAMT1: %d\r\n\r\nOK\r\n", flag) : amt_at_reply_ok();
 }
 
 int amt_at_test_only(const char *)

@@ -1,25 +1,20 @@
 #include "amt/amt-handle/reader/modem-reader.h"
 
 #include <errno.h>
-#include <string.h>
 #include <unistd.h>
 
 #include "amt/amt-handle/channel/context.h"
-#include "amt/amt-handle/channel/handshake.h"
 #include "amt/amt-handle/channel/process-end.h"
 #include "amt/amt-handle/channel/service-process.h"
 #include "amt/amt-handle/channel/wait.h"
+#include "amt/amt-handle/handshake.h"
 #include "amt/amt-handle/reader/identity-completion.h"
-#include "amt/amt-handle/request/identity-store.h"
 #include "amt/amt-log.h"
-#include "pub/error.h"
 #include "pub/util/thread-end.h"
 
 namespace {
 
 constexpr uint32_t EMPTY_READ_PAUSE_MS = 100;
-constexpr char USB_STATE_FILE[] = "/sys/class/android_usb/android0/state";
-constexpr uint32_t USB_STATE_SIZE = 100;
 
 /* Reads once, behind what is held. Returns whether anything came. */
 bool read_chunk()
@@ -56,36 +51,6 @@ bool pass_to_pc()
     return true;
 }
 
-/* The link may have been configured before the USB monitor listened. */
-void look_at_usb_state()
-{
-    char text_a[USB_STATE_SIZE];
-    if (amt_read_data_from_file(text_a, sizeof(text_a), USB_STATE_FILE) != PUB_ERR_NONE) {
-        return;
-    }
-    PUB_LOG(g_amt_handle_log, "readed success from file(%s). value: %s.", USB_STATE_FILE, text_a);
-    if (strstr(text_a, "CONFIGURED") != nullptr) {
-        amt_timer_delete(&g_handshake_state.m_usb_enum_timer);
-        g_handshake_state.m_is_ready = 1;
-    }
-}
-
-void drive_handshake()
-{
-    if (g_usb_activate == 0) {
-        return;
-    }
-    if (g_handshake_state.m_is_ready == 0) {
-        look_at_usb_state();
-    }
-    if (g_handshake_state.m_is_ready != 0 && g_handshake_state.m_is_done == 0 &&
-        g_handshake_state.m_handshake_timer.m_id == -1)
-    {
-        PUB_LOG(g_amt_handle_log, "will create timer.");
-        amt_handshake_start_timer();
-    }
-}
-
 bool is_line_open()
 {
     return g_handle_context.m_fd_pc >= 1 && g_handle_context.m_fd_modem >= 1;
@@ -101,7 +66,7 @@ bool read_and_pass()
     if (!pass_to_pc()) {
         return false;
     }
-    drive_handshake();
+    amt_handshake_modem_data();
     return true;
 }
 

@@ -9,9 +9,9 @@
 #include "amt/amt-handle/channel/reply.h"
 #include "amt/amt-handle/channel/service-process.h"
 #include "amt/amt-handle/channel/wait.h"
+#include "amt/amt-handle/handshake.h"
 #include "amt/amt-handle/reader/dispatch.h"
 #include "amt/amt-handle/reader/identity-capture.h"
-#include "amt/amt-handle/reader/pc-handshake.h"
 #include "amt/amt-log.h"
 #include "pub/error.h"
 #include "pub/util/thread-end.h"
@@ -63,7 +63,9 @@ bool read_and_serve()
     }
     req_ptr->m_buf_len += static_cast<uint32_t>(count);
     pub_log_dump(g_amt_handle_log, "handle PC req data: ", req_ptr->m_buf_a, req_ptr->m_buf_len);
-    amt_pc_handshake_on_data();
+    if (amt_handshake_pc_data()) {
+        amt_handshake_show_success();
+    }
     amt_at_probe_rewrite();
     return serve_request();
 }

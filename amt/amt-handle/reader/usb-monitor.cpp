@@ -7,9 +7,9 @@
 #include <unistd.h>
 
 #include "amt/amt-handle/channel/context.h"
-#include "amt/amt-handle/channel/handshake.h"
 #include "amt/amt-handle/channel/process-end.h"
 #include "amt/amt-handle/channel/wait.h"
+#include "amt/amt-handle/handshake.h"
 #include "amt/amt-log.h"
 #include "pub/util/thread-end.h"
 
@@ -80,14 +80,13 @@ void note_usb_state(const char *status)
     if (strstr(status, "DISCONNECTED") != nullptr) {
         g_handle_state.m_usb_state = AMT_USB_DISCONNECTED;
         PUB_LOG(g_amt_handle_log, "amt_handle_monitor_usb_loop get usb disconnect event");
-        g_handshake_state.m_is_ready = 0;
+        amt_handshake_link_down();
         return;
     }
     if (strstr(status, "CONFIGURED") != nullptr) {
         g_handle_state.m_usb_state = AMT_USB_CONFIGURED;
         PUB_LOG(g_amt_handle_log, "amt_handle_monitor_usb_loop get usb CONFIGURED event");
-        amt_timer_delete(&g_handshake_state.m_usb_enum_timer);
-        g_handshake_state.m_is_ready = 1;
+        amt_handshake_link_up();
         return;
     }
     g_handle_state.m_usb_state = AMT_USB_OTHER;

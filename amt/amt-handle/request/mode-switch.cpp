@@ -7,7 +7,7 @@
 
 #include "amt/amt-command.h"
 #include "amt/amt-handle/channel/at-exchange.h"
-#include "amt/amt-handle/channel/handshake.h"
+#include "amt/amt-handle/request/handshake-permission.h"
 #include "amt/amt-handle/request/power-off.h"
 #include "amt/amt-handle/request/request-frame.h"
 #include "amt/amt-packet.h"

@@ -1,0 +1,63 @@
+#include "amt/amt-handle/request/handshake-permission.h"
+
+#include <errno.h>
+#include <stdlib.h>
+#include <string.h>
+
+#include "amt/amt-handle/request/factory-file.h"
+#include "amt/amt-handle/request/identity-store.h"
+#include "amt/amt-log.h"
+#include "pub/error.h"
+
+namespace {
+
+/* Makes the digit durable. The log says which step failed. */
+int amt_write_content_to_file_sync(const char *digit)
+{
+    switch (amt_factory_file_write(AMT_PERMISSION_FILE, digit)) {
+    case amt_factory_step_en::DONE:
+        PUB_LOG(g_amt_handle_log, "Writed to file(%s) success.flag: %s.", AMT_PERMISSION_FILE, digit);
+        return PUB_ERR_NONE;
+    case amt_factory_step_en::OPEN_FAILED:
+        pub_log_error(g_amt_handle_log, PUB_ERR_FILE);
+        PUB_LOG(g_amt_handle_log, "open(\"%s\") fail: %d - %s", AMT_PERMISSION_FILE, errno, strerror(errno));
+        break;
+    case amt_factory_step_en::WRITE_FAILED:
+        pub_log_error(g_amt_handle_log, PUB_ERR_FILE);
+        PUB_LOG(g_amt_handle_log, "fputs fail: %d - %s", errno, strerror(errno));
+        break;
+    }
+    return PUB_ERR_FILE;
+}
+
+} // namespace
+
+int handle_amt_damt1_operation(int operation, int *flag_ptr)
+{
+    char text_a[AMT_PERMISSION_TEXT_SIZE];
+    bool is_read = false;
+    switch (static_cast<amt_permission_en>(operation)) {
+    case amt_permission_en::FORBID:
+    case amt_permission_en::PERMIT:
+        if (amt_write_content_to_file_sync(operation == 0 ? "0" : "1") != PUB_ERR_NONE) {
+            pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
+            PUB_LOG(g_amt_handle_log, "write error to do-not-permit-handshake file.");
+            return PUB_ERR_FAIL;
+        }
+        *flag_ptr = operation;
+        return PUB_ERR_NONE;
+    case amt_permission_en::READ:
+        *flag_ptr = amt_permission_read(text_a, &is_read);
+        return PUB_ERR_NONE;
+    }
+    pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
+    PUB_LOG(g_amt_handle_log, "unknown operation type: %u", static_cast<unsigned>(operation));
+    return PUB_ERR_PARAM;
+}
+
+int amt_permission_read(char *text_ptr, bool *is_read_ptr)
+{
+    const int status = amt_read_data_from_file(text_ptr, AMT_PERMISSION_TEXT_SIZE, AMT_PERMISSION_FILE);
+    *is_read_ptr = status == PUB_ERR_NONE;
+    return *is_read_ptr ? atoi(text_ptr) : static_cast<int>(amt_permission_en::PERMIT);
+}
