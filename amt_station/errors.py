@@ -14,7 +14,9 @@ EXIT_NO_PORT = 3
 EXIT_BUSY = 4
 EXIT_NO_ANSWER = 5
 EXIT_BAD_FRAME = 6
+EXIT_DEFECT = 7
 EXIT_INTERRUPTED = 130
+EXIT_TERMINATED = 143
 
 
 class StationError(Exception):
@@ -36,6 +38,16 @@ class UsageProblem(StationError):
 
     exit_status = EXIT_USAGE
     kind = "usage"
+
+
+class ValueProblem(UsageProblem):
+    """A value that its field does not take."""
+
+    def __init__(self, key: str, reason: str) -> None:
+        """``key`` is the field's name."""
+        super().__init__(f"{key}: {reason}")
+        self.key = key
+        self.reason = reason
 
 
 class NoPort(StationError):
@@ -64,6 +76,18 @@ class NoAnswer(StationError):
         self.arrived = tuple(arrived)
 
 
+class OutOfStep(NoAnswer):
+    """The link lost its place and could not find it again; nothing was sent but the search."""
+
+    kind = "out-of-step"
+
+
+class IncompleteAnswer(StationError):
+    """The handset said yes, but its answer does not hold what was asked for."""
+
+    kind = "incomplete-answer"
+
+
 class BadFrame(StationError):
     """The handset answered with bytes that are not a proper frame."""
 
@@ -83,6 +107,16 @@ class Interrupted(StationError):
 
     def __init__(self) -> None:
         super().__init__("interrupted")
+
+
+class Terminated(StationError):
+    """Somebody asked the process to end."""
+
+    exit_status = EXIT_TERMINATED
+    kind = "terminated"
+
+    def __init__(self) -> None:
+        super().__init__("terminated")
 
 
 class Held(str, Enum):
@@ -115,9 +149,14 @@ class Refused(StationError):
     kind = "refused"
 
     def __init__(self, message: str, *, code: int | None = None, response: int | None = None,
-                 held: Held = Held.NOTHING) -> None:
-        """``code`` is the result code, ``response`` the id of the packet that carried it."""
-        super().__init__(message)
+                 held: Held = Held.NOTHING, causes: Sequence[str] = ()) -> None:
+        """``code`` is the result code, ``response`` the id of the packet that carried it.
+
+        ``causes`` are the known reasons for such a refusal.
+        """
+        reasons = f": {'; or '.join(causes)}" if causes else ""
+        super().__init__(message + reasons)
+        self.causes = tuple(causes)
         self.code = code
         self.response = response
         self.held = held
@@ -129,4 +168,5 @@ class Refused(StationError):
 
     def details(self) -> dict[str, Any]:
         return {**super().details(), "code": self.code, "response": self.response,
-                "held": self.held.value or None, "advice": self.advice or None}
+                "held": self.held.value or None, "causes": list(self.causes),
+                "advice": self.advice or None}

@@ -1,21 +1,32 @@
-"""One end of the line: send a request or an AT text and wait for what comes back."""
+"""One end of the line: send a request or an AT text and wait for what comes back.
+
+A link is in step when everything that was sent has been answered. An exchange that ends without its
+answer leaves it out of step: the answer may still come, and would then pass for another's. Before
+the next exchange such a link finds its place again by itself, or raises ``OutOfStep``.
+
+One link has one user at a time: threads that share one take turns, an exchange being one turn.
+``Link.turn`` holds the turn over several exchanges.
+"""
 
 from __future__ import annotations
 
+import math
+import threading
 import time
+from contextlib import contextmanager
 from dataclasses import dataclass
 from types import TracebackType
-from typing import Iterator
+from typing import Callable, Iterator
 
-from amt_station import judge
-from amt_station.errors import BadFrame, NoAnswer, Refused, StationError, UsageProblem
-from amt_station.exchange import AtReply, Exchange, TimedItem, split_reply
+from amt_station import diagnosis, judge, log
+from amt_station.errors import BadFrame, OutOfStep, StationError, UsageProblem
+from amt_station.exchange import AtReply, Exchange, Purpose, ReplyReader, TimedItem, Transcript
+from amt_station.place import Place, Search, search
 from amt_station.port import Port, SerialPort
-from amt_station.requests.at_commands import FLUSH_COMMAND
 from amt_station.requests.model import Channel
 from amt_station.requests.table import display_name, requests_by_id
-from amt_station.wire.decoder import (Acknowledgement, BareDecoder, Decoder, EnvelopeDecoder, Frame,
-                                      Item, Skipped, Text)
+from amt_station.text import printable
+from amt_station.wire.decoder import BareDecoder, Decoder, EnvelopeDecoder, Frame, Item, Text
 from amt_station.wire.envelope import LARGEST_REQUEST, encode_request
 from amt_station.wire.errors import WireError
 from amt_station.wire.packet import Packet
@@ -26,6 +37,25 @@ RECOVER_TIMEOUT = 3.0
 # A frame's bytes follow each other closely; after so long a silence its rest will not come.
 _SILENCE = 0.3
 _DRAIN_SECONDS = 1.0
+_MOST_DRAINED = 4096
+
+# Behind the answer to a search the line has to be silent for so long: a late OK of a lost text may
+# have been taken for it, and then the true one follows.
+_QUIET = 0.05
+_QUIET_AFTER_TEXT = 0.5
+_LONGEST_UNREST = 3.0
+
+# After something that speaks against an answer, it comes within this time or not at all.
+_DOUBT_SECONDS = 0.5
+
+Observer = Callable[[Transcript], None]
+
+
+@dataclass
+class Deadline:
+    """Seconds from the sending, which may be shortened while waiting."""
+
+    seconds: float
 
 
 @dataclass(frozen=True)
@@ -37,21 +67,41 @@ class Recovery:
 
 
 class Link:
-    """A line to the handset; a context manager that closes its port."""
+    """A line to the handset; a context manager that closes its port.
 
-    def __init__(self, port: Port, channel: Channel = Channel.PC,
-                 timeout: float | None = None) -> None:
-        """``timeout`` in seconds overrides the time that each request is given by itself."""
+    Threads that share a link take turns, an exchange being one turn.
+    """
+
+    def __init__(self, port: Port, channel: Channel = Channel.PC, timeout: float | None = None,
+                 reopen: Callable[[], Port] | None = None) -> None:
+        """``timeout`` in seconds overrides the time that each request is given by itself.
+
+        ``reopen`` opens the port again after it went away.
+        """
         self.port = port
         self.channel = channel
-        self.timeout = timeout
-        self._decoder: Decoder = EnvelopeDecoder() if channel is Channel.PC else BareDecoder()
+        self.timeout = None if timeout is None else _checked(timeout)
+        self.observers: list[Observer] = [log.exchange]
+        self._reopen = reopen
+        self._turn = threading.RLock()
+        self._in_step = True
+        self._text_is_lost = False
+        self._searches = 0
+        self._forget()
+
+    def _forget(self) -> None:
+        pc = self.channel is Channel.PC
+        self._decoder: Decoder = EnvelopeDecoder() if pc else BareDecoder()
+        self._watch = None if pc else diagnosis.WrongLineWatch()
 
     @classmethod
     def open(cls, url: str, channel: Channel = Channel.PC, timeout: float | None = None,
              baud: int = 115200) -> Link:
         """Open a port by its pySerial URL, for this process alone."""
-        return cls(SerialPort(url, baud), channel, timeout)
+        def reopen() -> Port:
+            return SerialPort(url, baud)
+
+        return cls(reopen(), channel, timeout, reopen)
 
     def __enter__(self) -> Link:
         return self
@@ -64,30 +114,85 @@ class Link:
         """Give the port back."""
         self.port.close()
 
+    @property
+    def in_step(self) -> bool:
+        """Whether everything that was sent has been answered."""
+        return self._in_step
+
+    def doubt(self) -> None:
+        """What came last may be the answer to something else: find the place before the next."""
+        self._in_step = False
+
+    @contextmanager
+    def turn(self) -> Iterator[None]:
+        """Hold the turn over several exchanges: other threads wait until the end of the block."""
+        with self._turn:
+            yield
+
+    @contextmanager
+    def recorded(self) -> Iterator[list[Transcript]]:
+        """Collect the transcripts of all exchanges in the block, failed ones and searches too."""
+        transcripts: list[Transcript] = []
+        self.observers.append(transcripts.append)
+        try:
+            yield transcripts
+        finally:
+            self.observers.remove(transcripts.append)
+
+    # what arrives
+
     def drain(self) -> list[Item]:
         """Take what has arrived unasked, for a second at most where that never ends."""
         items: list[Item] = []
         end = time.monotonic() + _DRAIN_SECONDS
         while time.monotonic() < end and (data := self.port.read(0.0)):
-            items += self._decoder.feed(data)
-        return items + self._decoder.give_up()
+            items = (items + self._decode(data))[:_MOST_DRAINED]
+        return items + self._decode(b"")
 
-    def _arrivals(self, data: bytes, timeout: float) -> Iterator[TimedItem]:
-        """Send ``data``; everything that arrives within ``timeout`` seconds from then.
+    def _decode(self, data: bytes) -> list[Item]:
+        """What the next bytes complete; none mean a silence, in which a frame ends."""
+        items = self._decoder.feed(data) if data else self._decoder.give_up()
+        if self._watch is not None:
+            for item in items:
+                self._watch.look(item)
+        return items
+
+    def _arrivals(self, transcript: Transcript, deadline: Deadline) -> Iterator[TimedItem]:
+        """Send; everything that arrives until the deadline, which counts from then.
 
         What arrived before is taken away first: it cannot be an answer.
         """
-        self.drain()
+        transcript.late = self.drain()
         start = time.monotonic()
-        self.port.write(data)
+        self._in_step = False
+        self.port.write(transcript.sent, deadline.seconds)
         seconds = 0.0
-        while seconds < timeout:
-            left = timeout - seconds
+        while seconds < deadline.seconds:
+            left = deadline.seconds - seconds
             piece = self.port.read(min(left, _SILENCE) if self._decoder.pending else left)
-            items = self._decoder.feed(piece) if piece else self._decoder.give_up()
-            seconds = time.monotonic() - start
+            seconds = transcript.seconds = time.monotonic() - start
+            items = self._decode(piece)
+            for item in items:
+                transcript.add(seconds, item)
             for item in items:
                 yield TimedItem(seconds, item)
+
+    @contextmanager
+    def _conversation(self, transcript: Transcript) -> Iterator[None]:
+        """Tell the observers of an exchange, however it ends."""
+        try:
+            yield
+        except StationError as error:
+            transcript.error = str(error)
+            raise
+        except BaseException as error:
+            transcript.error = type(error).__name__
+            raise
+        finally:
+            for observer in list(self.observers):
+                observer(transcript)
+
+    # requests
 
     def request(self, packet: Packet, timeout: float | None = None) -> Exchange:
         """Send ``packet`` and wait for its answer; raises ``Refused`` when that is a no."""
@@ -102,43 +207,85 @@ class Link:
         AT error of the modem, to which the handset had passed the packet on.
         """
         row = requests_by_id().get(packet.command)
-        limit = timeout or self.timeout or (row.timeout if row else None) or DEFAULT_TIMEOUT
-        exchange = Exchange(self.channel, packet, _encode(packet, self.channel))
-        for timed in self._arrivals(exchange.sent, limit):
-            exchange.items.append(timed)
-            exchange.seconds = timed.seconds
-            if self._completes(exchange, timed.item, row.answers if row else 1):
-                return exchange
-        if any(answer.result for answer in exchange.answers):
-            return exchange
-        raise _unanswered(exchange, limit)
+        limit = self._limit(timeout, row.timeout if row else None)
+        data = _encode(packet, self.channel)
+        wanted = row.answers if row else 1
+        with self._turn:
+            self._get_in_step()
+            transcript = Transcript(Purpose.REQUEST, self.channel, display_name(packet.command),
+                                    data)
+            exchange = Exchange(self.channel, packet, data, transcript)
+            with self._conversation(transcript):
+                self._converse(exchange, limit, wanted)
+        return exchange
 
-    def _completes(self, exchange: Exchange, item: Item, wanted: int) -> bool:
-        request = exchange.request
-        if isinstance(item, Frame) and judge.is_answer(request, item.packet, self.channel):
+    def _converse(self, exchange: Exchange, limit: float, wanted: int) -> None:
+        reader = ReplyReader()
+        for timed in self._arrivals(exchange.transcript, Deadline(limit)):
+            exchange.seconds = timed.seconds
+            if self._completes(exchange, timed.item, wanted, reader):
+                # The answer to another request says that its own has not come.
+                self._in_step = judge.is_own_answer(exchange)
+                return
+        if not any(answer.result for answer in exchange.answers):
+            raise diagnosis.unanswered(exchange, limit)
+        self._in_step = judge.is_own_answer(exchange)
+
+    def _completes(self, exchange: Exchange, item: Item, wanted: int,
+                   reader: ReplyReader) -> bool:
+        if isinstance(item, Frame) and judge.is_answer(exchange.request, item.packet, self.channel):
             exchange.answers.append(item.packet)
             return len(exchange.answers) == wanted
-        return (isinstance(item, Text) and judge.passed_on(request, self.channel)
-                and split_reply(exchange.text)[1] not in ("", "OK"))
+        if not isinstance(item, Text) or not judge.passed_on(exchange.request, self.channel):
+            return False
+        text = item.text
+        while final := reader.feed(text):
+            if final != "OK":
+                exchange.final = final
+                return True
+            text, reader.rest, reader.final = reader.rest, "", ""
+        return False
+
+    # texts
 
     def at(self, text: str, timeout: float | None = None) -> AtReply:
         """Send an AT text and return its reply; an error packet raises ``Refused``."""
         command = text.rstrip("\r\n")
         data = self._encode_text(command)
-        limit = timeout or self.timeout or DEFAULT_TIMEOUT
-        reply = AtReply(command)
-        for timed in self._arrivals(data, limit):
+        limit = self._limit(timeout)
+        with self._turn:
+            self._get_in_step()
+            transcript = Transcript(Purpose.TEXT, self.channel, printable(command), data)
+            reply = AtReply(command, transcript)
+            with self._conversation(transcript):
+                try:
+                    self._hear(reply, limit)
+                finally:
+                    self._text_is_lost = not self._in_step
+        return reply
+
+    def _hear(self, reply: AtReply, limit: float) -> None:
+        reader = ReplyReader(reply.sent)
+        for timed in self._arrivals(reply.transcript, Deadline(limit)):
             item, reply.seconds = timed.item, timed.seconds
             if isinstance(item, Text):
+                reply.final = reader.feed(item.text)
+                reply.lines = reader.lines
                 reply.raw += item.text
-                reply.lines, reply.final = split_reply(reply.raw, command)
+                if reader.overflowed:
+                    raise BadFrame(f"the reply to {printable(reply.sent)} has no end: "
+                                   f"{reader.size} characters without a final result")
                 if reply.final:
-                    return reply
+                    # A second final result is not this text's, and more may come.
+                    self._in_step = not ReplyReader().feed(reader.rest)
+                    return
             else:
                 reply.stray.append(item)
             if isinstance(item, Frame) and judge.is_refusal(item.packet, self.channel):
-                raise judge.refusal_of_text(command, item.packet)
-        raise _no_final_result(reply, limit)
+                refusal = judge.refusal_of_text(reply.sent, item.packet)
+                self._in_step = judge.is_of_text(item.packet)
+                raise refusal
+        raise diagnosis.no_final_result(reply, reader.echoed, limit)
 
     def _encode_text(self, command: str) -> bytes:
         if self.channel is not Channel.PC:
@@ -149,26 +296,107 @@ class Link:
                                f"{LARGEST_REQUEST}")
         return data
 
+    # the place
+
+    def find_place(self, timeout: float = RECOVER_TIMEOUT) -> Place:
+        """Make sure that what comes next is the answer to what is sent next.
+
+        A run begins with this, because an earlier process may have left something behind. On the
+        PC line it flushes a text that the handset holds; a packet that is held and refused again
+        raises ``Refused`` with the advice. Without an answer it raises ``OutOfStep``.
+        """
+        limit = _checked(timeout)
+        with self._turn:
+            dropped: list[Item] = []
+            for attempt in (1, 2):
+                try:
+                    dropped += self._search(limit)
+                except OutOfStep as error:
+                    # A held request that the handset now carries out swallows the question.
+                    answers = [item for item in error.arrived if isinstance(item, Frame)]
+                    if attempt == 2 or not answers:
+                        raise
+                    dropped += error.arrived
+                    continue
+                self._in_step, self._text_is_lost = True, False
+                return Place(attempt, tuple(dropped))
+        raise AssertionError("the second attempt returns or raises")
+
+    def _search(self, limit: float) -> list[Item]:
+        """One question and its answer; what came before that."""
+        self._searches += 1
+        question = search(self.channel, self._searches)
+        transcript = Transcript(Purpose.PLACE, self.channel, question.what, question.data)
+        with self._conversation(transcript):
+            if not self._is_answered(question, transcript, limit):
+                if question.doubt is not None:
+                    raise question.doubt
+                raise OutOfStep(diagnosis.no_place(transcript, limit),
+                                [timed.item for timed in transcript.items])
+            answered = len(transcript.items)
+            self._settle(transcript)
+        return [*transcript.late, *(timed.item for timed in transcript.items[:answered])]
+
+    def _is_answered(self, question: Search, transcript: Transcript, limit: float) -> bool:
+        deadline = Deadline(limit)
+        for timed in self._arrivals(transcript, deadline):
+            if question.take(timed.item):
+                return True
+            if question.doubt is not None:
+                deadline.seconds = min(deadline.seconds, timed.seconds + _DOUBT_SECONDS)
+        return False
+
+    def _settle(self, transcript: Transcript) -> None:
+        """Wait until the line is silent behind the answer to a search."""
+        quiet = _QUIET_AFTER_TEXT if self._text_is_lost else _QUIET
+        start = time.monotonic()
+        while (piece := self.port.read(quiet)) or self._decoder.pending:
+            for item in self._decode(piece):
+                transcript.add(transcript.seconds + time.monotonic() - start, item)
+            if time.monotonic() - start > _LONGEST_UNREST:
+                raise OutOfStep(f"the line is out of step and does not fall silent within "
+                                f"{_LONGEST_UNREST:g} s; nothing else was sent")
+
+    def _get_in_step(self) -> None:
+        if not self._in_step:
+            self.find_place()
+
     def recover(self, timeout: float = RECOVER_TIMEOUT) -> Recovery:
         """Flush a text that the handset holds, and make sure that it holds nothing any more.
 
         A packet that is held and refused again raises ``Refused`` with the advice. One that the
         handset now carries out answers instead and is gone with that; the flush is then repeated.
         """
-        late: list[Packet] = []
-        for attempt in (1, 2):
-            try:
-                reply = self.at(FLUSH_COMMAND, timeout)
-            except NoAnswer as error:
-                answers = [item.packet for item in error.arrived if isinstance(item, Frame)]
-                if attempt == 2 or not answers:
-                    raise
-                late += answers
-                continue
-            if not reply.ok:
-                raise Refused(f"{FLUSH_COMMAND} was answered with {reply.final}")
-            return Recovery(attempt, tuple(late))
-        raise AssertionError("the second attempt returns or raises")
+        if self.channel is not Channel.PC:
+            raise UsageProblem("only on the PC line does the handset hold what it has refused")
+        place = self.find_place(timeout)
+        return Recovery(place.attempts, place.late_answers)
+
+    def reconnect(self, timeout: float) -> None:
+        """Take the port again that went away or is about to, within ``timeout`` seconds.
+
+        The link is out of step afterwards and finds its place before the next exchange.
+        """
+        from amt_station.reopen import reopened
+
+        with self._turn:
+            if self._reopen is None:
+                raise UsageProblem(f"{self.port.name} cannot be opened again")
+            self._in_step = False
+            self.port.close()
+            self.port = reopened(self._reopen, _checked(timeout))
+            self._forget()
+
+    def _limit(self, timeout: float | None, own: float | None = None) -> float:
+        if timeout is not None:
+            return _checked(timeout)
+        return self.timeout or own or DEFAULT_TIMEOUT
+
+
+def _checked(timeout: float) -> float:
+    if isinstance(timeout, bool) or not math.isfinite(timeout) or timeout <= 0:
+        raise UsageProblem(f"a time of {timeout} s: it has to be a finite number above 0")
+    return timeout
 
 
 def _encode(packet: Packet, channel: Channel) -> bytes:
@@ -176,29 +404,3 @@ def _encode(packet: Packet, channel: Channel) -> bytes:
         return encode_request(packet, enveloped=channel is Channel.PC)
     except WireError as error:
         raise UsageProblem(str(error)) from error
-
-
-def _unanswered(exchange: Exchange, limit: float) -> StationError:
-    name = display_name(exchange.request.command)
-    arrived = [timed.item for timed in exchange.items]
-    if exchange.answers:
-        return NoAnswer(f"{name} was taken, but its outcome was not reported within {limit:g} s",
-                        arrived)
-    damage = _first_damage(arrived)
-    if damage is not None:
-        return BadFrame(f"the answer to {name} could not be read: {damage.error}", damage.error)
-    if any(isinstance(item, Acknowledgement) for item in arrived):
-        return NoAnswer(f"{name} was acknowledged, but not answered within {limit:g} s", arrived)
-    return NoAnswer(f"no answer to {name} within {limit:g} s", arrived)
-
-
-def _no_final_result(reply: AtReply, limit: float) -> StationError:
-    damage = _first_damage(reply.stray)
-    if damage is not None:
-        return BadFrame(f"the answer to {reply.sent} could not be read: {damage.error}",
-                        damage.error)
-    return NoAnswer(f"no final result for {reply.sent} within {limit:g} s", reply.stray)
-
-
-def _first_damage(items: list[Item]) -> Skipped | None:
-    return next((item for item in items if isinstance(item, Skipped)), None)

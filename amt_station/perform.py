@@ -1,21 +1,124 @@
-"""Carries out typed commands on a link."""
+"""Carries out what ``amt_station.requests.operations`` has prepared, and reads what came of it.
+
+    prepared = prepare("battery voltage", {}, link.channel)     # raises UsageProblem, sends nothing
+    with link.recorded() as transcripts:                        # every byte, with its time
+        outcome = perform(link, prepared)                       # raises StationError
+    outcome["voltage"].shown, outcome["voltage"].unit           # 4.012345, "V"
+
+``prepare_packet`` and ``prepare_text`` make the same of any packet and any AT text. A run begins
+with ``link.find_place()``. ``Transcript`` (in ``amt_station.exchange``) is the record of one
+exchange, ``render.transcript_json`` its JSON form.
+"""
 
 from __future__ import annotations
 
+from dataclasses import dataclass
 from typing import Mapping
 
-from amt_station.exchange import Exchange
+from amt_station.errors import IncompleteAnswer, Refused, UsageProblem
+from amt_station.exchange import AtReply, Exchange
 from amt_station.link import Link
-from amt_station.requests.operations import Value, check_channel, operation_packet
-from amt_station.requests.table import find_operation
+from amt_station.requests.at_commands import known_read
+from amt_station.requests.model import Request
+from amt_station.requests.operations import (NamedValue, Prepared, Value, prepare, problems,
+                                             read_answer)
+from amt_station.text import printable
 
 
-def run_operation(link: Link, path: tuple[str, ...],
-                  values: Mapping[str, Value] | None = None,
-                  timeout: float | None = None) -> list[Exchange]:
+@dataclass(frozen=True)
+class Outcome:
+    """A command that passed: its values, and its exchanges, the last one its own.
+
+    A text has the one value ``reply``, its lines joined.
+    """
+
+    prepared: Prepared
+    values: tuple[NamedValue, ...]
+    exchanges: tuple[Exchange | AtReply, ...]
+
+    def __getitem__(self, name: str) -> NamedValue:
+        """The value of this name; raises ``KeyError`` when the answer has none."""
+        for value in self.values:
+            if value.name == name:
+                return value
+        raise KeyError(name)
+
+    @property
+    def exchange(self) -> Exchange | AtReply:
+        """The exchange of the command itself."""
+        return self.exchanges[-1]
+
+
+def perform(link: Link, prepared: Prepared, timeout: float | None = None) -> Outcome:
+    """Carry out ``prepared`` and what has to go before it; raises ``StationError`` for a no.
+
+    A yes without the values that it is there for is a no: ``IncompleteAnswer``.
+    """
+    if prepared.channel is not link.channel:
+        raise UsageProblem(f"{prepared.name} was prepared for the {prepared.channel.value} "
+                           f"channel, this is the {link.channel.value} channel")
+    with link.turn():
+        before = perform(link, prepared.before, timeout).exchanges if prepared.before else ()
+        if prepared.packet is None:
+            values, exchange = _say(link, prepared, timeout)
+        else:
+            values, exchange = _ask(link, prepared, timeout)
+    return Outcome(prepared, values, (*before, exchange))
+
+
+def _ask(link: Link, prepared: Prepared,
+         timeout: float | None) -> tuple[tuple[NamedValue, ...], Exchange | AtReply]:
+    assert prepared.packet is not None
+    exchange = link.request(prepared.packet, timeout)
+    lacks = problems(prepared, exchange.answer)
+    if lacks:
+        # It may be the late answer to something else, with its own still to come.
+        link.doubt()
+        raise IncompleteAnswer(f"{prepared.name}: {'; '.join(lacks)}")
+    return tuple(read_answer(prepared.packet.command, exchange.answer)), exchange
+
+
+def _say(link: Link, prepared: Prepared,
+         timeout: float | None) -> tuple[tuple[NamedValue, ...], Exchange | AtReply]:
+    reply = link.at(prepared.text, timeout)
+    said = printable(prepared.text)
+    if not reply.ok:
+        raise Refused(f"{said} was answered with {printable(reply.final)}",
+                      causes=_causes(prepared.row, prepared))
+    whole = NamedValue("reply", "\n".join(reply.lines))
+    prefix = prepared.at.prefix if prepared.at else known_read(prepared.text)
+    if not prefix:
+        return (whole,), reply
+    found = [line[len(prefix):].strip() for line in reply.lines if line.startswith(prefix)]
+    if not found or not found[-1].strip('"'):
+        link.doubt()
+        raise IncompleteAnswer(f"{said}: the answer holds no {prefix.strip()} line")
+    if prepared.at is None:
+        return (whole,), reply
+    return (_read_text(prepared, found[-1]),), reply
+
+
+def _read_text(prepared: Prepared, text: str) -> NamedValue:
+    assert prepared.at is not None and prepared.row is not None
+    name = prepared.at.field
+    field = next(row for row in prepared.row.answer_fields if row.name == name)
+    plain = text[1:-1] if text.startswith('"') and text.endswith('"') else text
+    value: Value = plain
+    if field.numeric:
+        try:
+            value = int(plain)
+        except ValueError:
+            raise IncompleteAnswer(f"{prepared.name}: the answer holds no number but "
+                                   f"{printable(plain)}") from None
+    return NamedValue(name, value, field.word(value), field.unit, field)
+
+
+def _causes(row: Request | None, prepared: Prepared) -> tuple[str, ...]:
+    service = row.service(prepared.channel) if row is not None else None
+    return service.causes(None, row.use(prepared.asked or {})) if service and row else ()
+
+
+def run_operation(link: Link, path: tuple[str, ...], values: Mapping[str, object] | None = None,
+                  timeout: float | None = None) -> list[Exchange | AtReply]:
     """Carry out a typed command and what it needs before; the last exchange is its own."""
-    row, operation = find_operation(path)
-    check_channel(row, operation, link.channel)
-    packet = operation_packet(row, operation, values)
-    before = run_operation(link, operation.before, None, timeout) if operation.before else []
-    return [*before, link.request(packet, timeout)]
+    return list(perform(link, prepare(path, values, link.channel), timeout).exchanges)

@@ -9,9 +9,9 @@ from typing import Iterator, Mapping
 
 from amt_station.errors import EXIT_PASS, EXIT_REFUSED, Held, NoPort, Refused, StationError
 from amt_station.link import Link
-from amt_station.perform import run_operation
+from amt_station.perform import perform
 from amt_station.plan import Plan, Step, Value
-from amt_station.requests.operations import read_answer
+from amt_station.requests.operations import prepare, read_answer
 
 
 class Verdict(str, Enum):
@@ -82,7 +82,8 @@ def _perform(link: Link, step: Step) -> Mapping[str, Value]:
     if step.packet is not None:
         exchange = link.request(step.packet, step.timeout)
     else:
-        exchange = run_operation(link, step.path, step.values, step.timeout)[-1]
+        outcome = perform(link, prepare(step.path, step.values, link.channel), step.timeout)
+        return {value.name: value.value for value in outcome.values}
     return {value.name: value.value
             for value in read_answer(exchange.request.command, exchange.answer)}
 

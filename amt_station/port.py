@@ -3,18 +3,21 @@
 from __future__ import annotations
 
 import errno
+import math
 import os
 import select
+import termios
 import time
 from typing import Any, Protocol
 
 import serial
 
-from amt_station.errors import NoPort, PortBusy
+from amt_station.errors import NoAnswer, NoPort, PortBusy
 
 _CHUNK = 4096
 _BUSY = (errno.EBUSY, errno.EAGAIN, errno.EWOULDBLOCK)
 _POLL_SECONDS = 0.05
+_LONGEST_POLL = 0x7FFFFFFF
 
 
 class Port(Protocol):
@@ -25,15 +28,48 @@ class Port(Protocol):
     def read(self, timeout: float) -> bytes:
         """The next bytes, at least one; empty when ``timeout`` seconds pass without any."""
 
-    def write(self, data: bytes) -> None:
-        """Send all of ``data``."""
+    def write(self, data: bytes, timeout: float) -> None:
+        """Send all of ``data``; ``NoAnswer`` when the peer does not take it within ``timeout``."""
 
     def close(self) -> None:
         """Give the port back."""
 
 
-def _wait_readable(fd: int, timeout: float) -> bool:
-    return bool(select.select([fd], [], [], max(0.0, timeout))[0])
+def _ready(fd: int, event: int, timeout: float) -> bool:
+    """Whether the descriptor is ready, or has an error to tell, within ``timeout`` seconds."""
+    poll = select.poll()
+    poll.register(fd, event)
+    return bool(poll.poll(min(math.ceil(max(0.0, timeout) * 1000), _LONGEST_POLL)))
+
+
+def _write_all(fd: int, data: bytes, timeout: float, name: str) -> None:
+    """Write with a deadline, whether the descriptor blocks or not."""
+    end = time.monotonic() + timeout
+    blocking = os.get_blocking(fd)
+    os.set_blocking(fd, False)
+    try:
+        while data:
+            if not _ready(fd, select.POLLOUT, end - time.monotonic()):
+                _drop_output(fd)
+                raise _not_taken(name, timeout)
+            try:
+                data = data[os.write(fd, data):]
+            except BlockingIOError:
+                continue
+    finally:
+        os.set_blocking(fd, blocking)
+
+
+def _drop_output(fd: int) -> None:
+    """Forget what the peer has not taken: a close would wait for it."""
+    try:
+        termios.tcflush(fd, termios.TCOFLUSH)
+    except termios.error:
+        pass  # no terminal: nothing is kept for it
+
+
+def _not_taken(name: str, timeout: float) -> NoAnswer:
+    return NoAnswer(f"{name}: nobody takes what is sent, within {timeout:g} s")
 
 
 class FdPort:
@@ -49,7 +85,7 @@ class FdPort:
 
     def read(self, timeout: float) -> bytes:
         """As in ``Port``."""
-        if not _wait_readable(self._fd, timeout):
+        if not _ready(self._fd, select.POLLIN, timeout):
             return b""
         try:
             data = os.read(self._fd, _CHUNK)
@@ -59,11 +95,10 @@ class FdPort:
             raise NoPort(f"{self.name} went away: end of data")
         return data
 
-    def write(self, data: bytes) -> None:
+    def write(self, data: bytes, timeout: float) -> None:
         """As in ``Port``."""
         try:
-            while data:
-                data = data[os.write(self._fd, data):]
+            _write_all(self._fd, data, timeout, self.name)
         except OSError as error:
             raise NoPort(f"{self.name} went away: {error.strerror}") from error
 
@@ -100,9 +135,9 @@ class SerialPort:
         """As in ``Port``."""
         try:
             if self._fd is not None:
-                if not _wait_readable(self._fd, timeout):
+                if not _ready(self._fd, select.POLLIN, timeout):
                     return b""
-                return bytes(self._serial.read(max(1, self._serial.in_waiting)))
+                return bytes(self._serial.read(min(_CHUNK, max(1, self._serial.in_waiting))))
             return self._poll(timeout)
         except (OSError, serial.SerialException) as error:
             raise NoPort(f"port {self.name} went away: {_reason(error)}") from error
@@ -111,14 +146,20 @@ class SerialPort:
         """Ports without a descriptor can only be asked again and again."""
         end = time.monotonic() + timeout
         while True:
-            data = bytes(self._serial.read(max(1, self._serial.in_waiting)))
+            data = bytes(self._serial.read(min(_CHUNK, max(1, self._serial.in_waiting))))
             if data or time.monotonic() >= end:
                 return data
 
-    def write(self, data: bytes) -> None:
+    def write(self, data: bytes, timeout: float) -> None:
         """As in ``Port``."""
         try:
-            self._serial.write(data)
+            if self._fd is not None:
+                _write_all(self._fd, data, timeout, f"port {self.name}")
+            else:
+                self._serial.write_timeout = timeout
+                self._serial.write(data)
+        except serial.SerialTimeoutException as error:
+            raise _not_taken(f"port {self.name}", timeout) from error
         except (OSError, serial.SerialException) as error:
             raise NoPort(f"port {self.name} went away: {_reason(error)}") from error
 

@@ -8,6 +8,7 @@ from typing import Callable, Iterable, Mapping, Sequence
 
 from amt_station.requests.at_commands import AT_COMMANDS, WATCHED
 from amt_station.requests.catalogue import command_names
+from amt_station.requests.formats import FORMATS
 from amt_station.requests.model import Field, Operation, Request, Service
 from amt_station.requests.operations import operation_packet
 from amt_station.requests.table import FAMILIES, REQUESTS, find_operation, requests_by_id, tunnel
@@ -78,7 +79,12 @@ def _limits(field: Field) -> str:
         limits = f"{field.low} or more"
     elif field.longest is not None:
         limits = f"at most {field.longest} bytes"
-    return limits
+    form = FORMATS[field.format].meaning if field.format else ""
+    return ", ".join(part for part in (limits, form) if part)
+
+
+def _unit(field: Field) -> str:
+    return f"1/{field.scale} {field.unit}" if field.scale != 1 else field.unit
 
 
 def _type(field: Field) -> str:
@@ -96,7 +102,7 @@ def _meaning(field: Field) -> str:
 
 def _field_table(fields: Sequence[Field], request: bool) -> str:
     header = ["atom", "type", "name", "meaning", "unit"]
-    rows = [[str(field.atom), _type(field), field.name, _meaning(field), field.unit]
+    rows = [[str(field.atom), _type(field), field.name, _meaning(field), _unit(field)]
             for field in fields]
     if request:
         header += ["sent by a station", "when absent"]

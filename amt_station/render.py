@@ -4,31 +4,16 @@ from __future__ import annotations
 
 from typing import Any, Iterable, Sequence
 
-from amt_station.exchange import AtReply, Exchange
+from amt_station.exchange import AtReply, Exchange, Transcript
 from amt_station.requests.model import RESULT, Field
 from amt_station.requests.operations import NamedValue, read_answer
 from amt_station.requests.table import display_name, requests_by_id
+from amt_station.text import plain, printable
 from amt_station.wire.atoms import Atom
 from amt_station.wire.decoder import Acknowledgement, Frame, Item, Skipped, Text
 from amt_station.wire.packet import Packet
 
 Json = dict[str, Any]
-
-
-def printable(text: str) -> str:
-    """``text`` on one line, whatever is in it."""
-    return "".join(character if character.isprintable() else _escape(character)
-                   for character in text)
-
-
-def _escape(character: str) -> str:
-    short = {"\r": "\\r", "\n": "\\n", "\t": "\\t"}.get(character)
-    return short or character.encode("unicode_escape", "surrogatepass").decode("ascii")
-
-
-def plain(text: str) -> str:
-    """``text`` as JSON can carry it: bytes that are no characters are written out."""
-    return text.encode("utf-8", "surrogateescape").decode("utf-8", "backslashreplace")
 
 
 def _fields(packet: Packet, request: int | None) -> dict[int, Field]:
@@ -72,8 +57,8 @@ def item_json(item: Item) -> Json:
 
 
 def values_json(values: Iterable[NamedValue]) -> Json:
-    """Name to value."""
-    return {value.name: plain(value.value) if isinstance(value.value, str) else value.value
+    """Name to value, in its unit."""
+    return {value.name: plain(shown) if isinstance(shown := value.shown, str) else shown
             for value in values}
 
 
@@ -90,6 +75,20 @@ def exchange_json(exchange: Exchange) -> Json:
             "seconds": round(exchange.seconds, 6)}
 
 
+def transcript_json(transcript: Transcript) -> Json:
+    """Every byte of one exchange in hexadecimal, decoded, with its time in seconds."""
+    def shown(item: Item) -> Json:
+        return {"bytes": item.raw.hex(), **item_json(item)}
+
+    return {"purpose": transcript.purpose.value, "channel": transcript.channel.value,
+            "what": plain(transcript.what), "start": transcript.start.isoformat(),
+            "sent": transcript.sent.hex(), "late": [shown(item) for item in transcript.late],
+            "received": [{"seconds": round(timed.seconds, 6), **shown(timed.item)}
+                         for timed in transcript.items],
+            "seconds": round(transcript.seconds, 6), "error": transcript.error or None,
+            "unkept_bytes": transcript.unkept}
+
+
 def at_json(reply: AtReply) -> Json:
     """An AT text and its reply."""
     return {"sent": reply.sent, "lines": [plain(line) for line in reply.lines],
@@ -99,7 +98,7 @@ def at_json(reply: AtReply) -> Json:
 
 def value_line(value: NamedValue) -> str:
     """``name: value (word) unit``; a unit that takes more than a word is left to the documents."""
-    text = printable(value.value.strip()) if isinstance(value.value, str) else str(value.value)
+    text = printable(value.value.strip()) if isinstance(value.value, str) else str(value.shown)
     word = f" ({value.word})" if value.word else ""
     unit = f" {value.unit}" if value.unit and " " not in value.unit else ""
     return f"{value.name}: {text}{word}{unit}"

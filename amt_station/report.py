@@ -10,7 +10,8 @@ from xml.etree import ElementTree
 from amt_station.cli import console
 from amt_station.plan import Plan
 from amt_station.plan_run import StepResult, Verdict
-from amt_station.render import Json, columns, plain, printable
+from amt_station.render import Json, columns
+from amt_station.text import plain, printable
 
 _NOT_XML = re.compile("[^\t\n\r\x20-\ud7ff\ue000-\ufffd\U00010000-\U0010ffff]")
 

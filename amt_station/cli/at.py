@@ -6,7 +6,7 @@ import click
 
 from amt_station.cli import console
 from amt_station.cli.options import Settings, common_options
-from amt_station.cli.outcome import outcome, raise_reported
+from amt_station.cli.outcome import raise_reported, refusal_json
 from amt_station.errors import Refused, UsageProblem
 from amt_station.render import at_json, item_line
 from amt_station.requests.at_commands import known_refusal
@@ -30,7 +30,7 @@ def at(settings: Settings, text: str, force: bool) -> None:
         reply = link.at(text)
     refusal = None if reply.ok else Refused(f"{reply.sent} was answered with {reply.final}")
     if settings.json:
-        console.data_json({"ok": reply.ok, **at_json(reply), **outcome(refusal)})
+        console.data_json({"ok": reply.ok, **at_json(reply), **refusal_json(refusal)})
     else:
         for line in (*reply.lines, reply.final):
             console.data(line)

@@ -5,12 +5,13 @@ from __future__ import annotations
 from amt_station import judge
 from amt_station.cli import console
 from amt_station.errors import Refused
-from amt_station.exchange import Exchange
-from amt_station.render import item_line
+from amt_station.exchange import AtReply, Exchange
+from amt_station.perform import Outcome
+from amt_station.render import at_json, exchange_json, item_line, values_json
 from amt_station.requests.table import display_name
 
 
-def outcome(refusal: Refused | None) -> dict[str, object]:
+def refusal_json(refusal: Refused | None) -> dict[str, object]:
     """What a refusal adds to a JSON document."""
     return {"error": refusal.details()} if refusal else {}
 
@@ -31,10 +32,22 @@ def judged(exchange: Exchange) -> Refused | None:
     return None
 
 
-def show_exchange(exchange: Exchange) -> None:
+def show_exchange(exchange: Exchange | AtReply) -> None:
     """Say how an exchange went, for the person."""
-    how = "acknowledged, " if exchange.acknowledged else ""
-    console.talk(f"{display_name(exchange.request.command)}: {how}answered after "
-                 f"{exchange.seconds * 1000:.1f} ms")
+    if isinstance(exchange, AtReply):
+        name, how = exchange.sent, ""
+    else:
+        name = display_name(exchange.request.command)
+        how = "acknowledged, " if exchange.acknowledged else ""
+    console.talk(f"{name}: {how}answered after {exchange.seconds * 1000:.1f} ms")
     for item in exchange.stray:
         console.talk(f"also arrived: {item_line(item)}")
+
+
+def outcome_json(outcome: Outcome) -> dict[str, object]:
+    """A typed command that passed: its values, their units, and its exchanges."""
+    *before, own = (exchange_json(exchange) if isinstance(exchange, Exchange)
+                    else at_json(exchange) for exchange in outcome.exchanges)
+    units = {value.name: value.unit for value in outcome.values if value.unit}
+    return {**own, "values": values_json(outcome.values), "units": units, "before": before,
+            "forced": list(outcome.prepared.forced)}

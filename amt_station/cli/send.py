@@ -6,7 +6,7 @@ import click
 
 from amt_station.cli import console
 from amt_station.cli.options import Settings, common_options
-from amt_station.cli.outcome import judged, outcome, raise_reported, show_exchange
+from amt_station.cli.outcome import judged, raise_reported, refusal_json, show_exchange
 from amt_station.render import exchange_json, packet_lines
 from amt_station.requests.atom_text import parse_atom
 from amt_station.requests.table import display_name, find_command, requests_by_id
@@ -32,7 +32,8 @@ def send(settings: Settings, command: str, atoms: tuple[str, ...]) -> None:
         exchange = link.converse(packet)
     refusal = judged(exchange)
     if settings.json:
-        console.data_json({"ok": refusal is None, **exchange_json(exchange), **outcome(refusal)})
+        console.data_json({"ok": refusal is None, **exchange_json(exchange),
+                           **refusal_json(refusal)})
     else:
         for answer in exchange.answers:
             for line in packet_lines(answer, number):

@@ -8,11 +8,11 @@ import click
 
 from amt_station.cli import console
 from amt_station.cli.options import Settings, common_parameters
-from amt_station.cli.outcome import show_exchange
-from amt_station.perform import run_operation
-from amt_station.render import exchange_json, value_line
+from amt_station.cli.outcome import outcome_json, show_exchange
+from amt_station.perform import perform
+from amt_station.render import value_line
 from amt_station.requests.model import Field, Operation, Request
-from amt_station.requests.operations import check_channel, operation_packet, read_answer
+from amt_station.requests.operations import prepare
 from amt_station.requests.table import operations
 
 
@@ -20,6 +20,9 @@ def _parameters(row: Request, operation: Operation) -> list[click.Parameter]:
     parameters: list[click.Parameter] = []
     for name in (*operation.takes, *operation.may_take):
         parameters += _field_parameters(row.field(name))
+    if parameters:
+        parameters.append(click.Option(["--force"], is_flag=True,
+                                       help="Send values that have not their format"))
     return parameters
 
 
@@ -42,23 +45,24 @@ def _variable(field: Field) -> str:
 
 
 def _run(row: Request, operation: Operation, given: dict[str, Any]) -> None:
+    force = bool(given.pop("force", False))
     settings = click.get_current_context().ensure_object(Settings)
-    fields = {_variable(field): field.name for field in row.fields}
-    values = {fields[variable]: value for variable, value in given.items() if value is not None}
+    fields = {_variable(field): field for field in row.fields}
+    values = {fields[variable].name: fields[variable].parse(text)
+              for variable, text in given.items() if text is not None}
     # Everything that can be wrong with the request is found before the port is touched.
-    check_channel(row, operation, settings.chosen_channel)
-    operation_packet(row, operation, values)
+    prepared = prepare(operation.path, values, settings.chosen_channel, force)
+    for problem in prepared.forced:
+        console.talk(f"forced: {problem}")
     with settings.open_link() as link, console.waiting(operation.name):
-        exchanges = run_operation(link, operation.path, values)
-    exchange = exchanges[-1]
+        outcome = perform(link, prepared)
     if settings.json:
-        console.data_json({"ok": True, "command": operation.name, **exchange_json(exchange),
-                           "before": [exchange_json(before) for before in exchanges[:-1]]})
+        console.data_json({"ok": True, "command": operation.name, **outcome_json(outcome)})
         return
-    for value in read_answer(row.id, exchange.answer):
+    for value in outcome.values:
         if value.name != "result":
             console.data(value_line(value))
-    show_exchange(exchange)
+    show_exchange(outcome.exchange)
 
 
 def _help(row: Request, operation: Operation) -> str:

@@ -6,14 +6,18 @@ commands are both made from them.
 
 from __future__ import annotations
 
+import re
 from dataclasses import dataclass, field
 from enum import Enum
 from typing import Mapping
 
 from amt_station.errors import UsageProblem
 from amt_station.requests.catalogue import command_name
-from amt_station.wire.atoms import RESULT_ATOM, Atom, AtomType
-from amt_station.wire.errors import WireError
+from amt_station.requests.field import Field
+from amt_station.wire.atoms import RESULT_ATOM, AtomType
+
+__all__ = ["PASSED_ON", "RESULT", "AtRead", "Channel", "Field", "Operation", "Refusal", "Request",
+           "Service"]
 
 
 class Channel(str, Enum):
@@ -23,91 +27,11 @@ class Channel(str, Enum):
     APP = "app"
 
 
-@dataclass(frozen=True)
-class Field:
-    """One atom of a request or an answer.
-
-    ``absent`` says what the handset takes when the atom is missing, ``width`` that a bytes atom
-    holds a number of so many bytes, ``length_of`` that the value is another atom's byte count.
-    On the command line a ``positional`` field is an argument, one with ``flags`` a flag a choice.
-    """
-
-    atom: int
-    type: AtomType
-    name: str
-    meaning: str
-    unit: str = ""
-    low: int | None = None
-    high: int | None = None
-    longest: int | None = None
-    choices: Mapping[str, int] = field(default_factory=dict)
-    absent: str = ""
-    positional: bool = False
-    flags: bool = False
-    width: int = 0
-    text: bool = False
-    length_of: str = ""
-
-    @property
-    def numeric(self) -> bool:
-        """Whether the value is a number; ``width`` bytes of a bytes atom may hold one."""
-        return self.width > 0 or self.type in (AtomType.INT, AtomType.BOOL)
-
-    def encode(self, value: int | str) -> Atom:
-        """The atom for ``value``, refused when the handset would not take it."""
-        try:
-            return self._encode_number(value) if self.numeric else self._encode_text(str(value))
-        except WireError as error:
-            raise UsageProblem(f"{self.name}: {error}") from error
-
-    def _encode_number(self, value: int | str) -> Atom:
-        number = self._number(value)
-        if self.low is not None and number < self.low:
-            raise UsageProblem(f"{self.name}: {number} is below {self.low}")
-        if self.high is not None and number > self.high:
-            raise UsageProblem(f"{self.name}: {number} is above {self.high}")
-        if self.type is AtomType.BYTES:
-            return Atom.raw(self.atom, number.to_bytes(self.width, "little"))
-        if self.type is AtomType.BOOL:
-            return Atom.boolean(self.atom, number)
-        return Atom.integer(self.atom, number)
-
-    def _number(self, value: int | str) -> int:
-        if isinstance(value, int):
-            return value
-        if value in self.choices:
-            return self.choices[value]
-        try:
-            return int(value, 0)
-        except ValueError:
-            words = f" nor one of {', '.join(self.choices)}" if self.choices else ""
-            raise UsageProblem(f"{self.name}: {value!r} is not a number{words}") from None
-
-    def _encode_text(self, text: str) -> Atom:
-        atom = (Atom.string(self.atom, text) if self.type is AtomType.STRING
-                else Atom.raw(self.atom, text.encode("utf-8", "surrogateescape")))
-        if not text:
-            raise UsageProblem(f"{self.name}: empty")
-        if "\0" in text:
-            raise UsageProblem(f"{self.name}: holds a zero byte")
-        if self.longest is not None and len(atom.content) > self.longest:
-            raise UsageProblem(f"{self.name}: {len(atom.content)} bytes, at most {self.longest}")
-        return atom
-
-    def read(self, atom: Atom) -> int | str:
-        """The value that an atom of an answer carries, for people and for JSON."""
-        if self.width and isinstance(atom.value, bytes):
-            return int.from_bytes(atom.value, "little")
-        if self.text and isinstance(atom.value, bytes):
-            return atom.value.decode("utf-8", "surrogateescape")
-        return atom.value.hex() if isinstance(atom.value, bytes) else atom.value
-
-    def word(self, number: int | str) -> str:
-        """The word for a number, if it has one."""
-        return next((word for word, value in self.choices.items() if value == number), "")
-
-
 RESULT = Field(RESULT_ATOM, AtomType.INT, "result", "result code, 0 for success")
+
+
+# A refusal of one use only begins with the word of that use.
+_USE = re.compile(r"[a-z]+: ")
 
 
 @dataclass(frozen=True)
@@ -132,13 +56,35 @@ class Service:
     refusals: tuple[Refusal, ...] = ()
     passes_on: Mapping[int, tuple[int, ...]] = field(default_factory=dict)
 
+    def causes(self, code: int | None = None, use: str = "") -> tuple[str, ...]:
+        """Why it refuses with ``code``; of those for one use, only those for ``use``."""
+        found = [refusal.when for refusal in self.refusals if code in (None, refusal.code)]
+        return tuple(when for when in found
+                     if not use or not _USE.match(when) or when.startswith(f"{use}:"))
+
 
 PASSED_ON = Service("modem", False, "passed on to the modem unchanged; the modem answers")
 
 
 @dataclass(frozen=True)
+class AtRead:
+    """The AT text that reads the same on the PC line, and whose refusal the handset forgets.
+
+    The value ``field`` stands behind ``prefix`` in a line of the reply, with or without quotes.
+    """
+
+    text: str
+    prefix: str
+    field: str
+
+
+@dataclass(frozen=True)
 class Operation:
-    """A typed command: one use of a request, with some atoms fixed and some asked for."""
+    """A typed command: one use of a request, with some atoms fixed and some asked for.
+
+    ``brings`` names the values that the answer must hold besides its result code, ``before`` the
+    typed command that has to go before, ``at`` what is sent instead on the PC line.
+    """
 
     path: tuple[str, ...]
     summary: str
@@ -147,6 +93,8 @@ class Operation:
     may_take: tuple[str, ...] = ()
     channels: tuple[Channel, ...] = (Channel.PC, Channel.APP)
     before: tuple[str, ...] = ()
+    brings: tuple[str, ...] = ()
+    at: AtRead | None = None
 
     @property
     def name(self) -> str:
@@ -192,6 +140,16 @@ class Request:
             if candidate.name == name:
                 return candidate
         raise UsageProblem(f"request {self.name} has no atom {name}")
+
+    @property
+    def reports_result(self) -> bool:
+        """Whether an answer carries a result code."""
+        return RESULT in self.answer_fields
+
+    def use(self, values: Mapping[str, int | str]) -> str:
+        """The word for the use that the values make of the request; empty when it has one only."""
+        return next((field.word(values[field.name]) for field in self.fields
+                     if field.choices and field.name in values), "")
 
     def answer_field(self, atom_id: int) -> Field | None:
         """The answer atom with this id."""

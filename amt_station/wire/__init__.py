@@ -11,15 +11,15 @@ from amt_station.wire.envelope import (ACKNOWLEDGEMENT, LARGEST_REQUEST, MAGIC, 
                                        decode_envelope, encode_envelope, encode_request, unwrap,
                                        wrap)
 from amt_station.wire.errors import (AtomTypeError, ChecksumError, HeadError, LengthError,
-                                     MagicError, StrayBytesError, TruncatedError, ValueRangeError,
-                                     WireError)
+                                     MagicError, MissingAtomError, StrayBytesError, TruncatedError,
+                                     ValueRangeError, WireError)
 from amt_station.wire.packet import PACKET_SIZE, Packet
 
 __all__ = [
     "ACKNOWLEDGEMENT", "Acknowledgement", "Atom", "AtomType", "AtomTypeError", "BareDecoder",
     "ChecksumError", "Decoder", "EnvelopeDecoder", "Frame", "HeadError", "Item",
-    "LARGEST_REQUEST", "LengthError", "MAGIC", "MagicError", "OVERHEAD", "PACKET_SIZE", "Packet",
-    "RESULT_ATOM", "Skipped", "StrayBytesError", "Text", "TruncatedError", "ValueRangeError",
-    "WireError", "checksum", "decode_envelope", "encode_envelope", "encode_request", "unwrap",
-    "wrap",
+    "LARGEST_REQUEST", "LengthError", "MAGIC", "MagicError", "MissingAtomError", "OVERHEAD",
+    "PACKET_SIZE", "Packet", "RESULT_ATOM", "Skipped", "StrayBytesError", "Text",
+    "TruncatedError", "ValueRangeError", "WireError", "checksum", "decode_envelope",
+    "encode_envelope", "encode_request", "unwrap", "wrap",
 ]

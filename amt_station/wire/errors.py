@@ -35,5 +35,9 @@ class ValueRangeError(WireError):
     """A value does not fit the field that is to carry it."""
 
 
+class MissingAtomError(WireError):
+    """A packet does not hold the value that is asked of it."""
+
+
 class StrayBytesError(WireError):
     """Bytes between frames that are neither a frame nor text."""

@@ -7,7 +7,8 @@ from dataclasses import dataclass, field
 from typing import Iterator
 
 from amt_station.wire.atoms import ATOM_HEADER_SIZE, RESULT_ATOM, Atom, check_byte, decode_atom
-from amt_station.wire.errors import HeadError, LengthError, TruncatedError, ValueRangeError
+from amt_station.wire.errors import (HeadError, LengthError, MissingAtomError, TruncatedError,
+                                     ValueRangeError)
 
 PACKET_SIZE = 4096
 PACKET_HEAD = 0xBB
@@ -72,10 +73,17 @@ class Packet:
         """The first atom with this id."""
         return next((atom for atom in self.atoms if atom.id == atom_id), None)
 
-    def get_int(self, atom_id: int, default: int = 0) -> int:
-        """The number in an integer or one-byte atom; ``default`` for any other or none."""
+    def get_int(self, atom_id: int, default: int | None = None) -> int:
+        """The number in an integer or one-byte atom.
+
+        For any other atom or none it is ``default``, without which ``MissingAtomError`` is raised.
+        """
         atom = self.find(atom_id)
-        return atom.value if atom is not None and isinstance(atom.value, int) else default
+        if atom is not None and isinstance(atom.value, int):
+            return atom.value
+        if default is None:
+            raise MissingAtomError(f"packet {self.command} holds no number in an atom {atom_id}")
+        return default
 
     @property
     def result(self) -> int | None:

@@ -65,7 +65,7 @@ def test_refused_before_the_port_is_touched(arguments: list[str], status: int, w
 
 def test_the_handset_says_no(peer: Peer, run_station: Run) -> None:
     peer.script = answering(code=1)
-    result = run_station("-p", peer.path, "pcba", "read")
+    result = run_station("-p", peer.path, "adb-serial", "read")
     assert (result.returncode, result.stdout) == (1, "")
     assert ONE_LINE.match(result.stderr)
     assert "refused with code 1" in result.stderr and "unplug the USB cable" in result.stderr

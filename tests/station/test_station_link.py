@@ -261,7 +261,7 @@ class FloodingPort:
         """Always something."""
         return b"x" * 100
 
-    def write(self, data: bytes) -> None:
+    def write(self, data: bytes, timeout: float) -> None:
         """Gone."""
 
     def close(self) -> None:

@@ -120,7 +120,7 @@ def test_a_failed_step_can_end_the_plan(tmp_path: Path, peer: Peer, link: Link) 
 def test_a_step_without_an_answer_is_an_error_and_the_plan_goes_on(tmp_path: Path, peer: Peer,
                                                                    link: Link) -> None:
     plan = load(tmp_path, ADC + "timeout = 0.3\n" + ADC)
-    peer.script = sequence([], [ACKNOWLEDGEMENT, adc(15)])
+    peer.script = sequence([], [b"\r\nOK\r\n"], [ACKNOWLEDGEMENT, adc(15)])
     assert [result.verdict.value for result in run_plan(link, plan)] == ["error", "pass"]
 
 

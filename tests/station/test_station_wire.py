@@ -8,8 +8,9 @@ from hypothesis import strategies as st
 
 from amt_station.wire import (ACKNOWLEDGEMENT, LARGEST_REQUEST, PACKET_SIZE, Atom, AtomType,
                               AtomTypeError, ChecksumError, HeadError, LengthError, MagicError,
-                              Packet, TruncatedError, ValueRangeError, WireError, checksum,
-                              decode_envelope, encode_envelope, encode_request, unwrap, wrap)
+                              MissingAtomError, Packet, TruncatedError, ValueRangeError, WireError,
+                              checksum, decode_envelope, encode_envelope, encode_request, unwrap,
+                              wrap)
 from amt_station.wire.envelope import check_envelope_packet
 
 
@@ -62,8 +63,11 @@ def test_values_of_atoms() -> None:
                         Atom.boolean(4, 7), Atom.integer(2, 9)))
     assert [atom.value for atom in packet.atoms] == [-5, "grün", b"\0\1", 7, 9]
     assert packet.find(2) == Atom.string(2, "grün"), "the first of two atoms counts"
-    assert (packet.get_int(1), packet.get_int(4), packet.get_int(2), packet.get_int(99)) == (
+    assert (packet.get_int(1), packet.get_int(4), packet.get_int(2, 0), packet.get_int(99, 0)) == (
         -5, 7, 0, 0)
+    for missing in (2, 99):
+        with pytest.raises(MissingAtomError, match=f"no number in an atom {missing}"):
+            packet.get_int(missing)
     assert packet.result == -5
     assert Packet(1).result is None
 

@@ -9,9 +9,9 @@ from typing import Callable, Mapping
 from amt_simulator import Handset, screen
 from amt_station.errors import Refused, StationError
 from amt_station.link import Link
-from amt_station.render import printable
 from amt_station.requests.operations import Value, operation_packet, read_answer
 from amt_station.requests.table import display_name, find_operation, requests_by_id
+from amt_station.text import printable
 from amt_station.wire.decoder import Acknowledgement, Frame, Item, Text
 from amt_station.wire.packet import Packet
 

@@ -17,7 +17,8 @@ REQUESTS: tuple[Request, ...] = (
         answer_fields=(Field(151, INT, "adc", "ADC value; 0 when the battery driver cannot be "
                              "asked", unit="raw ADC steps"), RESULT),
         pc=on_pc("asks the battery driver", DEVICE_FILE),
-        operations=(Operation(("battery", "adc"), "read the battery ADC", channels=_PC),)),
+        operations=(Operation(("battery", "adc"), "read the battery ADC", channels=_PC,
+                              brings=("adc",)),)),
     Request(
         226, "battery-calibrate", "battery ADC calibration",
         fields=tuple(Field(146 + number, INT, name, f"calibration value {number + 1}", absent="0")
@@ -61,7 +62,7 @@ REQUESTS: tuple[Request, ...] = (
                        RESULT),
         app=on_app("reads the size of the mounted card"),
         operations=(Operation(("tf-card",), "read the memory card's capacity",
-                              channels=_APP),)),
+                              channels=_APP, brings=("capacity",)),)),
     Request(
         33, "audio", "play the configured sound", fields=(ON,),
         app=on_app("starts or ends the player program",
@@ -97,17 +98,19 @@ REQUESTS: tuple[Request, ...] = (
                              "selected input is not there"), RESULT),
         app=on_app("asks the camera driver", Refusal("the camera is neither 1 nor 2"), _CAMERA),
         operations=(Operation(("camera", "test"), "camera self-test", takes=("camera",),
-                              channels=_APP),)),
+                              channels=_APP, brings=("outcome",)),)),
     Request(
         238, "dev-info", "device information text",
         answer_fields=(Field(200, STRING, "information", "at most 4055 characters"), RESULT),
         app=on_app("calls the platform's test library", TEST_HAL),
-        operations=(Operation(("dev-info",), "read the device information", channels=_APP),)),
+        operations=(Operation(("dev-info",), "read the device information", channels=_APP,
+                              brings=("information",)),)),
     Request(
         246, "emmc-info", "eMMC information",
         answer_fields=(Field(205, STRING, "information", "first line of "
                              "/sys/devinfo/emmc_info, at most 48 characters"), RESULT),
         pc=on_pc("reads the file", Refusal("the file cannot be opened or is empty")),
         at_twin="AT^DEMMCINFO?",
-        operations=(Operation(("emmc-info",), "read the eMMC information", channels=_PC),)),
+        operations=(Operation(("emmc-info",), "read the eMMC information", channels=_PC,
+                              brings=("information",)),)),
 )

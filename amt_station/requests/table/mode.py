@@ -26,7 +26,7 @@ REQUESTS: tuple[Request, ...] = (
         app=asks_modem("asks the modem (AT^DMCC?)", MODEM_ERROR,
                        Refusal("the answer has fewer than four fields", 10)),
         operations=(Operation(("mode", "support"), "ask the modem for its support",
-                              channels=_APP),)),
+                              channels=_APP, brings=("standby0-rat",)),)),
     Request(
         219, "damt1", "whether a USB-inserted start may enter the test mode",
         fields=(Field(192, INT, "operation", "0 deny, 1 allow, 2 query; app channel only",
@@ -45,7 +45,7 @@ REQUESTS: tuple[Request, ...] = (
             Operation(("damt1", "allow"), "allow entry by USB insertion", {"operation": 1},
                       channels=_APP),
             Operation(("damt1", "query"), "ask for the permission", {"operation": 2},
-                      channels=_APP))),
+                      channels=_APP, brings=("permission",)))),
     Request(
         236, "power-off", "power the handset off",
         pc=on_pc("answers, waits 2 s and powers off"),
@@ -66,5 +66,5 @@ REQUESTS: tuple[Request, ...] = (
                  Refusal("the platform's test library or its entry is missing")),
         at_twin="AT^DBOOTDLFIN",
         operations=(Operation(("boot-download",), "read the boot-download-finished flag",
-                              channels=_PC),)),
+                              channels=_PC, brings=("flag",)),)),
 )

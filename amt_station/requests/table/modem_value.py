@@ -15,7 +15,8 @@ _APP = (Channel.APP,)
 VERSION = Request(
     45, "version", "version text of a module",
     fields=(Field(19, INT, "module", "which module", choices=MODULES, absent="0 (refused)"),),
-    answer_fields=(Field(19, INT, "module", "the module asked for", choices=MODULES),
+    answer_fields=(Field(19, INT, "module", "the module asked for", choices=MODULES,
+                         echo=True),
                    Field(18, BYTES, "version", "version text", text=True), RESULT),
     pc=Service("handset", True,
                "modules l1 and hls are passed on to the modem without an acknowledgement; "
@@ -36,7 +37,8 @@ VERSION = Request(
            "The modem's version is cut at its first `0a` of hexadecimal text, wherever that "
            "stands."),
     at_twin="AT^DSVER",
-    operations=(Operation(("version",), "version text of a module", takes=("module",)),))
+    operations=(Operation(("version",), "version text of a module", takes=("module",),
+                          brings=("module", "version")),))
 
 REQUESTS: tuple[Request, ...] = (
     VERSION,
@@ -45,11 +47,11 @@ REQUESTS: tuple[Request, ...] = (
         answer_fields=(Field(38, STRING, "board", "board number, at most 38 characters"), RESULT),
         app=asks_modem("asks the modem (AT^DMSN)", MODEM_ERROR,
                        Refusal("the number is longer than 38 characters", 10)),
-        operations=(Operation(("board", "read"), "read the board number"),)),
+        operations=(Operation(("board", "read"), "read the board number", brings=("board",)),)),
     Request(
         87, "board-write", "write the board (serial) number",
         fields=(Field(38, STRING, "board", "board number, at most 20 characters are kept",
-                      longest=20, positional=True),),
+                      longest=20, positional=True, format="serial"),),
         pc=REMEMBERED_ON_PC,
         app=asks_modem("tunnelled to the modem (AT^DTTEST)",
                        Refusal("the modem answers an error, or its answer cannot be converted")),
@@ -64,15 +66,16 @@ REQUESTS: tuple[Request, ...] = (
         app=asks_modem("asks the modem (AT^DMFD??)", MODEM_ERROR,
                        Refusal("the record is erased (first byte 0xFF) or longer than 14 "
                                "characters", 10)),
-        operations=(Operation(("out-date", "read"), "read the out-date record"),)),
+        operations=(Operation(("out-date", "read"), "read the out-date record",
+                              brings=("out-date",)),)),
     Request(
         55, "temperature", "battery temperature",
-        answer_fields=(Field(22, INT, "temperature", "battery temperature",
-                             unit="as the driver gives it, usually 0.1 degree Celsius"), RESULT),
+        answer_fields=(Field(22, INT, "temperature", "battery temperature; the driver gives "
+                             "tenths of a degree", unit="°C", scale=10), RESULT),
         app=on_app("reads sys/class/power_supply/battery/temp",
                    Refusal("the file cannot be opened or holds no number", 10)),
         operations=(Operation(("battery", "temperature"), "read the battery temperature",
-                              channels=_APP),)),
+                              channels=_APP, brings=("temperature",)),)),
     Request(
         232, "channel-switch", "modem channel that later AT commands address",
         fields=(Field(159, INT, "channel", "modem channel", low=0, high=9, absent="0",
@@ -90,18 +93,19 @@ REQUESTS: tuple[Request, ...] = (
         answer_fields=(Field(163, BYTES, "serial-number", "serial number, at most 38 bytes",
                              text=True), RESULT),
         app=asks_modem("asks the modem (AT^DMSN)", MODEM_ERROR),
-        operations=(Operation(("serial-number", "read"), "read the modem's serial number"),)),
+        operations=(Operation(("serial-number", "read"), "read the modem's serial number",
+                              brings=("serial-number",)),)),
     Request(
         99, "sim-check", "whether a SIM is there",
         answer_fields=(Field(41, BOOL, "sim", "1 when the SIM type is 1 or 2, else 0",
                              choices={"none": 0, "present": 1}),),
         app=asks_modem("asks the modem (AT^DTOC)", MODEM_ERROR),
         notes=("The answer carries no result code.",),
-        operations=(Operation(("sim", "check"), "check for a SIM"),)),
+        operations=(Operation(("sim", "check"), "check for a SIM", brings=("sim",)),)),
     Request(
         5, "imei-write", "write the IMEI",
         fields=(Field(21, STRING, "imei", "IMEI, at most 20 characters are kept", longest=20,
-                      positional=True),),
+                      positional=True, format="imei"),),
         pc=REMEMBERED_ON_PC,
         app=asks_modem("tunnelled to the modem (AT^DTTEST)",
                        Refusal("the modem answers an error, or its answer cannot be converted")),
@@ -113,12 +117,12 @@ REQUESTS: tuple[Request, ...] = (
         answer_fields=(RESULT, Field(21, BYTES, "imei", "IMEI, 15 bytes", text=True)),
         app=asks_modem("tunnelled to the modem (AT^DTTEST)",
                        Refusal("the modem answers an error, or its answer cannot be converted")),
-        operations=(Operation(("imei", "read"), "read the IMEI"),)),
+        operations=(Operation(("imei", "read"), "read the IMEI", brings=("imei",)),)),
     Request(
         9, "battery-voltage", "battery voltage",
-        answer_fields=(Field(5, INT, "voltage", "battery voltage",
-                             unit="as the kernel gives it, usually microvolt"), RESULT),
+        answer_fields=(Field(5, INT, "voltage", "battery voltage; the kernel gives microvolt",
+                             unit="V", scale=1000000), RESULT),
         app=on_app("reads /sys/class/power_supply/battery/voltage_now", DEVICE_FILE),
         operations=(Operation(("battery", "voltage"), "read the battery voltage",
-                              channels=_APP),)),
+                              channels=_APP, brings=("voltage",)),)),
 )

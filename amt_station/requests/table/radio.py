@@ -37,14 +37,15 @@ REQUESTS: tuple[Request, ...] = (
         187, "wifi", "Wi-Fi radio test",
         fields=(Field(154, BYTES, "step", "what to do; the first byte of the atom counts, "
                       "whatever its type", choices=_WIFI_STEPS, width=1, absent="0 (refused)"),
-                Field(155, BYTES, "channel", "Wi-Fi channel", width=1, low=0, high=255,
+                Field(155, BYTES, "channel", "Wi-Fi channel", width=1, low=1, high=196,
                       absent="refused where it is needed"),
-                Field(156, BYTES, "rate", "rate", width=2, low=0, high=65535,
+                Field(156, BYTES, "rate", "rate, in hundredths of Mbit/s or as "
+                      "the test library takes it", width=2, low=1, high=5400,
                       unit="the test library's", absent="refused where it is needed"),
-                Field(157, BYTES, "power", "transmit power", width=2, low=0, high=65535,
+                Field(157, BYTES, "power", "transmit power", width=2, low=0, high=127,
                       unit="the test library's", absent="refused where it is needed")),
         answer_fields=(Field(154, BYTES, "step", "the step asked for", choices=_WIFI_STEPS,
-                             width=1),
+                             width=1, echo=True),
                        Field(158, INT, "packets", "packets received, only in the answer to the "
                              "end of reception"), RESULT),
         pc=on_pc(_WIFI_HOW, *_WIFI_REFUSALS), app=on_app(_WIFI_HOW, *_WIFI_REFUSALS),
@@ -64,7 +65,7 @@ REQUESTS: tuple[Request, ...] = (
             Operation(("wifi", "rx", "start"), "start reception", {"step": 5},
                       ("channel", "rate"), before=_WIFI_ON),
             Operation(("wifi", "rx", "stop"), "stop reception and read the packets received",
-                      {"step": 6}, before=_WIFI_ON))),
+                      {"step": 6}, before=_WIFI_ON, brings=("packets",)))),
     Request(
         174, "gps-control", "GPS start, stop and connectivity check",
         fields=(Field(140, INT, "operation", "0 stop, 1 start, 2 connectivity check; any other "
@@ -83,12 +84,12 @@ REQUESTS: tuple[Request, ...] = (
         operations=(Operation(("gps", "test"), "GPS test (answered only)"),)),
     Request(
         178, "gps-read", "signal of one satellite",
-        fields=(Field(141, INT, "index", "satellite index", absent="0"),),
+        fields=(Field(141, INT, "index", "satellite index", low=0, absent="0"),),
         answer_fields=(Field(144, INT, "cnr", "carrier-to-noise value",
                              unit="the test library's, usually dB-Hz"),
                        Field(141, INT, "satellite", "satellite id"), RESULT),
         pc=on_pc(_GPS_HOW, TEST_LIBRARY), app=on_app(_GPS_HOW, TEST_LIBRARY),
         timeout=30.0,
         operations=(Operation(("gps", "read"), "read the signal of a satellite",
-                              takes=("index",)),)),
+                              takes=("index",), brings=("satellite", "cnr")),)),
 )

@@ -8,7 +8,7 @@ from amt_station.requests.table.common import INT, MODEM_ERROR, STRING, VERDICTS
 
 _VERDICT = Field(36, INT, "verdict", "1 pass, 2 fail, anything else unknown", choices=VERDICTS,
                  low=0, high=2, flags=True, absent="0 (unknown)")
-_STATION_OUT = Field(39, INT, "station", "station number")
+_STATION_OUT = Field(39, INT, "station", "station number", echo=True)
 _DESCRIPTION_OUT = Field(37, STRING, "description", "test description, at most 127 characters")
 
 REQUESTS: tuple[Request, ...] = (
@@ -18,7 +18,7 @@ REQUESTS: tuple[Request, ...] = (
                       "/amt/amt_result.txt", low=0, absent="0"),
                 _VERDICT,
                 Field(37, STRING, "description", "test description, at most 126 characters; app "
-                      "channel only", longest=126, absent="none")),
+                      "channel only", longest=126, absent="none", format="description")),
         pc=Service("modem", False, "writes the verdict to /amt/amt_result.txt, whatever comes of "
                    "it, then passes the request on to the modem unchanged; the modem answers"),
         app=asks_modem("writes the verdict to /amt/amt_result.txt, whatever comes of it, and to "
@@ -27,14 +27,14 @@ REQUESTS: tuple[Request, ...] = (
                               takes=("station", "verdict"), may_take=("description",)),)),
     Request(
         89, "test-result-read", "read a station's verdict from the modem",
-        fields=(Field(39, INT, "station", "station number", low=0, absent="0"),),
+        fields=(Field(39, INT, "station", "station number", low=0, high=99, absent="0"),),
         answer_fields=(_STATION_OUT, _VERDICT, _DESCRIPTION_OUT, RESULT),
         app=asks_modem("asks the modem (AT^DATOMR) and writes the verdict to "
                        "/amt/amt_result.txt", MODEM_ERROR),
         notes=("Only two digits of the station number in the modem's answer are read; a modem "
                "that answers OK alone leaves the number asked for.",),
         operations=(Operation(("test-result", "read"), "read a station's verdict",
-                              takes=("station",)),)),
+                              takes=("station",), brings=("station", "verdict")),)),
     Request(
         228, "item-result-read", "read an item of /amt/product.txt",
         fields=(Field(39, INT, "station", "item index, counted from 0", low=0, high=35,
@@ -45,7 +45,8 @@ REQUESTS: tuple[Request, ...] = (
         notes=("Reading counts items from 0, writing from 1: what was written as station 1 is "
                "read as station 0.",),
         operations=(Operation(("item-result", "read"), "read an item (counted from 0)",
-                              takes=("station",), channels=(Channel.APP,)),)),
+                              takes=("station",), channels=(Channel.APP,),
+                              brings=("station", "verdict")),)),
     Request(
         230, "item-result-write", "store an item in /amt/product.txt",
         fields=(Field(39, INT, "station", "item number, counted from 1", low=1, high=36,

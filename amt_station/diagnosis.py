@@ -1,0 +1,113 @@
+"""Why an exchange failed: what came instead of the answer, in one line that says what to do."""
+
+from __future__ import annotations
+
+from typing import Sequence
+
+from amt_station.errors import BadFrame, NoAnswer, StationError
+from amt_station.exchange import AtReply, Exchange, Transcript
+from amt_station.requests.model import Channel
+from amt_station.requests.table import display_name
+from amt_station.text import shortened
+from amt_station.wire.decoder import Acknowledgement, BareDecoder, Frame, Item, Skipped, Text
+from amt_station.wire.envelope import HEAD_SIZE, MAGIC
+from amt_station.wire.packet import Packet
+
+_PC_LINE = "this is the PC line, not the app channel: use --pc"
+_APP_CHANNEL = "this is the app channel, not the PC line: use --app"
+
+
+class WrongLineWatch:
+    """Notices envelopes on a line that was named the app channel.
+
+    The packet inside an envelope would be read as an answer there, envelope or not.
+    """
+
+    def __init__(self) -> None:
+        self._tail = b""
+
+    def look(self, item: Item) -> None:
+        """Take the next item that arrived; raises ``BadFrame`` for an envelope."""
+        if isinstance(item, Frame):
+            self._tail = b""
+            return
+        seen = self._tail + item.raw
+        if MAGIC in seen:
+            raise BadFrame(f"a packet in an envelope came instead of a bare one; {_PC_LINE}")
+        self._tail = seen[-HEAD_SIZE:]
+
+
+def unanswered(exchange: Exchange, limit: float) -> StationError:
+    """The error for a request whose answer did not come within ``limit`` seconds."""
+    name = display_name(exchange.request.command)
+    arrived = [timed.item for timed in exchange.items]
+    if exchange.answers:
+        return NoAnswer(f"{name} was taken, but its outcome was not reported within {limit:g} s",
+                        arrived)
+    wrong = _wrong_line(arrived, exchange.channel)
+    if wrong:
+        return BadFrame(f"no answer to {name} within {limit:g} s: {wrong}")
+    if any(isinstance(item, Frame) and item.packet == exchange.request for item in arrived):
+        return NoAnswer(f"no answer to {name} within {limit:g} s: the line sent the request "
+                        "itself back, as an echo or a loop does", arrived)
+    damage = _first_damage(arrived)
+    if damage is not None:
+        return BadFrame(f"the answer to {name} could not be read: {damage.error}", damage.error)
+    instead = _instead(arrived)
+    if any(isinstance(item, Acknowledgement) for item in arrived):
+        return NoAnswer(f"{name} was acknowledged, but not answered within {limit:g} s{instead}",
+                        arrived)
+    return NoAnswer(f"no answer to {name} within {limit:g} s{instead}", arrived)
+
+
+def no_final_result(reply: AtReply, echoed: bool, limit: float) -> StationError:
+    """The error for an AT text whose final result did not come within ``limit`` seconds."""
+    wrong = _wrong_line(reply.stray, Channel.PC)
+    if wrong:
+        return BadFrame(f"no final result for {reply.sent} within {limit:g} s: {wrong}")
+    damage = _first_damage(reply.stray)
+    if damage is not None:
+        return BadFrame(f"the answer to {reply.sent} could not be read: {damage.error}",
+                        damage.error)
+    instead = _instead([timed.item for timed in reply.transcript.items])
+    if echoed and not reply.lines:
+        instead = ": the line only sent the text itself back, as an echo or a loop does"
+    return NoAnswer(f"no final result for {reply.sent} within {limit:g} s{instead}", reply.stray)
+
+
+def no_place(transcript: Transcript, limit: float) -> str:
+    """What to say when the link could not find its place."""
+    items = [timed.item for timed in transcript.items]
+    wrong = _wrong_line(items, transcript.channel)
+    instead = f": {wrong}" if wrong else _instead(items)
+    return (f"the line is out of step and the handset did not answer {transcript.what} within "
+            f"{limit:g} s{instead}; nothing else was sent")
+
+
+def _wrong_line(items: Sequence[Item], channel: Channel) -> str:
+    """That the answer came in the form of the other line; empty when it did not."""
+    if channel is not Channel.PC:
+        return ""
+    skipped = b"".join(item.raw for item in items if isinstance(item, Skipped))
+    packets = [item.packet for item in BareDecoder().feed(skipped) if isinstance(item, Frame)]
+    if not packets or MAGIC in skipped:
+        return ""
+    return f"{_packet(packets[0])} came without an envelope; {_APP_CHANNEL}"
+
+
+def _instead(items: Sequence[Item]) -> str:
+    """What came instead of an answer, short enough for the line; empty when nothing did."""
+    for item in items:
+        if isinstance(item, Frame):
+            return f"; {_packet(item.packet)} came instead"
+        if isinstance(item, Text) and item.text.strip():
+            return f"; the text {shortened(item.text.strip())} came instead"
+    return ""
+
+
+def _packet(packet: Packet) -> str:
+    return f"packet {packet.command} ({display_name(packet.command)})"
+
+
+def _first_damage(items: Sequence[Item]) -> Skipped | None:
+    return next((item for item in items if isinstance(item, Skipped)), None)
