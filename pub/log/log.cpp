@@ -7,22 +7,34 @@ namespace {
 constexpr uint32_t FLAG_TEXT_SIZE = 32;
 
 /* Set while this thread is inside the platform's log, whose locks a signal handler must not meet again. */
-thread_local volatile bool t_is_logging = false;
+struct guard_st
+{
+    volatile bool m_is_logging;
+    int m_errno;
+};
+thread_local guard_st t_guard;
 
 } // namespace
 
+void pub_log_prepare_thread()
+{
+    t_guard.m_is_logging = false;
+}
+
 bool pub_log_begin()
 {
-    if (t_is_logging) {
+    if (t_guard.m_is_logging) {
         return false;
     }
-    t_is_logging = true;
+    t_guard.m_errno = errno;
+    t_guard.m_is_logging = true;
     return true;
 }
 
 void pub_log_end()
 {
-    t_is_logging = false;
+    t_guard.m_is_logging = false;
+    errno = t_guard.m_errno;
 }
 
 void pub_log_entry(const pub_log_source_st &source, const char *func)

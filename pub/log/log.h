@@ -1,17 +1,20 @@
 #pragma once
 
-#include <errno.h>
+#include <errno.h> // IWYU pragma: export: most texts show it
 #include <initializer_list>
 #include <stdint.h>
 
 #include "platform/include/android/log.h"
 
 /*
- * Every log text of the daemon and its library is made here: one record a call, at debug priority.
+ * Log texts: one record a call, at debug priority.
  *
  * All operations preserve errno, so a run of lines about one failure shows the failing call's errno in each
  * of them. They may be called from a signal handler: a record that would interrupt the same thread in the
  * middle of another record is dropped instead of waiting for a lock that its own thread holds.
+ *
+ * What the guard knows of a thread is made by the thread's first record, or by pub_log_prepare_thread before
+ * a handler could be the first to log there.
  */
 
 /* Where a record comes from: the log tag (null: none) and the source name shown in error lines. */
@@ -23,6 +26,9 @@ struct pub_log_source_st
 
 /* A dump shows this many bytes, then "...". */
 constexpr uint32_t PUB_LOG_DUMP_SIZE = 250;
+
+/* Makes the guard's record of the calling thread. */
+void pub_log_prepare_thread();
 
 /* The entry line of the calling function: "func()". */
 void pub_log_entry(const pub_log_source_st &source, const char *func = __builtin_FUNCTION());
@@ -40,21 +46,15 @@ void pub_log_flags(const pub_log_source_st &source, std::initializer_list<bool> 
 /* Channel traffic: title, length and the first PUB_LOG_DUMP_SIZE bytes in hexadecimal. */
 void pub_log_dump(const pub_log_source_st &source, const char *title, const uint8_t *data, uint32_t length);
 
-/* Whether this thread may write a record now; if so, pub_log_end must follow it. */
+/*
+ * The guard around a record, for PUB_LOG alone. Whether this thread may write one now, which it may not in the
+ * middle of another; if so, pub_log_end must follow and brings back the errno that pub_log_begin has found.
+ */
 bool pub_log_begin();
 void pub_log_end();
 
-/* Runs print, which writes one record, unless it interrupts another record of the same thread. */
-template <typename print_func> void pub_log_guarded(print_func print)
-{
-    const int saved_errno = errno;
-    if (pub_log_begin()) {
-        print();
-        pub_log_end();
-    }
-    errno = saved_errno;
-}
-
 /* One record of free text. The platform's log formats it: doing so here first would cost as much again. */
 #define PUB_LOG(source, ...)                                                                                 \
-    pub_log_guarded([&] { __android_log_print(ANDROID_LOG_DEBUG, (source).m_tag_ptr, __VA_ARGS__); })
+    (pub_log_begin()                                                                                         \
+         ? (__android_log_print(ANDROID_LOG_DEBUG, (source).m_tag_ptr, __VA_ARGS__), pub_log_end())          \
+         : static_cast<void>(0))

@@ -8,7 +8,7 @@
 
 namespace {
 
-/* Holds the longest text there is: a whole 4096-byte receive area after its title. */
+/* With the terminating zero: room for a page of text behind a title. */
 constexpr size_t TEXT_SIZE = 4608;
 
 void write_whole(const char *text, size_t length)
