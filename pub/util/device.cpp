@@ -1,4 +1,4 @@
-#include "pub/util/util.h"
+#include "pub/util/device.h"
 
 #include <errno.h>
 #include <fcntl.h>
@@ -7,6 +7,7 @@
 
 #include "pub/error.h"
 #include "pub/pub-log.h"
+#include "pub/util/thread-end.h"
 
 namespace {
 

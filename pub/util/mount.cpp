@@ -1,4 +1,4 @@
-#include "pub/util/util.h"
+#include "pub/util/mount.h"
 
 #include <stdio.h>
 #include <string.h>

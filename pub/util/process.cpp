@@ -1,13 +1,16 @@
-#include "pub/util/util.h"
+#include "pub/util/process.h"
 
 #include <errno.h>
+#include <poll.h>
 #include <sched.h>
+#include <signal.h>
 #include <stdio.h>
 #include <stdlib.h>
 #include <string.h>
 #include <unistd.h>
 
 #include "pub/error.h"
+#include "pub/file/scan.h"
 #include "pub/pub-log.h"
 
 namespace {
@@ -16,6 +19,7 @@ constexpr uint32_t WORD_SIZE = 80;
 constexpr uint32_t PROC_PATH_SIZE = 256;
 constexpr uint32_t SHELL_COMMAND_SIZE = 60;
 constexpr int PRIORITY_BELOW_MAXIMUM = 4;
+constexpr uint32_t INTERRUPT_PATIENCE_MS = 200;
 constexpr char CHECK_RUN[] = "pub_util_get_pid_and_check_run";
 
 bool is_empty(const char *text)
@@ -23,63 +27,29 @@ bool is_empty(const char *text)
     return text != nullptr && *text == '\0';
 }
 
-bool is_blank(int character)
+/* What a file that cannot be opened leaves in the log, in the name of the calling function. */
+void log_unopened(const char *path, const char *func = __builtin_FUNCTION(), int line = __builtin_LINE())
 {
-    return character == ' ' || (character >= '\t' && character <= '\r');
+    pub_log_error(g_pub_util_log, PUB_ERR_FILE, func, line);
+    PUB_LOG(g_pub_util_log, "Open file \"%s\" fail: %d - %s", path, errno, strerror(errno));
 }
 
-/* Opens a file for reading; a failure is logged in the name of func. */
-FILE *open_file(const char *path, const char *func, int line)
+/* Whether the file holds a number, which goes to *pid_ptr. */
+bool read_pid_file(const char *path, long *pid_ptr)
 {
-    FILE *file = fopen(path, "re");
-    if (file == nullptr) {
-        pub_log_error(g_pub_util_log, PUB_ERR_FILE, func, line);
-        PUB_LOG(g_pub_util_log, "Open file \"%s\" fail: %d - %s", path, errno, strerror(errno));
+    const pub_file_st file(path, pub_file_mode_en::READ);
+    if (!file.is_open()) {
+        log_unopened(path, CHECK_RUN);
+        return false;
     }
-    return file;
-}
-
-/*
- * Reads the first word of a command line, whose arguments are separated by zero bytes; what exceeds the
- * buffer is left unread. Returns 1, or EOF with buf untouched, as fscanf would.
- */
-int scan_word(FILE *file, char *buf, uint32_t capacity)
-{
-    int character = getc(file);
-    while (is_blank(character)) {
-        character = getc(file);
-    }
-    if (character == EOF) {
-        return EOF;
-    }
-    uint32_t used = 0;
-    while (used < capacity - 1 && character != EOF && character != '\0' && !is_blank(character)) {
-        buf[used++] = static_cast<char>(character);
-        character = getc(file);
-    }
-    buf[used] = '\0';
-    return 1;
-}
-
-/* The process id that the file holds, 0 when there is none to be had. */
-long read_pid_file(const char *pid_file)
-{
-    FILE *file = open_file(pid_file, CHECK_RUN, __LINE__);
-    if (file == nullptr) {
-        return 0;
-    }
-    long pid = 0;
-    errno = 0; /* text that is no number sets none */
-    const int scanned = fscanf(file, "%18ld", &pid);
+    const int scanned = pub_file_scan_long(file, pid_ptr);
     if (scanned != 1) {
         pub_log_error(g_pub_util_log, PUB_ERR_FILE, CHECK_RUN);
         PUB_LOG(g_pub_util_log, "fscanf() return: %d; %d - %s", scanned, errno, strerror(errno));
-        pid = 0;
-    } else {
-        PUB_LOG(g_pub_util_log, "pub_util_get_pid_and_check_run pid[%d]", static_cast<int>(pid));
+        return false;
     }
-    fclose(file);
-    return pid;
+    PUB_LOG(g_pub_util_log, "pub_util_get_pid_and_check_run pid[%d]", static_cast<int>(*pid_ptr));
+    return true;
 }
 
 /* Whether the process lives and its command line's first word contains name. */
@@ -88,14 +58,37 @@ bool is_program(long pid, const char *name)
     char buf_a[WORD_SIZE];
     snprintf(buf_a, sizeof(buf_a), "/proc/%ld/cmdline", pid);
     PUB_LOG(g_pub_util_log, "pub_util_get_pid_and_check_run fopen buf_a[%s]", buf_a);
-    FILE *file = open_file(buf_a, CHECK_RUN, __LINE__);
-    if (file == nullptr) {
+    const pub_file_st file(buf_a, pub_file_mode_en::READ);
+    if (!file.is_open()) {
+        log_unopened(buf_a, CHECK_RUN);
         return false;
     }
-    const int scanned = scan_word(file, buf_a, sizeof(buf_a));
+    const int scanned = pub_file_scan_word(file, buf_a, sizeof(buf_a));
     PUB_LOG(g_pub_util_log, "pub_util_get_pid_and_check_run fscanf buf_a[%s] ret_val[%d]", buf_a, scanned);
-    fclose(file);
     return scanned == 1 && strstr(buf_a, name) != nullptr;
+}
+
+/*
+ * Waits, a bounded time, until a SIGINT that is on its way to another thread has got there: the next shell
+ * command begins by throwing it away.
+ */
+void let_interrupt_pass()
+{
+    const int saved_errno = errno;
+    sigset_t interrupt;
+    sigset_t own_mask;
+    sigset_t pending;
+    sigemptyset(&interrupt);
+    sigaddset(&interrupt, SIGINT);
+    pthread_sigmask(SIG_BLOCK, &interrupt, &own_mask); /* only what is blocked is shown as pending */
+    for (uint32_t i = 0; i < INTERRUPT_PATIENCE_MS; i++) {
+        if (sigpending(&pending) != 0 || sigismember(&pending, SIGINT) != 1) {
+            break;
+        }
+        poll(nullptr, 0, 1);
+    }
+    pthread_sigmask(SIG_SETMASK, &own_mask, nullptr);
+    errno = saved_errno;
 }
 
 } // namespace
@@ -115,8 +108,8 @@ int pub_util_get_pid_and_check_run(const char *pid_file, const char *name, int32
     PUB_LOG(g_pub_util_log, "pub_util_get_pid_and_check_run pid_file_ptr[%s] name_ptr[%s]", pid_file, name);
     *is_run_ptr = 0;
     *pid_ptr = 0;
-    const long pid = read_pid_file(pid_file);
-    if (pid != 0 && is_program(pid, name)) {
+    long pid = 0;
+    if (read_pid_file(pid_file, &pid) && is_program(pid, name)) {
         *is_run_ptr = 1;
         *pid_ptr = static_cast<int32_t>(pid);
     }
@@ -137,7 +130,7 @@ int pub_util_create_pid_file(const char *name)
     char command_a[SHELL_COMMAND_SIZE];
     snprintf(command_a, sizeof(command_a), "echo %d > /tmp/%s.pid", pid, name);
     /* A process without a pid file serves all the same. */
-    const int ignored = system(command_a); // NOLINT(cert-env33-c,concurrency-mt-unsafe)
+    const int ignored = pub_util_run_shell(command_a);
     static_cast<void>(ignored);
     PUB_LOG(g_pub_util_log, "PID of %s: %d", name, pid);
     return PUB_ERR_NONE;
@@ -154,18 +147,17 @@ int pub_util_get_cmd_line(int32_t pid, char *buf, uint32_t capacity)
     memset(buf, 0, capacity);
     char path_a[PROC_PATH_SIZE];
     snprintf(path_a, sizeof(path_a), "/proc/%ld/cmdline", static_cast<long>(pid));
-    FILE *file = open_file(path_a, __func__, __LINE__);
-    if (file == nullptr) {
+    const pub_file_st file(path_a, pub_file_mode_en::READ);
+    if (!file.is_open()) {
+        log_unopened(path_a);
         return PUB_ERR_FILE;
     }
-    errno = 0; /* an empty command line sets none */
-    const int scanned = scan_word(file, buf, capacity);
-    if (scanned != 1) {
+    if (pub_file_scan_word(file, buf, capacity) != 1) {
         pub_log_sys_call(g_pub_util_log, "fscanf");
         pub_log_error(g_pub_util_log, PUB_ERR_SYS_CALL);
+        return PUB_ERR_FILE;
     }
-    fclose(file);
-    return scanned == 1 ? PUB_ERR_NONE : PUB_ERR_FILE;
+    return PUB_ERR_NONE;
 }
 
 int pub_util_get_process_path(char *buf, uint32_t capacity)
@@ -198,10 +190,18 @@ int pub_util_raise_process_priority()
     }
     sched_param param = {};
     param.sched_priority = maximum - PRIORITY_BELOW_MAXIMUM;
-    if (sched_setscheduler(getpid(), SCHED_FIFO, &param) < 0) {
+    /* The kernel takes a process for its first thread; threads inherit from the one that creates them. */
+    if (sched_setscheduler(getpid(), SCHED_FIFO, &param) < 0 || sched_setscheduler(0, SCHED_FIFO, &param) < 0)
+    {
         pub_log_sys_call(g_pub_util_log, "sched_setscheduler");
         pub_log_error(g_pub_util_log, PUB_ERR_SYS_CALL);
         return PUB_ERR_SYS_CALL;
     }
     return PUB_ERR_NONE;
+}
+
+int pub_util_run_shell(const char *command)
+{
+    let_interrupt_pass();
+    return system(command); // NOLINT(cert-env33-c,concurrency-mt-unsafe)
 }

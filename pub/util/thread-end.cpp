@@ -1,6 +1,7 @@
 #include "pub/util/thread-end.h"
 
 #include <errno.h>
+#include <poll.h>
 #include <pthread.h>
 #include <signal.h>
 #include <string.h>
@@ -9,16 +10,24 @@
 
 #include "pub/error.h"
 #include "pub/pub-log.h"
-#include "pub/util/util.h"
 
 namespace {
 
 constexpr uint32_t END_WAIT_MS = 10;
+constexpr long NS_PER_MS = 1000000;
+constexpr long NS_PER_SECOND = 1000000000;
 
-/* Each thread's own, so that a handler on that thread is the only one that interferes. */
-thread_local volatile sig_atomic_t t_is_deferred = 0;
-thread_local volatile sig_atomic_t t_is_forbidden = 0;
-thread_local volatile sig_atomic_t t_is_noted = 0;
+/*
+ * Each thread's own, so that a handler on that thread is the only one that interferes. One record: where
+ * thread-local storage is emulated, the first touch allocates, and it is the same for all of it.
+ */
+struct end_state_st
+{
+    volatile sig_atomic_t m_is_deferred;
+    volatile sig_atomic_t m_is_forbidden;
+    volatile sig_atomic_t m_is_noted;
+};
+thread_local end_state_st t_end;
 
 pthread_once_t g_unwinder_once = PTHREAD_ONCE_INIT;
 
@@ -39,52 +48,105 @@ void load_unwinder()
     }
 }
 
+timespec get_deadline(uint32_t ms)
+{
+    timespec time = {};
+    clock_gettime(CLOCK_MONOTONIC, &time);
+    time.tv_sec += static_cast<time_t>(ms / 1000);
+    time.tv_nsec += static_cast<long>(ms % 1000) * NS_PER_MS;
+    if (time.tv_nsec >= NS_PER_SECOND) {
+        time.tv_sec++;
+        time.tv_nsec -= NS_PER_SECOND;
+    }
+    return time;
+}
+
+timespec get_left(const timespec &deadline)
+{
+    timespec now = {};
+    clock_gettime(CLOCK_MONOTONIC, &now);
+    timespec left = {deadline.tv_sec - now.tv_sec, deadline.tv_nsec - now.tv_nsec};
+    if (left.tv_nsec < 0) {
+        left.tv_sec--;
+        left.tv_nsec += NS_PER_SECOND;
+    }
+    return left.tv_sec < 0 ? timespec{} : left;
+}
+
+/* What poll says of the descriptor, or of none, until the time is over. */
+int poll_until(const timespec &deadline, pollfd *fd_ptr)
+{
+    for (;;) {
+        const timespec left = get_left(deadline);
+        const int ready = ppoll(fd_ptr, fd_ptr != nullptr ? 1 : 0, &left, nullptr);
+        if (ready >= 0 || errno != EINTR) {
+            return ready;
+        }
+    }
+}
+
+/* The same, with the thread's end allowed. */
+int poll_open_to_end(const timespec &deadline, pollfd *fd_ptr)
+{
+    const bool was_deferred = pub_util_is_thread_end_deferred();
+    pub_util_allow_thread_end();
+    const int ready = poll_until(deadline, fd_ptr);
+    if (was_deferred) {
+        pub_util_defer_thread_end();
+    }
+    return ready;
+}
+
 } // namespace
 
 void pub_util_defer_thread_end()
 {
+    const int saved_errno = errno;
     pthread_once(&g_unwinder_once, load_unwinder);
-    if (t_is_forbidden == 0) {
-        t_is_deferred = 1;
+    errno = saved_errno;
+    if (t_end.m_is_forbidden == 0) {
+        t_end.m_is_deferred = 1;
     }
 }
 
 void pub_util_allow_thread_end()
 {
-    if (t_is_forbidden != 0) {
+    if (t_end.m_is_forbidden != 0) {
         return;
     }
-    t_is_deferred = 0;
-    if (t_is_noted != 0) {
+    t_end.m_is_deferred = 0;
+    if (t_end.m_is_noted != 0) {
         pub_util_handle_thread_signal(SIGUSR1);
     }
 }
 
 void pub_util_forbid_thread_end()
 {
-    t_is_forbidden = 1;
+    t_end.m_is_forbidden = 1;
 }
 
 bool pub_util_is_thread_end_deferred()
 {
-    return t_is_deferred != 0;
+    return t_end.m_is_deferred != 0;
 }
 
 void pub_util_sleep_ms(uint32_t ms)
 {
     const int saved_errno = errno;
-    const bool was_deferred = pub_util_is_thread_end_deferred();
-    timespec left = {};
-    left.tv_sec = static_cast<time_t>(ms / 1000);
-    left.tv_nsec = static_cast<long>(ms % 1000) * 1000000L;
-    pub_util_allow_thread_end();
-    /* nanosleep, which the kernel measures on its monotonic clock: ThreadSanitizer delivers signals in it. */
-    while (nanosleep(&left, &left) != 0 && errno == EINTR) {
-    }
+    poll_open_to_end(get_deadline(ms), nullptr);
     errno = saved_errno;
-    if (was_deferred) {
-        pub_util_defer_thread_end();
+}
+
+int pub_util_wait_fd(int fd, short events, uint32_t timeout_ms)
+{
+    /* poll takes a negative descriptor for none at all. */
+    pollfd poll_fd = {fd, events, 0};
+    const int ready = fd < 0 ? 1 : poll_open_to_end(get_deadline(timeout_ms), &poll_fd);
+    if (fd < 0 || (ready > 0 && (poll_fd.revents & POLLNVAL) != 0)) {
+        errno = EBADF;
+        return -1;
     }
+    return ready;
 }
 
 int pub_util_kill_thread(pthread_t *thread_ptr)
@@ -105,7 +167,9 @@ int pub_util_kill_thread(pthread_t *thread_ptr)
         PUB_LOG(g_pub_util_log, "pthread_kill(): %d - %s", error_number, strerror(error_number));
         return error_number;
     }
-    pub_util_sleep_ms(END_WAIT_MS);
+    const int saved_errno = errno;
+    poll_until(get_deadline(END_WAIT_MS), nullptr);
+    errno = saved_errno;
     *thread_ptr = 0;
     return PUB_ERR_NONE;
 }
@@ -118,16 +182,16 @@ void pub_util_handle_thread_signal(int signal_number)
         PUB_LOG(g_pub_util_log, "unknown signal: %d", signal_number);
         return;
     }
-    if (t_is_forbidden != 0) {
+    if (t_end.m_is_forbidden != 0) {
         return;
     }
-    if (t_is_deferred != 0) {
-        t_is_noted = 1;
+    if (t_end.m_is_deferred != 0) {
+        t_end.m_is_noted = 1;
         return;
     }
     /* The farewell is work, too: a second signal must not end the thread in the middle of it. */
-    t_is_deferred = 1;
-    t_is_forbidden = 1;
+    t_end.m_is_deferred = 1;
+    t_end.m_is_forbidden = 1;
     pub_log_entry(g_pub_util_log);
     PUB_LOG(g_pub_util_log, "thread %d will be end", static_cast<int>(gettid()));
     pthread_exit(nullptr);

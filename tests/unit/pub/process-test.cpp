@@ -4,7 +4,9 @@
 #include <errno.h>
 #include <fcntl.h>
 #include <limits.h>
+#include <pthread.h>
 #include <sched.h>
+#include <signal.h>
 #include <stdio.h>
 #include <string.h>
 #include <string>
@@ -211,6 +213,31 @@ TEST(check_run, very_long_number)
 {
     const temp_folder_c dir;
     expect_not_running(check_run(write_pid_file(dir, std::string(100000, '9')), "some-daemon"));
+}
+
+TEST(check_run, number_with_leading_zeros)
+{
+    const temp_folder_c dir;
+    const other_program_c program("/opt/some-daemon");
+    const std::string pid_file = write_pid_file(dir, std::string(30, '0') + std::to_string(program.pid()));
+    const check_run_st run = check_run(pid_file, "some-daemon");
+    EXPECT_EQ(run.m_is_run, 1);
+    EXPECT_EQ(run.m_pid, program.pid());
+}
+
+TEST(check_run, zero_is_a_number)
+{
+    const temp_folder_c dir;
+    const std::string pid_file = write_pid_file(dir, "0\n");
+    const check_run_st run = check_run(pid_file, "some-daemon");
+    expect_not_running(run);
+    EXPECT_THAT(run.m_text_list,
+                testing::ElementsAre("pub_util_get_pid_and_check_run()",
+                                     CHECK_RUN + " pid_file_ptr[" + pid_file + "] name_ptr[some-daemon]",
+                                     CHECK_RUN + " pid[0]", CHECK_RUN + " fopen buf_a[/proc/0/cmdline]",
+                                     util_error(CHECK_RUN, -118, ENOENT),
+                                     open_line("/proc/0/cmdline", ENOENT),
+                                     CHECK_RUN + " return is_run_ptr[0] pid_ptr[0]"));
 }
 
 TEST(check_run, absent_and_empty_arguments)
@@ -432,6 +459,29 @@ TEST(priority, is_real_time_four_below_the_highest)
                              "policy 1 priority " + std::to_string(sched_get_priority_max(SCHED_FIFO) - 4)));
 }
 
+TEST(priority, is_the_calling_thread_s_too)
+{
+    const child_run_st run = run_in_child([] {
+        int status = -1;
+        pthread_t thread = 0;
+        const auto raise = [](void *status_ptr) -> void * {
+            *static_cast<int *>(status_ptr) = pub_util_raise_process_priority();
+            PUB_LOG((pub_log_source_st{"", ""}), "own policy %d, process's %d", sched_getscheduler(0),
+                    sched_getscheduler(getpid()));
+            return nullptr;
+        };
+        pthread_create(&thread, nullptr, raise, &status);
+        pthread_join(thread, nullptr);
+        return status;
+    });
+    ASSERT_TRUE(run.m_is_complete);
+    if (run.m_result != PUB_ERR_NONE) {
+        GTEST_SKIP() << "real-time scheduling is not permitted here";
+    }
+    EXPECT_THAT(run.m_text_list,
+                testing::ElementsAre("pub_util_raise_process_priority()", "own policy 1, process's 1"));
+}
+
 TEST(priority, refused_policy)
 {
     const child_run_st run = run_in_child(pub_util_raise_process_priority, {SYS_sched_setscheduler, EPERM});
@@ -457,4 +507,38 @@ TEST(priority, unknown_range)
                 testing::ElementsAre("pub_util_raise_process_priority()",
                                      sys_call_line("sched_get_priority_max", EINVAL),
                                      util_error("pub_util_raise_process_priority", -1, EINVAL)));
+}
+
+TEST(run_shell, gives_the_commands_status)
+{
+    const log_capture_c capture;
+    EXPECT_EQ(pub_util_run_shell("exit 0"), 0);
+    EXPECT_EQ(WEXITSTATUS(pub_util_run_shell("exit 7")), 7);
+    EXPECT_THAT(capture.texts(), testing::IsEmpty());
+}
+
+TEST(run_shell, lets_an_interrupt_on_its_way_get_there_first)
+{
+    const child_run_st run = run_in_child([] {
+        sigset_t interrupt;
+        sigemptyset(&interrupt);
+        sigaddset(&interrupt, SIGINT);
+        pthread_sigmask(SIG_BLOCK, &interrupt, nullptr);
+        pthread_t thread = 0;
+        const auto run_many = [](void *) -> void * {
+            for (;;) {
+                pub_util_run_shell(":");
+            }
+        };
+        pthread_create(&thread, nullptr, run_many, nullptr);
+        int taken = 0;
+        for (int i = 0; i < 50; i++) {
+            kill(getpid(), SIGINT);
+            const timespec long_time = {10, 0};
+            taken += sigtimedwait(&interrupt, nullptr, &long_time) == SIGINT ? 1 : 0;
+        }
+        return taken;
+    });
+    ASSERT_TRUE(run.m_is_complete);
+    EXPECT_EQ(run.m_result, 50);
 }

@@ -4,6 +4,7 @@
 #include <chrono>
 #include <errno.h>
 #include <fcntl.h>
+#include <poll.h>
 #include <pthread.h>
 #include <signal.h>
 #include <string.h>
@@ -121,6 +122,28 @@ void *work_then_sleep(void *)
     return &g_return_mark;
 }
 
+void *wait_on_a_pipe_for_ever(void *)
+{
+    pub_util_defer_thread_end();
+    g_step = 1;
+    pub_util_wait_fd(g_pipe_a[0], POLLIN, 600000);
+    return &g_return_mark;
+}
+
+void *kill_another(void *handle_ptr)
+{
+    pub_util_defer_thread_end();
+    g_step = 1;
+    while (g_released == 0) {
+        usleep(1000);
+    }
+    pub_util_kill_thread(static_cast<pthread_t *>(handle_ptr));
+    g_step = 2;
+    pub_util_allow_thread_end();
+    g_step = 3;
+    return &g_return_mark;
+}
+
 void *open_for_ever(void *)
 {
     pub_util_defer_thread_end();
@@ -223,7 +246,7 @@ TEST_F(thread_end, thread_without_a_signal_goes_on_when_it_allows)
     EXPECT_EQ(g_step, 3);
 }
 
-TEST_F(thread_end, described_pause_may_be_ended)
+TEST_F(thread_end, pause_may_be_ended)
 {
     start(work_then_sleep);
     const steady_clock_t::time_point begin = steady_clock_t::now();
@@ -237,6 +260,29 @@ TEST_F(thread_end, pause_between_attempts_to_open_may_be_ended)
     start(open_for_ever);
     EXPECT_EQ(pub_util_kill_thread(&m_handle), PUB_ERR_NONE);
     EXPECT_TRUE(was_ended());
+}
+
+TEST_F(thread_end, wait_on_a_descriptor_may_be_ended)
+{
+    start(wait_on_a_pipe_for_ever);
+    EXPECT_EQ(pub_util_kill_thread(&m_handle), PUB_ERR_NONE);
+    EXPECT_TRUE(was_ended());
+}
+
+/* Who stops another holds locks for it. */
+TEST_F(thread_end, stopping_another_is_not_cut_short)
+{
+    start(read_for_ever);
+    const pthread_t reader = m_thread;
+    g_step = 0;
+    ASSERT_EQ(pthread_create(&m_thread, nullptr, kill_another, &m_handle), 0);
+    wait_for(g_step, 1);
+    ASSERT_EQ(pthread_kill(m_thread, SIGUSR1), 0);
+    g_released = 1;
+    EXPECT_TRUE(was_ended());
+    EXPECT_EQ(g_step, 2);
+    EXPECT_EQ(m_handle, 0U);
+    EXPECT_EQ(pthread_join(reader, nullptr), 0);
 }
 
 TEST_F(thread_end, forbidden_end_overrides_a_note)
@@ -349,6 +395,19 @@ TEST_F(thread_end, signals_do_not_shorten_a_pause)
     EXPECT_EQ(errno, EXDEV);
     timer = {};
     ASSERT_EQ(setitimer(ITIMER_REAL, &timer, nullptr), 0);
+}
+
+TEST_F(thread_end, wait_on_a_descriptor_says_what_there_is)
+{
+    EXPECT_EQ(pub_util_wait_fd(g_pipe_a[0], POLLIN, 0), 0);
+    EXPECT_EQ(pub_util_wait_fd(g_pipe_a[1], POLLOUT, 600000), 1);
+    EXPECT_EQ(write(g_pipe_a[1], "x", 1), 1);
+    EXPECT_EQ(pub_util_wait_fd(g_pipe_a[0], POLLIN, 600000), 1);
+    for (const int fd : {-1, 1 << 20}) {
+        errno = 0;
+        EXPECT_EQ(pub_util_wait_fd(fd, POLLIN, 600000), -1);
+        EXPECT_EQ(errno, EBADF);
+    }
 }
 
 TEST_F(thread_end, pause_leaves_deferral_as_it_was)
