@@ -1,23 +1,19 @@
 #include <errno.h>
-#include <poll.h>
-#include <pthread.h>
-#include <signal.h>
 #include <stdint.h>
 #include <stdio.h>
 #include <string.h>
-#include <time.h>
 #include <unistd.h>
 
 #include "amt/amt-cfg.h"
 #include "amt/amt-handle/channel/context.h"
 #include "amt/amt-handle/channel/process-end.h"
-#include "amt/amt-handle/channel/service-process.h"
+#include "amt/amt-handle/channel/worker.h"
 #include "amt/amt-handle/startup.h"
 #include "amt/amt-log.h"
+#include "amt/signal-treatment.h"
 #include "pub/error.h"
 #include "pub/log/print.h"
-#include "pub/util/thread-end.h"
-#include "pub/util/util.h"
+#include "pub/util/process.h"
 
 namespace {
 
@@ -26,15 +22,12 @@ constexpr char VERSION[] = "001.001";
 constexpr char NORMAL_MODE_TEXT[] = "normal mode(with KEL platform)";
 constexpr char SIMPLIFIED_MODE_TEXT[] = "simplified mode(only with kernel)";
 
-/* Line numbers that the texts of main have always shown. */
+/* The line numbers that the texts of main show: whoever reads the log knows the places by them. */
 constexpr int USAGE_LINE = 238;
 constexpr int FATAL_LINE = 429;
 
 constexpr int MODE_NORMAL = 1;
 constexpr int MODE_SIMPLIFIED = 0;
-
-/* Seconds of one sleep of the main thread, which sleeps for ever. */
-constexpr time_t SLEEP_SECONDS = 0xFFFFFFF;
 
 constexpr uint32_t PATH_SIZE = 60;
 constexpr uint32_t PROCESS_PATH_SIZE = 256;
@@ -45,11 +38,10 @@ struct run_mode_st
     const char *m_text_ptr;
 };
 
-pthread_t g_main_thread;
+amt_worker_st g_starter;
 
-/* Set while the main thread only waits for signals; the one it has got then, else 0. */
-volatile sig_atomic_t g_is_parked = 0;
-volatile sig_atomic_t g_parked_signal = 0;
+int g_argument_count = 0;
+char **g_argument_ptr = nullptr;
 
 char g_cfg_path_a[PATH_SIZE];
 char g_pid_path_a[PATH_SIZE];
@@ -123,85 +115,6 @@ void log_banner()
     PUB_LOG(g_amt_main_log, "    Build time: %s %s", __DATE__, __TIME__);
 }
 
-void amt_deinit_resource()
-{
-    pub_log_entry(g_amt_main_log);
-    amt_handle_deinit();
-}
-
-bool is_fault(int signal_number)
-{
-    return signal_number == SIGSEGV || signal_number == SIGBUS;
-}
-
-[[noreturn]] void end_by_signal(int signal_number)
-{
-    PUB_LOG(g_amt_main_log, "signal_treatment()");
-    PUB_LOG(g_amt_main_log, "receive signal: %d - %s", signal_number,
-            pub_util_get_signal_name(signal_number));
-    amt_process_end_begin(0);
-    amt_deinit_resource();
-    amt_process_end_finish();
-}
-
-/*
- * A fault is treated where it happens. Any other signal is the main thread's business: a worker, which may
- * hold a lock, hands it over and goes on until it is stopped; and the main thread, once start-up is over,
- * treats it outside the handler, where nothing is forbidden.
- */
-void signal_treatment(int signal_number)
-{
-    if (!amt_service_process_is_own()) {
-        _exit(0);
-    }
-    if (is_fault(signal_number)) {
-        end_by_signal(signal_number);
-    }
-    if (pthread_equal(pthread_self(), g_main_thread) == 0) {
-        const int saved_errno = errno;
-        pthread_kill(g_main_thread, signal_number);
-        errno = saved_errno;
-        return;
-    }
-    if (g_is_parked == 0) {
-        end_by_signal(signal_number);
-    }
-    g_parked_signal = signal_number;
-}
-
-constexpr int g_treated_signal_a[] = {SIGINT, SIGTERM, SIGSEGV, SIGBUS, 12};
-
-/* 12 is SIGUSR2 here; the number is what counts. */
-void install_signal_treatment()
-{
-    for (const int signal_number : g_treated_signal_a) {
-        signal(signal_number, signal_treatment);
-    }
-}
-
-/* Sleeps for ever, open to signals only while it sleeps, so that none comes between the look and the sleep.
- */
-[[noreturn]] void park()
-{
-    sigset_t treated;
-    sigset_t open;
-    sigemptyset(&treated);
-    for (const int signal_number : g_treated_signal_a) {
-        if (!is_fault(signal_number)) {
-            sigaddset(&treated, signal_number);
-        }
-    }
-    pthread_sigmask(SIG_BLOCK, &treated, &open);
-    g_is_parked = 1;
-    for (;;) {
-        const timespec time = {SLEEP_SECONDS, 0};
-        ppoll(nullptr, 0, &time, &open);
-        if (g_parked_signal != 0) {
-            end_by_signal(g_parked_signal);
-        }
-    }
-}
-
 int start(int mode)
 {
     const int cfg_status = amt_cfg_init(g_cfg_path_a);
@@ -210,29 +123,28 @@ int start(int mode)
         return cfg_status;
     }
     const int init_status = amt_handle_init(mode);
+    if (init_status != PUB_ERR_NONE) {
+        amt_signal_settle(); /* a refused handshake ends the process by a signal, not by its status */
+    }
     pub_print("[%s]init over result=%d\"\n", PROGRAM, init_status);
     return init_status;
 }
 
 [[noreturn]] void end_by_fatal_error(int error_code)
 {
+    amt_process_end_begin(error_code);
     PUB_LOG(g_amt_main_log, "FATAL ERROR!!!");
     pub_log_error(g_amt_main_log, error_code, "main", FATAL_LINE);
-    amt_process_end_begin(error_code);
     amt_deinit_resource();
     amt_process_end_finish();
 }
 
-} // namespace
-
-int main(int argc, char **argv)
+/* Everything up to the running hub, on the starter. Returns when the hub runs. */
+void start_up()
 {
-    g_main_thread = pthread_self();
-    pub_util_forbid_thread_end();
-    g_usb_activate = 0;
     int exit_status = 0;
-    if (!parse_options(argc, argv, &exit_status)) {
-        return exit_status;
+    if (!parse_options(g_argument_count, g_argument_ptr, &exit_status)) {
+        _exit(exit_status);
     }
     pub_print("g_usb_activate:%d.\n", g_usb_activate);
     const run_mode_st mode = choose_mode_and_paths();
@@ -240,17 +152,32 @@ int main(int argc, char **argv)
               g_pid_path_a);
     if (is_already_running()) {
         pub_print("%s already run.\n", PROGRAM);
-        return 0;
+        _exit(0);
     }
     log_banner();
     pub_util_create_pid_file(PROGRAM);
     PUB_LOG(g_amt_main_log, "run under %s", mode.m_text_ptr);
     PUB_LOG(g_amt_main_log, "config file[%s], pid file[%s]", g_cfg_path_a, g_pid_path_a);
-    install_signal_treatment();
     pub_util_raise_process_priority();
     const int status = start(mode.m_mode);
     if (status != PUB_ERR_NONE) {
         end_by_fatal_error(status);
     }
-    park();
+}
+
+} // namespace
+
+int main(int argc, char **argv)
+{
+    amt_signal_prepare();
+    amt_process_end_set_shut_down(amt_handle_deinit);
+    g_usb_activate = 0;
+    g_argument_count = argc;
+    g_argument_ptr = argv;
+    const int error = amt_worker_start(&g_starter, start_up);
+    if (error != 0) {
+        errno = error;
+        end_by_fatal_error(PUB_ERR_FILE);
+    }
+    amt_signal_take(&g_starter);
 }

@@ -22,6 +22,7 @@ CPP_FLOORS: Floors = (
     ("amt/amt-handle/at",),
     ("amt/amt-handle/reader",),
     ("amt/amt-handle",),
+    ("amt/signal-treatment",),
     ("amt/main.cpp",),
     # What the daemon never includes.
     ("platform/host", "cmake"),

@@ -1,13 +1,13 @@
 #include "amt/amt-handle/channel/process-end.h"
 
 #include <atomic>
+#include <errno.h>
 #include <pthread.h>
 #include <signal.h>
 #include <sys/time.h>
 #include <unistd.h>
 
 #include "amt/amt-handle/channel/service-process.h"
-#include "amt/amt-handle/startup.h"
 #include "pub/util/thread-end.h"
 
 namespace {
@@ -17,6 +17,7 @@ constexpr long WATCHDOG_US = 800000;
 
 std::atomic<pthread_t> g_ender;
 std::atomic<int> g_exit_status;
+std::atomic<int (*)()> g_shut_down;
 
 void handle_watchdog(int)
 {
@@ -32,22 +33,29 @@ void start_watchdog()
     setitimer(ITIMER_REAL, &time, nullptr);
 }
 
-void block_terminating_signals()
+/*
+ * The ender may run in the handler of a fault, where that fault is blocked, and another one in the shut-down
+ * would be the kernel's to treat: it would end the process with that signal's status.
+ */
+void set_enders_mask()
 {
-    sigset_t set;
-    sigemptyset(&set);
-    sigaddset(&set, SIGINT);
-    sigaddset(&set, SIGTERM);
-    sigaddset(&set, SIGUSR2);
-    pthread_sigmask(SIG_BLOCK, &set, nullptr);
+    sigset_t terminating;
+    sigemptyset(&terminating);
+    sigaddset(&terminating, SIGINT);
+    sigaddset(&terminating, SIGTERM);
+    sigaddset(&terminating, SIGUSR2);
+    pthread_sigmask(SIG_BLOCK, &terminating, nullptr);
+
+    sigset_t needed;
+    sigemptyset(&needed);
+    sigaddset(&needed, SIGALRM);
+    sigaddset(&needed, SIGBUS);
+    sigaddset(&needed, SIGSEGV);
+    pthread_sigmask(SIG_UNBLOCK, &needed, nullptr);
 }
 
-/* A fault in the shut-down itself cannot be shut down again. */
-[[noreturn]] void give_way(pthread_t ender)
+[[noreturn]] void give_way()
 {
-    if (pthread_equal(ender, pthread_self()) != 0) {
-        _exit(g_exit_status);
-    }
     for (;;) {
         pause();
     }
@@ -55,19 +63,42 @@ void block_terminating_signals()
 
 } // namespace
 
+void amt_process_end_set_shut_down(int (*shut_down)())
+{
+    g_shut_down = shut_down;
+}
+
 void amt_process_end_begin(int exit_status)
 {
     if (!amt_service_process_is_own()) {
         _exit(0);
     }
-    pub_util_forbid_thread_end();
-    block_terminating_signals();
-    pthread_t nobody = 0;
-    if (!g_ender.compare_exchange_strong(nobody, pthread_self())) {
-        give_way(nobody);
+    const int saved_errno = errno;
+    pthread_t ender = 0;
+    if (!g_ender.compare_exchange_strong(ender, pthread_self())) {
+        if (pthread_equal(ender, pthread_self()) != 0) {
+            amt_process_end_finish();
+        }
+        give_way();
     }
+    pub_util_forbid_thread_end();
     g_exit_status = exit_status;
     start_watchdog();
+    set_enders_mask();
+    errno = saved_errno;
+}
+
+bool amt_process_end_has_begun()
+{
+    return g_ender != pthread_t{};
+}
+
+void amt_process_end_by_fault()
+{
+    if (pthread_equal(g_ender, pthread_self()) != 0) {
+        amt_process_end_finish();
+    }
+    give_way();
 }
 
 void amt_process_end_finish()
@@ -78,6 +109,9 @@ void amt_process_end_finish()
 void amt_process_end()
 {
     amt_process_end_begin(0);
-    amt_handle_deinit();
+    int (*const shut_down)() = g_shut_down;
+    if (shut_down != nullptr) {
+        shut_down();
+    }
     amt_process_end_finish();
 }

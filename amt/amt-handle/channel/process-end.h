@@ -6,18 +6,30 @@
  * from a signal handler.
  */
 
+/* What the ender has to do between begin and finish. Set at start-up, before a thread can end the process. */
+void amt_process_end_set_shut_down(int (*shut_down)());
+
 /*
  * Makes the calling thread the ender, who will leave with this exit status. Does not return when another
  * thread is the ender already. From here on SIGUSR1 and the terminating signals no longer reach this thread,
- * and should the shut-down get stuck (a fault may have come in the middle of an allocation), the process ends
- * all the same within a second.
+ * and should the rest get stuck, in the log as well as in the shut-down, the process ends all the same within
+ * a second. So this comes before anything is logged. Leaves errno as it was.
  *
  * A child of the service ends here at once: nothing that would be shut down is its own.
  */
 void amt_process_end_begin(int exit_status);
 
+/* Whether some thread is the ender. */
+bool amt_process_end_has_begun();
+
+/*
+ * For a thread that cannot go on because of a fault: the ender leaves at once, with its status, for what met
+ * a fault cannot be trusted to be shut down; any other thread stays here until the process has ended.
+ */
+[[noreturn]] void amt_process_end_by_fault();
+
 /* Ends the process with the status given to amt_process_end_begin. */
 [[noreturn]] void amt_process_end_finish();
 
-/* The whole of it, with status 0: begin, amt_handle_deinit, finish. */
+/* The whole of it, with status 0: begin, shut down, finish. */
 [[noreturn]] void amt_process_end();

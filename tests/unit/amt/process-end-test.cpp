@@ -1,9 +1,11 @@
 #include "amt/amt-handle/channel/process-end.h"
 
 #include <chrono>
+#include <errno.h>
 #include <pthread.h>
 #include <signal.h>
 #include <string.h>
+#include <sys/mman.h>
 #include <unistd.h>
 
 #include <gtest/gtest.h>
@@ -18,11 +20,33 @@ namespace {
 
 using steady_clock_t = std::chrono::steady_clock;
 
+/* Writes where nothing may be written. */
+void raise_fault()
+{
+    void *const page = mmap(nullptr, 1, PROT_NONE, MAP_PRIVATE | MAP_ANONYMOUS, -1, 0);
+    *static_cast<volatile char *>(page) = 1;
+}
+
 [[noreturn]] void wait_for_ever()
 {
     for (;;) {
         pause();
     }
+}
+
+/* Says on standard error that the hub was shut down, and shuts it down. */
+int shut_down_audibly()
+{
+    const ssize_t ignored = write(STDERR_FILENO, "shut down\n", 10);
+    static_cast<void>(ignored);
+    return amt_handle_deinit();
+}
+
+/* A shut-down that meets a fault. */
+int shut_down_into_a_fault()
+{
+    raise_fault();
+    return 0;
 }
 
 void *end_process(void *)
@@ -34,6 +58,7 @@ void *end_process(void *)
 [[noreturn]] void end_from_many_threads(int fd)
 {
     g_handle_context.m_fd_pc = fd;
+    amt_process_end_set_shut_down(shut_down_audibly);
     for (int i = 0; i < 8; i++) {
         pthread_t thread = 0;
         pthread_create(&thread, nullptr, end_process, nullptr);
@@ -52,6 +77,37 @@ void *end_process(void *)
     amt_process_end_begin(4);
     amt_process_end_begin(5); /* as a fault in the shut-down does */
     _exit(99);
+}
+
+/* The first fault ends the process in its handler; the second one meets it there. */
+[[noreturn]] void end_in_a_handler_with_a_fault()
+{
+    amt_process_end_set_shut_down(shut_down_into_a_fault);
+    signal(SIGSEGV, [](int) {
+        if (amt_process_end_has_begun()) {
+            amt_process_end_by_fault();
+        }
+        amt_process_end();
+    });
+    raise_fault();
+    _exit(99);
+}
+
+[[noreturn]] void end_while_another_thread_faults()
+{
+    signal(SIGSEGV, [](int) { amt_process_end_by_fault(); });
+    amt_process_end_begin(7);
+    pthread_t thread = 0;
+    pthread_create(
+        &thread, nullptr,
+        [](void *) -> void * {
+            raise_fault();
+            _exit(99);
+        },
+        nullptr);
+    usleep(50000);
+    shut_down_audibly();
+    amt_process_end_finish();
 }
 
 [[noreturn]] void end_unmoved_by_signals()
@@ -107,7 +163,7 @@ TEST(process_end, happens_once_for_many_threads)
     int fd_a[2];
     ASSERT_EQ(pipe(fd_a), 0);
     for (int i = 0; i < 5; i++) {
-        EXPECT_EXIT(end_from_many_threads(fd_a[0]), testing::ExitedWithCode(0), "");
+        EXPECT_EXIT(end_from_many_threads(fd_a[0]), testing::ExitedWithCode(0), "^shut down\n$");
     }
     close(fd_a[0]);
     close(fd_a[1]);
@@ -124,6 +180,27 @@ TEST(process_end, that_gets_stuck_ends_within_a_second)
 TEST(process_end, that_fails_itself_ends_at_once)
 {
     EXPECT_EXIT(end_twice_on_one_thread(), testing::ExitedWithCode(4), "");
+}
+
+TEST(process_end, that_meets_a_fault_in_a_fault_s_handler_has_its_status)
+{
+    EXPECT_EXIT(end_in_a_handler_with_a_fault(), testing::ExitedWithCode(0), "");
+}
+
+TEST(process_end, waits_for_the_ender_after_a_fault_of_another_thread)
+{
+    EXPECT_EXIT(end_while_another_thread_faults(), testing::ExitedWithCode(7), "^shut down\n$");
+}
+
+TEST(process_end, knows_whether_it_has_begun)
+{
+    EXPECT_FALSE(amt_process_end_has_begun());
+    const auto begin = [] {
+        errno = EXDEV;
+        amt_process_end_begin(8);
+        _exit(amt_process_end_has_begun() && errno == EXDEV ? 0 : 1);
+    };
+    EXPECT_EXIT(begin(), testing::ExitedWithCode(0), "");
 }
 
 TEST(process_end, is_not_moved_by_signals)
