@@ -1,7 +1,6 @@
 #include <errno.h>
 #include <signal.h>
 #include <stdio.h>
-#include <stdlib.h>
 #include <string.h>
 #include <unistd.h>
 
@@ -15,7 +14,7 @@
 #include "amt/amt-packet.h"
 #include "platform/include/audio-loop-hal.h"
 #include "pub/error.h"
-#include "pub/util/util.h"
+#include "pub/util/process.h"
 
 namespace {
 
@@ -52,7 +51,7 @@ int start_player()
              static_cast<long>(g_amt_cfg.m_audio_sample_rate), static_cast<long>(g_amt_cfg.m_audio_format),
              static_cast<long>(g_amt_cfg.m_audio_frame_count), g_amt_cfg.m_audio_file_a);
     errno = 0;
-    if (system(command_a) != 0) {
+    if (pub_util_run_shell(command_a) != 0) {
         return amt_device_fail({AUDIO_HANDLER}, PUB_ERR_FILE, "system(%s) fail: %d - %s", command_a, errno,
                                strerror(errno));
     }

@@ -1,7 +1,6 @@
 #include "amt/amt-device/battery.h"
 
 #include <stdio.h>
-#include <stdlib.h>
 
 #include "amt/amt-atom.h"
 #include "amt/amt-command.h"
@@ -14,6 +13,7 @@
 #include "amt/amt-packet.h"
 #include "pub/error.h"
 #include "pub/file/scan.h"
+#include "pub/util/process.h"
 #include "pub/util/thread-end.h"
 
 namespace {
@@ -50,7 +50,7 @@ void hand_to_driver(int32_t a, int32_t b, int32_t c, int32_t d)
 {
     char command_a[COMMAND_SIZE];
     snprintf(command_a, sizeof(command_a), "echo \"" CALIBRATION_FORMAT "\" > " DRIVER_FILE, a, b, c, d);
-    const int status = system(command_a);
+    const int status = pub_util_run_shell(command_a);
     PUB_LOG(g_amt_device_log, "%s", command_a);
     if (status < 0) {
         pub_log_sys_call(g_amt_device_log, "system");

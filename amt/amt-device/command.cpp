@@ -1,12 +1,12 @@
 #include "amt/amt-device/command.h"
 
 #include <errno.h>
-#include <stdlib.h>
 #include <string.h>
 
 #include "amt/amt-device/device-fail.h"
 #include "amt/amt-log.h"
 #include "pub/error.h"
+#include "pub/util/process.h"
 
 namespace {
 
@@ -17,9 +17,9 @@ constexpr int ATTEMPT_COUNT = 5;
 int amt_device_do_command(const char *command)
 {
     for (int attempt = 1; attempt <= ATTEMPT_COUNT; attempt++) {
-        /* system() leaves errno alone when the command itself fails; an older errno would mislead. */
+        /* A shell leaves errno alone when the command itself fails; an older errno would mislead. */
         errno = 0;
-        if (system(command) == 0) {
+        if (pub_util_run_shell(command) == 0) {
             PUB_LOG(g_amt_device_log, "system(%s) OK", command);
             return PUB_ERR_NONE;
         }
@@ -31,6 +31,6 @@ int amt_device_do_command(const char *command)
 
 void amt_device_run(const char *command)
 {
-    const int ignored = system(command);
+    const int ignored = pub_util_run_shell(command);
     static_cast<void>(ignored);
 }

@@ -1,9 +1,9 @@
 #include "amt/amt-handle/request/factory-file.h"
 
 #include <errno.h>
-#include <stdlib.h>
 
 #include "pub/file/file.h"
+#include "pub/util/process.h"
 #include "pub/util/thread-end.h"
 
 namespace {
@@ -37,7 +37,7 @@ void amt_factory_file_sync()
     const int saved_errno = errno;
     for (int i = 0; i < FLUSH_COUNT; i++) {
         pub_util_sleep_ms(FLUSH_PAUSE_MS);
-        const int ignored_status = system(SYNC_COMMAND);
+        const int ignored_status = pub_util_run_shell(SYNC_COMMAND);
         static_cast<void>(ignored_status);
     }
     errno = saved_errno;

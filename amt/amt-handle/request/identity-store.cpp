@@ -2,7 +2,6 @@
 
 #include <errno.h>
 #include <stdio.h>
-#include <stdlib.h>
 #include <string.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -12,6 +11,7 @@
 #include "amt/amt-log.h"
 #include "pub/error.h"
 #include "pub/file/file.h"
+#include "pub/util/process.h"
 
 /* A handset whose system was reflashed from an older layout has its Bluetooth address here. */
 static constexpr const char *BT_ADDRESS_FILE_2 = "/mnt/opl/nvm/BT_Address.txt";
@@ -179,7 +179,7 @@ static void run_on_folder(const char *verb, const char *path)
 {
     char command_a[FOLDER_COMMAND_SIZE];
     snprintf(command_a, sizeof(command_a), "%s %s", verb, path);
-    const int ignored_status = system(command_a);
+    const int ignored_status = pub_util_run_shell(command_a);
     static_cast<void>(ignored_status);
 }
 
