@@ -53,8 +53,11 @@ class Builder:
     def _show(self, done: int, total: int) -> None:
         self._progress = (done, total)
 
-    def wait(self, step: Step) -> str:
-        """Wait until a step has been built, with its progress shown; what went wrong, or ''."""
+    def wait(self, step: Step, is_watched: bool) -> str:
+        """Wait until a step has been built, watching how it goes on; what went wrong, or ''."""
+        if not is_watched:
+            self._ended[step].wait()
+            return self._failures.get(step, "")
         progress = Progress(f"building {step[0]}")
         while not self._ended[step].wait(LOOK_SECONDS):
             progress.show(*self._progress)

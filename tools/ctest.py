@@ -6,7 +6,7 @@ from typing import Mapping
 
 from tools import children
 from tools.progress import Progress
-from tools.project import CORES, note
+from tools.project import CORES
 from tools.results import Results, describe, read_results
 
 # ctest's line for a test that has ended.
@@ -14,8 +14,9 @@ STEP = re.compile(rb"^ *(\d+)/(\d+) Test +#", re.MULTILINE)
 
 
 def run_ctest(build: Path, name: str, *options: str, report: Path | None = None,
-              environment: Mapping[str, str] | None = None) -> Results:
-    """Run the tests of a BUILD; the failed ones are printed with their output, and the skipped.
+              environment: Mapping[str, str] | None = None,
+              tell: children.Taker = children.show) -> Results:
+    """Run the tests of a BUILD; TELL gets the failed ones with their output, and the skipped.
 
     A runner that ends badly without a failed test counts as one.
     """
@@ -34,8 +35,8 @@ def run_ctest(build: Path, name: str, *options: str, report: Path | None = None,
     progress.close()
     results = read_results(report)
     if results.failed or results.skipped:
-        print(describe(results), flush=True)
+        tell(f"{describe(results)}\n".encode(errors="backslashreplace"))
     if status != 0 and results.count.failed == 0:
-        note(f"{name}: ctest ended with status {status}")
+        tell(f"{name}: ctest ended with status {status}\n".encode())
         results.count.failed = 1
     return results

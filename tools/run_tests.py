@@ -1,8 +1,10 @@
 """Run the test suites and count what they say: `./dev test`."""
 
 import argparse
+import queue
 import shutil
 import sys
+import threading
 import time
 from pathlib import Path
 from typing import Sequence
@@ -10,59 +12,103 @@ from typing import Sequence
 from tools import children
 from tools.builder import Builder
 from tools.ctest import run_ctest
-from tools.project import PROJECT, note, say
+from tools.project import PROJECT, say
 from tools.repeat import repeat
 from tools.results import Count, Results, read_results
 from tools.suites import SUITES, Suite
 
 RESULTS = PROJECT / "build" / "test-results"
 
+# A test that takes longer hangs.
 TEST_SECONDS = 600
+LOOK_SECONDS = 0.2
 
 
-def run_pytest(suite: Suite, report: Path) -> Results:
+def run_pytest(suite: Suite, report: Path, tell: children.Taker) -> Results:
     """Run a suite in Python, which tells of its failures itself."""
     command = [sys.executable, "-m", "pytest", "-q", "-p", "no:cacheprovider",
                f"--timeout={TEST_SECONDS}", f"--junitxml={report}", *suite.arguments]
     if sys.stdout.isatty():
         command.append("--color=yes")
     report.unlink(missing_ok=True)
-    status = children.run(command, children.show, suite.environment)
+    status = children.run(command, tell, suite.environment)
     results = read_results(report)
     if status != 0 and results.count.failed == 0:
-        note(f"{suite.name}: pytest ended with status {status}")
+        tell(f"{suite.name}: pytest ended with status {status}\n".encode())
         results.count.failed = 1
     return results
 
 
-def run_suite(suite: Suite) -> Count:
+def run_suite(suite: Suite, tell: children.Taker = children.show) -> Count:
     """Run one suite on what is built. A runner that ends badly is a failed test."""
     RESULTS.mkdir(parents=True, exist_ok=True)
     report = RESULTS / f"{suite.name}.xml"
-    say(f"suite {suite.name}")
+    tell(f"\n== suite {suite.name}\n".encode())
     started = time.monotonic()
     if suite.arguments:
-        results = run_pytest(suite, report)
+        results = run_pytest(suite, report, tell)
     else:
         results = run_ctest(PROJECT / "build" / suite.preset, suite.name, report=report,
-                            environment=suite.environment)
-    note(f"suite {suite.name}: {results.count} in {time.monotonic() - started:.0f} s")
+                            environment=suite.environment, tell=tell)
+    seconds = time.monotonic() - started
+    tell(f"   suite {suite.name}: {results.count} in {seconds:.0f} s\n".encode())
     return results.count
 
 
+def run_built(suite: Suite, builder: Builder, is_watched: bool, tell: children.Taker) -> Count:
+    """Run a suite as soon as its build is there; a build that fails is a failed test."""
+    step = (suite.preset, suite.target)
+    failure = builder.wait(step, is_watched) if suite.preset else ""
+    if not failure:
+        return run_suite(suite, tell)
+    tell(f"\n{failure}\n   suite {suite.name} did not run\n".encode(errors="backslashreplace"))
+    return Count(failed=1)
+
+
+class Beside(threading.Thread):
+    """Suites that run while others are watched; what they say is kept until somebody has time."""
+
+    def __init__(self, suites: Sequence[Suite], builder: Builder) -> None:
+        super().__init__(daemon=True)
+        self._suites = suites
+        self._builder = builder
+        self._said: "queue.SimpleQueue[bytes]" = queue.SimpleQueue()
+        self.total = Count()
+        self.error: BaseException | None = None
+
+    def run(self) -> None:
+        """Run them one after another."""
+        try:
+            for suite in self._suites:
+                said: list[bytes] = []
+                self.total.add(run_built(suite, self._builder, False, said.append))
+                self._said.put(b"".join(said))
+        except BaseException as error:
+            self.error = error
+
+    def show(self) -> None:
+        """Show what the suites have said that have ended."""
+        while not self._said.empty():
+            children.show(self._said.get())
+
+
 def run_suites(suites: Sequence[Suite]) -> Count:
-    """Run suites one after another, while what the later ones need is being built."""
+    """Run suites, while what the later ones need is being built."""
     builder = Builder([(suite.preset, suite.target) for suite in suites if suite.preset])
     builder.start()
+    watched = [suite for suite in suites if not suite.is_beside] or suites
+    beside = Beside([suite for suite in suites if suite not in watched], builder)
+    beside.start()
     total = Count()
-    for suite in suites:
-        failure = builder.wait((suite.preset, suite.target)) if suite.preset else ""
-        if failure:
-            print(failure, file=sys.stderr)
-            note(f"suite {suite.name} did not run")
-            total.add(Count(failed=1))
-        else:
-            total.add(run_suite(suite))
+    for suite in watched:
+        total.add(run_built(suite, builder, True, children.show))
+        beside.show()
+    while beside.is_alive():
+        beside.join(LOOK_SECONDS)
+        beside.show()
+    if beside.error is not None:
+        raise beside.error
+    total.add(beside.total)
     return total
 
 

@@ -30,25 +30,28 @@ class Suite:
     arguments: tuple[str, ...] = ()
     environment: Mapping[str, str] = field(default_factory=dict)
     target: str = ALL
+    # Run beside the others: a machine that waits for one has time for another.
+    is_beside: bool = False
     # Run only when asked for by name.
     is_extra: bool = False
 
 
-def system(name: str, preset: str, workers: int, patience: Mapping[str, str]) -> Suite:
+def system(name: str, preset: str, workers: int, patience: Mapping[str, str],
+           is_beside: bool = False) -> Suite:
     """The whole daemon of a build, in the simulated handset."""
     return Suite(name, preset, ("tests/system", f"--handset-build={preset}", "-n", str(workers)),
-                 patience, HANDSET)
+                 patience, HANDSET, is_beside)
 
 
-# In the order in which they run: what needs no build first, then what needs a short one, while
-# what the others need is being built.
+# In the order in which they begin, and in which their builds are made: what needs no build first,
+# then what needs a short one.
 SUITES = (
     Suite("station", "", ("tests/station", "tests/scripts", "-n", str(2 * CORES))),
     system("system", "release", SYSTEM_WORKERS, PATIENCE),
+    system("system-asan", "asan", SANITIZED_WORKERS, SANITIZED_PATIENCE, is_beside=True),
+    system("system-tsan", "tsan", SANITIZED_WORKERS, SANITIZED_PATIENCE, is_beside=True),
     Suite("unit", "release"),
     Suite("soak", "release", ("tests/soak",), PATIENCE, HANDSET),
-    system("system-asan", "asan", SANITIZED_WORKERS, SANITIZED_PATIENCE),
-    system("system-tsan", "tsan", SANITIZED_WORKERS, SANITIZED_PATIENCE),
     Suite("fuzz", "fuzz", ("tests/fuzz", "-n", str(CORES))),
     Suite("unit-asan", "asan", is_extra=True),
     Suite("unit-tsan", "tsan", is_extra=True),

@@ -4,7 +4,7 @@ from pathlib import Path
 
 import pytest
 
-from tools.lint import imports, includes, structure
+from tools.lint import imports, includes, structure, tested
 
 FLOORS = (("ground",), ("left", "right", "right/low"), ("roof",))
 
@@ -77,3 +77,34 @@ def test_includes_are_found_where_the_compiler_finds_them(
     assert includes.all_included("room/c.cpp") == [
         "platform/include/p.h", "room/a.h", "room/b.h", "room/c.cpp"]
     includes.included_by.cache_clear()
+
+
+TABLE = """
+| source | held by |
+|---|---|
+| `amt/one.cpp`, `amt/two.cpp` | `tests/system/test_a.py`, together |
+| `host/devices` | `tests/unit/devices-test.cpp` |
+| `not/a/row` | no test at all |
+"""
+
+
+def test_a_source_is_held_by_a_test_of_its_name_or_by_a_row() -> None:
+    rows = tested.read_rows(TABLE)
+    assert rows == [(["amt/one.cpp", "amt/two.cpp"], ["tests/system/test_a.py"]),
+                    (["host/devices"], ["tests/unit/devices-test.cpp"])]
+    sources = ["amt/one.cpp", "amt/two.cpp", "host/devices/a.cpp", "pub/three.cpp"]
+    files = [*sources, "tests/system/test_a.py", "tests/unit/devices-test.cpp"]
+    assert tested.compare(sources, ["tests/unit/pub/three-test.cpp"], rows, files) == []
+
+
+def test_a_source_that_nothing_holds_is_named() -> None:
+    assert tested.compare(["pub/three.cpp"], ["tests/unit/pub/three-tests.cpp"], [], []) == [
+        "pub/three.cpp: error: has no three-test.cpp, and docs/architecture.md does not say which "
+        "test holds it"]
+
+
+def test_a_row_that_names_what_is_gone_is_named() -> None:
+    rows = [(["amt/old.cpp"], ["tests/system/test_old.py"])]
+    assert tested.compare([], [], rows, ["amt/older.cpp"]) == [
+        "docs/architecture.md: error: amt/old.cpp is not there",
+        "docs/architecture.md: error: tests/system/test_old.py is not there"]
