@@ -7,7 +7,6 @@ from typing import Sequence
 from tools.build import Build, BuildFailed
 from tools.children import Stopped
 from tools.progress import Progress
-from tools.project import note
 
 # What runs beside a build is a test, which comes first.
 POLITE = ("nice", "-n", "10")
@@ -23,6 +22,7 @@ class Builder:
         self._steps = list(dict.fromkeys(steps))
         self._ended = {step: threading.Event() for step in self._steps}
         self._failures: dict[Step, str] = {}
+        self._seconds: dict[Step, float] = {}
         self._progress = (0, 0)
         self._thread = threading.Thread(target=self._work, daemon=True)
 
@@ -42,16 +42,20 @@ class Builder:
         started = time.monotonic()
         try:
             Build(preset, ("--target", target)).run(self._show, POLITE)
-            note(f"built {target} of {preset} in {time.monotonic() - started:.0f} s")
         except BuildFailed as failed:
             self._failures[step] = str(failed)
         except OSError as error:
             self._failures[step] = f"{preset}: {error}"
         finally:
+            self._seconds[step] = time.monotonic() - started
             self._ended[step].set()
 
     def _show(self, done: int, total: int) -> None:
         self._progress = (done, total)
+
+    def seconds(self, step: Step) -> float:
+        """How long the build of a step has taken."""
+        return self._seconds[step]
 
     def wait(self, step: Step, is_watched: bool) -> str:
         """Wait until a step has been built, watching how it goes on; what went wrong, or ''."""

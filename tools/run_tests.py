@@ -60,6 +60,9 @@ def run_built(suite: Suite, builder: Builder, is_watched: bool, tell: children.T
     step = (suite.preset, suite.target)
     failure = builder.wait(step, is_watched) if suite.preset else ""
     if not failure:
+        if suite.preset:
+            tell(f"\n   {suite.target} of {suite.preset}: built in {builder.seconds(step):.0f} s"
+                 .encode())
         return run_suite(suite, tell)
     tell(f"\n{failure}\n   suite {suite.name} did not run\n".encode(errors="backslashreplace"))
     return Count(failed=1)
