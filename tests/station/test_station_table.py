@@ -18,14 +18,12 @@ from amt_station.requests.table import (FAMILIES, REQUESTS, display_name, find_c
                                         find_operation, operations, requests_by_id)
 from amt_station.wire.atoms import Atom, AtomType
 from amt_station.wire.packet import Packet
+from tests.system.support.registrations import APP_ROWS, PC_ROWS
 
 # What the handset registers; everything else is passed on (PC line) or refused (app channel).
-ACKNOWLEDGED_ON_PC = {45, 170, 172, 174, 176, 178, 185, 187, 191, 193, 219, 224, 226, 236, 240,
-                      244, 246}
-SERVED_ON_APP = {
-    1, 3, 5, 7, 9, *range(11, 42, 2), 42, *range(43, 156, 2), 170, 172, 174, 176, 178, 180, 185,
-    187, 195, 197, 201, 204, *range(205, 214, 2), 219, 221, 228, 230, 232, 234, 238, 240,
-} - {141, 143, 145}
+# 91 sends no acknowledgement.
+ACKNOWLEDGED_ON_PC = set(PC_ROWS) - {91}
+SERVED_ON_APP = set(APP_ROWS)
 TUNNELLED = SERVED_ON_APP - {
     9, 29, 31, 33, 35, 37, 45, 55, 57, 65, 85, 89, 91, 99, 137, 139, 147, 170, 172, 174, 176, 178,
     180, 185, 187, 195, 197, 219, 228, 230, 232, 234, 238, 240}
