@@ -8,7 +8,7 @@ from typing import Callable
 
 from amt_simulator.client import Client, Refused
 from amt_simulator.errors import HandsetError, HandsetTimeout
-from amt_simulator.waiting import DEFAULT_SECONDS, deadline, scaled, wait_until
+from amt_simulator.waiting import DEFAULT_SECONDS, deadline, is_ready, scaled, wait_until
 
 READ_SIZE = 65536
 
@@ -86,7 +86,7 @@ class Line:
             try:
                 rest = rest[os.write(fd, rest):]
             except BlockingIOError:
-                if not select.select([], [fd], [], max(0.0, end - time.monotonic()))[1]:
+                if not is_ready(fd, select.POLLOUT, end - time.monotonic()):
                     raise HandsetTimeout(f"{self.name}: nobody reads, {len(rest)} bytes of "
                                          f"{len(data)} are left") from None
 
@@ -98,7 +98,7 @@ class Line:
         end = deadline(timeout)
         fd = self.fileno()
         while True:
-            if not select.select([fd], [], [], max(0.0, end - time.monotonic()))[0]:
+            if not is_ready(fd, select.POLLIN, end - time.monotonic()):
                 raise HandsetTimeout(f"{self.name}: nothing arrived")
             try:
                 return os.read(fd, READ_SIZE)

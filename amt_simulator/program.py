@@ -1,8 +1,11 @@
 """What is put into a handset from the PC: the daemon of a build, its libraries, init's modules."""
 
+import compileall
 import re
 import shutil
+import sys
 from dataclasses import dataclass
+from functools import lru_cache
 from pathlib import Path
 
 from amt_simulator.errors import HandsetError
@@ -17,8 +20,8 @@ LIBRARIES = {
     "audio.primary.tq5530.amt.so": "system/lib/hw",
 }
 PROGRAMS = ("amt-audio", "sync")
-# Init's modules, and the wire codec that its modem speaks.
-MODULES = ("amt_simulator/inside", "amt_station")
+# Init's modules, and the wire codec that its modem speaks; each in a package that is empty inside.
+MODULES = ("amt_simulator/inside", "amt_station/wire")
 COVERAGE = b".gcda\0"
 SANITIZER = re.compile(rb"lib([at])san\.so\.\d+\0")
 
@@ -99,15 +102,26 @@ def install(directory: Path, program: Program) -> None:
             _copy(_part(program.build, "lib", name), root / place / name)
         for name in PROGRAMS:
             _copy(_part(program.build, "bin", name), root / "system/bin" / name)
+    modules = directory / MODULE_DIRECTORY
+    for source in _modules():
+        _copy(source, modules / source.relative_to(PROJECT))
     for name in MODULES:
-        for source in (PROJECT / name).rglob("*.py*"):
-            _copy(source, directory / MODULE_DIRECTORY / source.relative_to(PROJECT))
-    (directory / MODULE_DIRECTORY / "amt_simulator" / "__init__.py").touch()
+        (modules / name).parent.joinpath("__init__.py").touch()
+
+
+@lru_cache(maxsize=1)
+def _modules() -> list[Path]:
+    """The modules to copy, compiled: so each handset's init does not have to do it again."""
+    if not sys.dont_write_bytecode:
+        # Where nothing may be written, the sources are there all the same.
+        for name in MODULES:
+            compileall.compile_dir(PROJECT / name, quiet=2)
+    return [source for name in MODULES for source in (PROJECT / name).rglob("*.py*")]
 
 
 def sanitizer_environment() -> dict[str, str]:
     """What a sanitizer build needs: reports to files, and its place behind the preload library."""
-    # One described log text has a conversion that no C library knows; it is no finding.
+    # One log text has a conversion that no C library knows; it is no finding.
     log = "log_path=/handset/sanitizer:check_printf=0"
     return {"ASAN_OPTIONS": f"verify_asan_link_order=0:{log}", "TSAN_OPTIONS": log,
             "UBSAN_OPTIONS": f"print_stacktrace=1:{log}", "LSAN_OPTIONS": log}

@@ -7,23 +7,28 @@ import signal
 import socket
 import subprocess
 import time
+from concurrent.futures import Future, ThreadPoolExecutor
+from functools import lru_cache
 from pathlib import Path
-from typing import Mapping
+from typing import IO, Mapping
 
 from amt_simulator.client import socket_address
-from amt_simulator.errors import HandsetError
+from amt_simulator.errors import HandsetError, how_it_ended
 from amt_simulator.program import DAEMON_COPY, INSIDE, MODULE_DIRECTORY
 from amt_simulator.root import DEVICE_FILES
 from amt_simulator.tree import PROC_DRIVER, ROOT, STATE
-from amt_simulator.waiting import scaled
+from amt_simulator.waiting import is_ready, scaled
 
-PYTHON = "/usr/bin/python3"
+# Init needs the standard library only: what is installed beside it is not even looked for.
+PYTHON = ("/usr/bin/python3", "-s", "-S")
 UP_SECONDS = 20.0
 END_SECONDS = 10.0
 
 # The status with which the sandbox ends when the handset's kernel was told to power off: the end
 # of its process 1 is then reported as one by SIGINT, which process 1 ignores otherwise.
-POWERED_OFF = 128 + signal.SIGINT
+SIGNAL = 128
+POWERED_OFF = SIGNAL + signal.SIGINT
+TAKEN_DOWN = 0
 
 NO_BUBBLEWRAP = ("bubblewrap is not installed; it is the sandbox of the handset: "
                  "apt-get install bubblewrap")
@@ -58,9 +63,38 @@ def command(directory: Path, program: str, shared: Mapping[str, Path], control: 
         words += ["--bind", f"{outside}", inside]
     for node, stand_in in DEVICE_FILES.items():
         words += ["--symlink", stand_in, node]
-    words += ["--chdir", "/", PYTHON, "-s", "-m", "amt_simulator.inside.supervisor",
+    words += ["--chdir", "/", *PYTHON, "-m", "amt_simulator.inside.supervisor",
               f"{control}", f"{ready}"]
     return words
+
+
+@lru_cache(maxsize=1)
+def _spawner(_process: int) -> ThreadPoolExecutor:
+    """The thread that starts the sandboxes of this process.
+
+    A sandbox ends with the thread that started it, so that one stays as long as the process does.
+    """
+    return ThreadPoolExecutor(max_workers=1, thread_name_prefix="handsets")
+
+
+def _spawn(words: list[str], messages: IO[bytes],
+           passed: tuple[int, ...]) -> "subprocess.Popen[bytes]":
+    """Start a sandbox."""
+    def start() -> "subprocess.Popen[bytes]":
+        return subprocess.Popen(words, stdin=subprocess.DEVNULL, stdout=messages, stderr=messages,
+                                pass_fds=passed, start_new_session=True)
+
+    def end(late: "Future[subprocess.Popen[bytes]]") -> None:
+        if not late.exception():
+            late.result().kill()
+
+    started = _spawner(os.getpid()).submit(start)
+    try:
+        return started.result()
+    except BaseException:
+        # Interrupted: nobody will know of it.
+        started.add_done_callback(end)
+        raise
 
 
 class Sandbox:
@@ -71,27 +105,32 @@ class Sandbox:
             raise HandsetError(NO_BUBBLEWRAP)
         self._messages = directory / "sandbox.txt"
         ready_read, ready_write = os.pipe()
+        try:
+            try:
+                self._process = self._start(directory, program, shared, ready_write)
+            finally:
+                os.close(ready_write)
+            try:
+                self._wait_up(ready_read)
+            except BaseException:
+                self.kill()
+                raise
+        finally:
+            os.close(ready_read)
+
+    def _start(self, directory: Path, program: str, shared: Mapping[str, Path],
+               ready: int) -> "subprocess.Popen[bytes]":
         with socket.socket(socket.AF_UNIX, socket.SOCK_SEQPACKET) as listener:
             # It listens before the handset's init exists: nobody who asks comes too early.
             with socket_address(directory / "control") as address:
                 listener.bind(address)
             listener.listen(64)
             with open(self._messages, "wb") as messages:
-                self._process = subprocess.Popen(
-                    command(directory, program, shared, listener.fileno(), ready_write),
-                    stdin=subprocess.DEVNULL, stdout=messages, stderr=messages,
-                    pass_fds=(listener.fileno(), ready_write), start_new_session=True)
-        os.close(ready_write)
-        try:
-            self._wait_up(ready_read)
-        except BaseException:
-            self.kill()
-            raise
-        finally:
-            os.close(ready_read)
+                return _spawn(command(directory, program, shared, listener.fileno(), ready),
+                              messages, (listener.fileno(), ready))
 
     def _wait_up(self, ready: int) -> None:
-        if not select.select([ready], [], [], scaled(UP_SECONDS))[0]:
+        if not is_ready(ready, select.POLLIN, scaled(UP_SECONDS)):
             raise HandsetError(f"the handset's init is not up after {scaled(UP_SECONDS):.0f} s")
         if not os.read(ready, 16):
             self._process.wait()
@@ -102,7 +141,7 @@ class Sandbox:
         if any(sign in text for sign in NAMESPACE_SIGNS):
             who = "root" if os.getuid() == 0 else "an ordinary user"
             return f"{NO_NAMESPACES.format(who=who)} (bubblewrap says: {text.splitlines()[-1]})"
-        return f"the handset did not come up: {text.splitlines()[-1] if text else 'no message'}"
+        return f"the handset did not come up: {self._last_message() or 'no message'}"
 
     @property
     def status(self) -> int | None:
@@ -113,6 +152,21 @@ class Sandbox:
     def powered_off(self) -> bool:
         """Whether the handset ended by power-off."""
         return self.status == POWERED_OFF
+
+    @property
+    def death(self) -> str:
+        """What there is to say when it ended neither by power-off nor because it was asked to."""
+        status = self.status
+        if status is None or status in (TAKEN_DOWN, POWERED_OFF):
+            return ""
+        # Of a process 1 that a signal ended, bubblewrap tells as a shell does.
+        how = how_it_ended(SIGNAL - status if status > SIGNAL else status)
+        text = self._last_message()
+        return f"the sandbox has ended with {how}" + (f": {text}" if text else "")
+
+    def _last_message(self) -> str:
+        text = self._messages.read_text("utf-8", "replace").strip()
+        return text.splitlines()[-1] if text else ""
 
     def wait_end(self, timeout: float) -> bool:
         """Wait until the sandbox has ended; False when it has not in time."""

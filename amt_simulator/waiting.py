@@ -1,6 +1,7 @@
 """Waiting for what happens in a handset: deadlines, never fixed pauses."""
 
 import os
+import select
 import time
 from typing import Callable, TypeVar
 
@@ -22,6 +23,13 @@ def scaled(seconds: float) -> float:
 def deadline(seconds: float | None) -> float:
     """The moment, on the monotonic clock, at which a wait of SECONDS (None: the usual) ends."""
     return time.monotonic() + scaled(DEFAULT_SECONDS if seconds is None else seconds)
+
+
+def is_ready(fd: int, events: int, seconds: float) -> bool:
+    """Wait until FD is ready for EVENTS (of poll), or its other side has gone; False if late."""
+    poller = select.poll()
+    poller.register(fd, events)
+    return bool(poller.poll(max(0.0, seconds) * 1000))
 
 
 def wait_until(attempt: Callable[[], Found | None], what: str, timeout: float | None = None,
