@@ -8,17 +8,17 @@ from typing import Any
 
 import click
 
-from amt_simulator import prompt
 from amt_simulator.commands import COMMANDS
-from amt_simulator.errors import HandsetError
+from amt_simulator.errors import PROGRAM, HandsetError
 from amt_simulator.handset import Handset
 from amt_simulator.kinds import KINDS
-from amt_simulator.options import MODEM_MODES
+from amt_simulator.inside.modem_table import MODES
 from amt_simulator.parse import CardSize, Pair, Screen, file_contents, pairs, unescaped
 from amt_simulator.tree import ROOT
 from amt_simulator.running import Announcement, NoHandset, find
 
 FAILED, NO_HANDSET = 1, 3
+ENDS = (signal.SIGINT, signal.SIGTERM, signal.SIGHUP)
 PAIR = Pair(needs_value=True)
 OPTIONAL_PAIR = Pair(needs_value=False)
 
@@ -31,11 +31,15 @@ class HandsetGroup(click.Group):
         try:
             return super().invoke(ctx)
         except HandsetError as error:
-            click.echo(f"handset: {error}", err=True)
+            click.echo(f"{PROGRAM}: {error}", err=True)
             ctx.exit(NO_HANDSET if isinstance(error, NoHandset) else FAILED)
         except BrokenPipeError:
             # Whoever read the output has seen enough.
             os.dup2(os.open(os.devnull, os.O_WRONLY), sys.stdout.fileno())
+            ctx.exit(FAILED)
+        except OSError as error:
+            where = f"{error.filename}: " if error.filename else ""
+            click.echo(f"{PROGRAM}: {where}{error.strerror or error}", err=True)
             ctx.exit(FAILED)
 
 
@@ -101,7 +105,7 @@ def _options(given: dict[str, Any]) -> dict[str, Any]:
               help="System property; KEY alone takes it away.")
 @click.option("--answer", "answers", multiple=True, type=PAIR, metavar="FUNCTION=LINE",
               help="Scripted answer of a stand-in; repeat for the next calls.")
-@click.option("--modem", type=click.Choice(MODEM_MODES), default="table", show_default=True,
+@click.option("--modem", type=click.Choice(MODES), default="table", show_default=True,
               help="What the modem does.")
 @click.option("--modem-answer", "modem_answers", multiple=True, nargs=2, metavar="COMMAND TEXT",
               help=r"The modem's answer to a command line; \r and \n are understood.")
@@ -117,22 +121,32 @@ def _options(given: dict[str, Any]) -> dict[str, Any]:
 @click.option("--keep", is_flag=True, help="Leave the handset's directory in place at the end.")
 def up(path: str, build: str, **given: Any) -> None:
     """Bring a handset up and stay until Ctrl-C."""
+    # Only who stays needs the library for typing.
+    from amt_simulator import prompt
+
     def end(_number: int, _frame: object) -> None:
+        # One is enough: the end is on its way.
+        for number in ENDS:
+            signal.signal(number, signal.SIG_IGN)
         raise KeyboardInterrupt
 
-    for number in (signal.SIGINT, signal.SIGTERM, signal.SIGHUP):
+    for number in ENDS:
         signal.signal(number, end)
     place: str | Path = Path(build).resolve() if os.sep in build else build
     made = Handset(path, place, **_options(given))
+    death = ""
     try:
         with made:
             _introduce(made, _announce(made, build))
             sys.stdout.flush()
             prompt.serve(made, handset)
+            death = made.death
     except KeyboardInterrupt:
         pass
     if given["keep"]:
         click.echo(f"kept: {made.directory}", err=True)
+    if death:
+        raise HandsetError(death)
     click.echo("the handset has been powered off" if made.powered_off else "handset is down",
                err=True)
 
@@ -143,7 +157,7 @@ for command in COMMANDS:
 
 def main() -> None:
     """The program."""
-    handset.main(prog_name="amt-handset")
+    handset.main(prog_name=PROGRAM)
 
 
 if __name__ == "__main__":

@@ -1,7 +1,6 @@
 """What can be done with a handset that is up: the commands of the `amt-handset` tool but `up`."""
 
 import json
-import os
 import sys
 import time
 from pathlib import Path
@@ -12,6 +11,7 @@ import click
 from amt_simulator import tree
 from amt_simulator.control import HandsetControl
 from amt_simulator.errors import HandsetError
+from amt_simulator.inside.modem_table import MODES
 from amt_simulator.parse import CardSize, unescaped
 from amt_simulator.running import Announcement
 
@@ -62,23 +62,25 @@ def unplug(handset: HandsetControl) -> None:
 
 @click.command("log")
 @click.option("-f", "--follow", is_flag=True, help="Go on until Ctrl-C or the handset's end.")
+@click.option("-n", "count", type=click.IntRange(min=0), metavar="N",
+              help="Begin with the last N lines only.")
 @pass_handset
-def log(handset: HandsetControl, follow: bool) -> None:
+def log(handset: HandsetControl, follow: bool, count: int | None) -> None:
     """Show the log."""
-    place = 0
-    while True:
-        try:
-            with open(handset.log.path, "rb") as stream:
-                stream.seek(place)
-                data = stream.read()
-        except FileNotFoundError:
-            return
-        place += len(data)
-        click.echo(data.decode("utf-8", "replace"), nl=False)
-        if not follow:
-            return
+    data = handset.log.content()
+    place = len(data)
+    if count is not None:
+        lines = data.splitlines(keepends=True)
+        data = b"".join(lines[max(0, len(lines) - count):])
+    click.echo(data.decode("utf-8", "replace"), nl=False)
+    while follow:
         sys.stdout.flush()
         time.sleep(FOLLOW_SECONDS)
+        is_up = handset.log.path.exists()
+        data = handset.log.content(place)
+        place += len(data)
+        click.echo(data.decode("utf-8", "replace"), nl=False)
+        follow = is_up
 
 
 @click.command("calls")
@@ -210,7 +212,7 @@ def modem_answer(handset: HandsetControl, command: str, text: str | None) -> Non
 
 
 @modem.command("mode")
-@click.argument("mode", type=click.Choice(["table", "silent", "held", "absent"]))
+@click.argument("mode", type=click.Choice(MODES))
 @pass_handset
 def modem_mode(handset: HandsetControl, mode: str) -> None:
     """Bring the modem into another mode."""

@@ -55,7 +55,7 @@ class HandsetControl(HandsetFiles):
         self.modem = Line(self.client, "modem")
         self.mux = Line(self.client, "mux")
         self.app = AppLine(self.client)
-        self.usb = Usb(self.client, self.log.tail)
+        self.usb = Usb(self.client, directory, self.log.tail)
 
     # the daemon
 

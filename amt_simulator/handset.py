@@ -6,9 +6,9 @@ from typing import Any
 
 from amt_simulator.control import HandsetControl
 from amt_simulator.errors import HandsetError
-from amt_simulator.kinds import KINDS
+from amt_simulator.kinds import KINDS, LINE_KEYS, settings
 from amt_simulator.options import Options, furnish
-from amt_simulator.ports import Port
+from amt_simulator.ports import APP_LINE, STATION_LINE, open_port
 from amt_simulator.program import find_program
 from amt_simulator.rundir import RunDirectory
 from amt_simulator.sandbox import END_SECONDS, Sandbox
@@ -18,8 +18,7 @@ from amt_simulator.waiting import scaled, wait_until
 class Handset(HandsetControl):
     """A handset with the unmodified daemon in it. A context manager: entered, it is up.
 
-    The keyword arguments are those of `options.Options`, which explains them. The thread that
-    brings a handset up must live as long as the handset: the sandbox ends with it.
+    The keyword arguments are those of `options.Options`, which explains them.
     """
 
     def __init__(self, path: str = "pc", build: str | Path | None = "release",
@@ -29,7 +28,6 @@ class Handset(HandsetControl):
         self.program = find_program(build, self.options.daemon)
         self._run: RunDirectory | None = None
         self._sandbox: Sandbox | None = None
-        self._ports: list[Port] = []
 
     # coming up and going down
 
@@ -43,12 +41,16 @@ class Handset(HandsetControl):
 
     def up(self) -> None:
         """Bring the handset up; its init serves, and has started the daemon, when this returns."""
-        self._run = RunDirectory()
         try:
+            self._run = RunDirectory()
             self.attach(self._run.path)
             furnish(self.directory, self.options, self.program)
             self._sandbox = Sandbox(self.directory, self.kind.program, self._shared())
             self._open_ports()
+        except OSError as error:
+            self.down()
+            where = f" ({error.filename})" if error.filename else ""
+            raise HandsetError(f"cannot make the handset: {error.strerror}{where}") from None
         except BaseException:
             self.down()
             raise
@@ -57,14 +59,14 @@ class Handset(HandsetControl):
         """Take the handset down: every process, mount and file of it."""
         if self._run is None:
             return
-        if self._sandbox is not None:
-            for line in (self.pc, self.modem, self.mux, self.app):
-                line.forget()
-            for port in self._ports:
-                port.close()
-            self._end_sandbox(self._sandbox)
-        self._run.close(self.options.keep)
-        self._run = None
+        run, self._run = self._run, None
+        try:
+            if self._sandbox is not None:
+                for line in (self.pc, self.modem, self.mux, self.app):
+                    line.forget()
+                self._end_sandbox(self._sandbox)
+        finally:
+            run.close(self.options.keep)
 
     def _shared(self) -> dict[str, Path]:
         """Directories of the PC that the handset may write to: none but those asked for."""
@@ -76,11 +78,16 @@ class Handset(HandsetControl):
         return shared
 
     def _open_ports(self) -> None:
-        names = ["pc", "app"] if self.options.ports else []
-        if names and self.options.modem == "held":
+        if not self.options.ports:
+            return
+        names = [APP_LINE]
+        if self.options.plugged:
+            names.append(STATION_LINE)
+        if self.options.modem == "held":
             names += ["modem", "mux"]
-        for name in names:
-            self._ports.append(Port(self.client, name, self.directory / name))
+        configured = settings(self.options.config)
+        for name in (name for name in names if LINE_KEYS[name] in configured):
+            open_port(self.client, name, self.directory)
 
     def _end_sandbox(self, sandbox: Sandbox) -> None:
         try:
@@ -120,6 +127,11 @@ class Handset(HandsetControl):
     def powered_off(self) -> bool:
         """Whether the handset has been powered off."""
         return self._sandbox is not None and self._sandbox.powered_off
+
+    @property
+    def death(self) -> str:
+        """How the handset's sandbox has died; empty when it is up, powered off or taken down."""
+        return self._sandbox.death if self._sandbox is not None else ""
 
     @property
     def is_up(self) -> bool:

@@ -9,10 +9,11 @@ from amt_simulator import program as programs
 from amt_simulator import root
 from amt_simulator.android import service_entry
 from amt_simulator.errors import HandsetError
+from amt_simulator.inside.modem_table import MODES
 from amt_simulator.kinds import AUDIO_KEY, KINDS, LINE_KEYS, Kind, config_text, settings
 from amt_simulator.tree import Content, place
+from amt_simulator.usb import PLUGGED
 
-MODEM_MODES = ("table", "silent", "held", "absent")
 # The pause that init makes before it starts the daemon again.
 RESTART_SECONDS = 0.3
 RECORDS = ("log.txt", "calls.txt", "stdout.txt", "stderr.txt", "init.txt")
@@ -41,8 +42,9 @@ class Options:
     usb_state     the USB link's state when the handset comes up; None: as the path wants it
     env           further environment of the daemon
     shared        directories of the PC that the handset may write to, by their path inside
-    ports         make ports of the PC that lead to the pc and app lines (and to those of a held
-                  modem), for programs: links named after the lines in the handset's directory
+    ports         make ports of the PC, for programs: links named after their lines in the
+                  handset's directory. `app` is always there, `pc` while the cable is in, `modem`
+                  and `mux` with a held modem
     keep          leave the directory in place when the handset is taken down
     """
 
@@ -69,23 +71,33 @@ class Options:
     def __post_init__(self) -> None:
         if self.path not in KINDS:
             raise HandsetError(f"no such path: {self.path}; there are {', '.join(KINDS)}")
-        if self.modem not in MODEM_MODES:
+        if self.modem not in MODES:
             raise HandsetError(f"no such modem mode: {self.modem}; "
-                               f"there are {', '.join(MODEM_MODES)}")
+                               f"there are {', '.join(MODES)}")
 
     @property
     def kind(self) -> Kind:
         """The way in which the daemon is started."""
         return KINDS[self.path]
 
+    @property
+    def first_usb_state(self) -> str:
+        """The USB link's state when the handset comes up."""
+        return self.usb_state or self.kind.usb_state
+
+    @property
+    def plugged(self) -> bool:
+        """Whether the handset comes up with its cable in."""
+        return self.first_usb_state in PLUGGED
+
 
 def environment(options: Options, program: programs.Program) -> dict[str, str]:
     """The environment in which init starts the daemon."""
     env = {"PATH": "/system/bin:/usr/sbin:/usr/bin:/sbin:/bin", "HOME": "/", "TZ": "UTC0",
            "LD_LIBRARY_PATH": "/system/lib"}
-    for name, place in (("LOG", "log.txt"), ("PROPERTIES", "properties"), ("CALLS", "calls.txt"),
-                        ("ANSWERS", "answers"), ("DEVICES", "devices")):
-        env[f"VX_HOST_{name}"] = f"/handset/{place}"
+    for name, file in (("LOG", "log.txt"), ("PROPERTIES", "properties"), ("CALLS", "calls.txt"),
+                       ("ANSWERS", "answers"), ("DEVICES", "devices")):
+        env[f"VX_HOST_{name}"] = f"/handset/{file}"
     if program.has_preload:
         env["LD_PRELOAD"] = f"/system/lib/{programs.PRELOAD}"
     if program.sanitizer:
@@ -108,7 +120,7 @@ def _orders(options: Options, program: programs.Program) -> dict[str, Any]:
         "start_on_plug": service.disabled and options.start,
         "lines": {name: configured.get(key, "") for name, key in LINE_KEYS.items()},
         "modem": options.modem, "modem_answers": dict(options.modem_answers),
-        "card": options.card,
+        "card": options.card, "ports": options.ports,
     }
 
 
@@ -124,7 +136,7 @@ def furnish(directory: Path, options: Options, program: programs.Program) -> Non
     if audio.startswith("/system/"):
         place(directory, audio, root.SILENCE)
     place(directory, "/sys/class/android_usb/android0/state",
-               (options.usb_state or kind.usb_state) + "\n")
+          options.first_usb_state + "\n")
     for properties in (root.PROPERTIES, kind.properties, options.properties):
         root.write_properties(directory, properties)
     root.write_answers(directory, options.answers)
@@ -133,4 +145,4 @@ def furnish(directory: Path, options: Options, program: programs.Program) -> Non
     for inside, content in options.files.items():
         place(directory, inside, content)
     place(directory, "/handset/init.json",
-               json.dumps(_orders(options, program), indent=1))
+          json.dumps(_orders(options, program), indent=1))

@@ -1,38 +1,115 @@
-"""What `handset up` does while the handset is up: take commands at a terminal, or just wait."""
+"""What `amt-handset up` does while the handset is up: take commands at a terminal, or just wait.
 
-import select
+Meanwhile the deaths in the handset are told.
+"""
+
+import contextlib
+import os
+import readline
 import shlex
+import signal
 import sys
+from pathlib import Path
+from typing import Iterator
 
 import click
 
-from amt_simulator.errors import HandsetError
+from amt_simulator.errors import PROGRAM, HandsetError, how_it_ended
 from amt_simulator.handset import Handset
 
 LOOK_SECONDS = 0.2
 PROMPT = "handset> "
+LEAVE = ("exit", "quit")
+HISTORY_LINES = 500
+
+
+class _Down(Exception):
+    """The handset has ended while a command was awaited."""
+
+
+class Watch:
+    """Looks at the handset from time to time, in the main thread, whatever that waits for."""
+
+    def __init__(self, handset: Handset) -> None:
+        self._handset = handset
+        self._told = 0
+        self.is_typing = False
+
+    @contextlib.contextmanager
+    def set_up(self) -> Iterator[None]:
+        """Look until this is left."""
+        before = signal.signal(signal.SIGALRM, lambda *_: self.look())
+        signal.setitimer(signal.ITIMER_REAL, LOOK_SECONDS, LOOK_SECONDS)
+        try:
+            yield
+        finally:
+            signal.setitimer(signal.ITIMER_REAL, 0)
+            signal.signal(signal.SIGALRM, before)
+
+    def look(self) -> None:
+        """Tell of the daemon's deaths; a wait for a command ends with the handset."""
+        with contextlib.suppress(OSError, HandsetError):
+            exits = self._handset.exits()
+            for status in exits[self._told:]:
+                self._tell(f"the daemon has ended with {how_it_ended(status)}")
+            self._told = len(exits)
+        if self.is_typing and not self._handset.is_up:
+            raise _Down
+
+    def _tell(self, text: str) -> None:
+        click.echo(("\n" if self.is_typing else "") + f"{PROGRAM}: {text}", err=True)
+        if self.is_typing:
+            readline.redisplay()
 
 
 def serve(handset: Handset, group: click.Group) -> None:
     """Stay until the handset ends; at a terminal, run the commands that are typed."""
-    is_terminal = sys.stdin.isatty()
-    if is_terminal:
-        click.echo("type a command (help lists them), Ctrl-C ends", err=True)
-    asked = False
+    watch = Watch(handset)
+    with watch.set_up():
+        if sys.stdin.isatty():
+            click.echo("type a command (help lists them), exit or Ctrl-D ends", err=True)
+            with history(), contextlib.suppress(_Down):
+                _converse(handset, group, watch)
+        else:
+            while handset.is_up:
+                signal.pause()
+        watch.look()
+
+
+def _converse(handset: Handset, group: click.Group, watch: Watch) -> None:
+    """Take commands until one ends it."""
+    names = ["help", *LEAVE, *(name for name in group.commands if name != "up")]
+    readline.set_completer(lambda text, state: [
+        *(name + " " for name in names if name.startswith(text)), None][state])
+    readline.parse_and_bind("tab: complete")
     while handset.is_up:
-        if is_terminal and not asked:
-            click.echo(PROMPT, nl=False, err=True)
-            asked = True
-        ready = select.select([sys.stdin] if is_terminal else [], [], [], LOOK_SECONDS)[0]
-        if not ready:
-            continue
-        line = sys.stdin.readline()
-        if not line:
-            # The terminal's end of file: nothing more is typed, the handset stays.
-            is_terminal = False
-            continue
-        asked = False
+        try:
+            watch.is_typing = True
+            line = input(PROMPT)
+        except EOFError:
+            click.echo(err=True)
+            return
+        finally:
+            watch.is_typing = False
+        if line.split()[:1] and line.split()[0] in LEAVE:
+            return
         run_line(handset, group, line)
+
+
+@contextlib.contextmanager
+def history() -> Iterator[None]:
+    """The typed lines of earlier handsets; without a place for them, only those of this one."""
+    base = os.environ.get("XDG_STATE_HOME") or os.path.expanduser("~/.local/state")
+    path = Path(base) / PROGRAM / "history"
+    readline.set_history_length(HISTORY_LINES)
+    with contextlib.suppress(OSError):
+        readline.read_history_file(path)
+    try:
+        yield
+    finally:
+        with contextlib.suppress(OSError):
+            path.parent.mkdir(mode=0o700, parents=True, exist_ok=True)
+            readline.write_history_file(path)
 
 
 def run_line(handset: Handset, group: click.Group, line: str) -> None:
@@ -47,7 +124,7 @@ def run_line(handset: Handset, group: click.Group, line: str) -> None:
     except click.ClickException as error:
         error.show()
     except (HandsetError, OSError, ValueError) as error:
-        click.echo(f"handset: {error}", err=True)
+        click.echo(f"{PROGRAM}: {error}", err=True)
     except (KeyboardInterrupt, click.Abort):
         # Ends a log that is followed; the next one ends the handset.
         click.echo(err=True)
@@ -57,6 +134,7 @@ def _help(group: click.Group) -> None:
     for name, command in group.commands.items():
         if name != "up":
             click.echo(f"  {name:10} {command.get_short_help_str(80)}", err=True)
+    click.echo(f"  {'exit':10} Take the handset down (also Ctrl-D).", err=True)
 
 
 def _command(group: click.Group, name: str) -> click.Command:

@@ -50,6 +50,18 @@ PROPERTIES = {
     "sys.usb.config": "serial,adb",
 }
 
+# What the stand-ins can be told to answer: functions of libraries, requests to drivers, programs.
+STAND_INS = (
+    "ldt_btCtrl", "ldt_btCheck", "ldt_wifiCtrl", "ldt_wifiCheck", "ldt_TxTest", "ldt_RxTest",
+    "ldt_gpsCtrl", "ldt_gpsCheck",
+    "create_devinfo", "enter_idle", "amt_usb_charger_enable", "amt_check_system_sanity",
+    "codec_loop_test", "property_set",
+    "FBIOGET_FSCREENINFO", "FBIOGET_VSCREENINFO", "FBIOPUT_VSCREENINFO", "SARVOFB_IOCTL_EN_LAYER",
+    "SARVOFB_IOCTL_SET_LAYER_INPUT_FORMAT", "KDSETMODE", "VIDIOC_S_INPUT",
+    "SARVOCAM_IOCTL_PREVIEW", "SARVOCAM_IOCTL_SELF_TEST", "sarvo_battery",
+    "amt-audio", "sync",
+)
+
 # Device nodes of the handset, and the plain files that stand for them.
 DEVICE_FILES = {
     "/dev/graphics/fb0": "/handset/devices/fb0",
@@ -99,9 +111,9 @@ def write_properties(directory: Path, properties: Mapping[str, str | None]) -> N
 def write_answers(directory: Path, answers: Mapping[str, "str | Sequence[str] | None"]) -> None:
     """Script what stand-in functions answer: a line, or a list of lines, for a function."""
     for function, lines in answers.items():
-        # A program's answers are named after it: amt-audio.
-        if not function.replace("_", "").replace("-", "").isalnum():
-            raise HandsetError(f"{function!r} is no function name")
+        if function not in STAND_INS:
+            raise HandsetError(f"{function!r} is no function name; the stand-ins have "
+                               f"{', '.join(STAND_INS)}")
         if isinstance(lines, str):
             lines = [lines]
         place(directory, f"/handset/answers/{function}",

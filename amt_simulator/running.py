@@ -50,7 +50,7 @@ def find(directory: Path | None) -> HandsetControl:
     if directory is None:
         found = running()
         if not found:
-            raise NoHandset("no handset is up; `handset up` brings one up")
+            raise NoHandset("no handset is up; `amt-handset up` brings one up")
         if len(found) > 1:
             raise NoHandset("several handsets are up; choose one with --dir: " +
                             " ".join(str(path) for path in found))

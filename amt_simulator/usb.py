@@ -1,33 +1,46 @@
 """The handset's USB link, as its kernel tells of it."""
 
+from pathlib import Path
 from typing import Callable
 
+from amt_simulator import ports
 from amt_simulator.client import Client
 from amt_simulator.waiting import wait_until
 
+CONNECTED, CONFIGURED, DISCONNECTED = "CONNECTED", "CONFIGURED", "DISCONNECTED"
+PLUGGED = (CONNECTED, CONFIGURED)
+
 
 class Usb:
-    """Plugs, configures and unplugs; each sets the driver's state file and sends a kernel event."""
+    """Plugs, configures and unplugs; each sets the driver's state file and sends a kernel event.
 
-    def __init__(self, client: Client, explain: Callable[[], str]) -> None:
+    A handset with ports has the station's port while it is plugged in.
+    """
+
+    def __init__(self, client: Client, directory: Path, explain: Callable[[], str]) -> None:
         self._client = client
+        self._directory = directory
         self._explain = explain
 
     def plug(self) -> None:
         """A cable comes in: the link is connected."""
-        self.set_state("CONNECTED")
+        self.set_state(CONNECTED)
 
     def configure(self) -> None:
         """The PC configures the link."""
-        self.set_state("CONFIGURED")
+        self.set_state(CONFIGURED)
 
     def unplug(self) -> None:
         """The cable goes: the link is disconnected."""
-        self.set_state("DISCONNECTED")
+        self.set_state(DISCONNECTED)
 
     def set_state(self, state: str) -> None:
         """Bring the link to any state, as `USB_STATE=` tells it."""
-        self._client.ask("usb", state=state)
+        answer = self._client.ask("usb", state=state)
+        if state == DISCONNECTED:
+            ports.close_port(ports.STATION_LINE, self._directory)
+        elif state in PLUGGED and answer["has_ports"] and not answer["has_port"]:
+            ports.open_port(self._client, ports.STATION_LINE, self._directory)
 
     def send(self, *strings: str) -> None:
         """Send any kernel event, made of these strings."""

@@ -1,11 +1,11 @@
-"""Who is at the far end of each tty: the modem, a relay to a port of the PC, or nobody."""
+"""Who is at the far end of each tty: the modem, a port of the PC, or nobody."""
 
 from amt_simulator.inside.lines import Line, NoLine
-from amt_simulator.inside.modem import Modem, Conversation
-from amt_simulator.inside.relay import PortRelay
+from amt_simulator.inside.modem import Conversation, Modem
+from amt_simulator.inside.modem_table import MODES
+from amt_simulator.inside.relay import Port
 
 MODEM_LINES = ("modem", "mux")
-MODES = ("table", "silent", "held", "absent")
 
 
 class Answerer:
@@ -18,7 +18,15 @@ class Answerer:
     def __call__(self, data: bytes) -> None:
         said = self._conversation.feed(data)
         if said:
-            self._line.send(said)
+            _say(self._line, said)
+
+
+def _say(line: Line, data: bytes) -> None:
+    """Say DATA as on a cable: where nobody is, or nobody reads, it is lost."""
+    try:
+        line.send(data)
+    except NoLine:
+        pass
 
 
 class Attendance:
@@ -28,7 +36,9 @@ class Attendance:
         self.modem = modem
         self._lines = {name: line for name, line in lines.items() if line.path}
         self._modes = {name: "table" if name in MODEM_LINES else "held" for name in self._lines}
-        self._relays: dict[str, PortRelay] = {}
+        self._ports: dict[str, Port] = {}
+        # The lines on which the outside speaks.
+        self._left: set[str] = set()
 
     def set_modem_mode(self, mode: str) -> None:
         """Bring the modem into a mode: table, silent, held by whoever takes its ttys, or absent."""
@@ -46,36 +56,61 @@ class Attendance:
             line.connect()
             self.attend(name)
 
-    def relay(self, name: str, relay: PortRelay) -> None:
+    @property
+    def lines(self) -> list[str]:
+        """The lines that the handset has."""
+        return list(self._lines)
+
+    def has_port(self, name: str) -> bool:
+        """Whether the line NAME is connected with a port of the PC."""
+        return name in self._ports
+
+    def add_port(self, name: str, port: Port) -> None:
         """Connect the line NAME with a port of the PC while nobody else speaks on it."""
-        self._relays[name] = relay
-        self.attend(name)
+        self._ports[name] = port
+        if name not in self._left:
+            self.attend(name)
+
+    def remove_port(self, name: str) -> None:
+        """Take the port of the line NAME away, if it has one."""
+        port = self._ports.pop(name, None)
+        if port:
+            port.close()
+            if name not in self._left:
+                self.attend(name)
 
     def attend(self, name: str) -> None:
         """Put to the line NAME whoever belongs there; nothing said before is left."""
         line = self._lines[name]
         mode = self._modes[name]
-        relay = self._relays.get(name)
+        port = self._ports.get(name)
+        self._left.discard(name)
         if mode == "silent":
             line.listen(lambda data: None)
         elif mode == "table":
             line.listen(Answerer(Conversation(self.modem), line))
-        elif relay:
-            line.listen(relay.send)
-            relay.listen(lambda data: self._from_port(line, data))
+        elif port:
+            line.listen(port.end.say)
+            self._hear(name)
         else:
             line.listen(None)
 
     def leave(self, name: str) -> None:
         """Take everybody off the line NAME; whoever holds its master speaks there."""
+        self._left.add(name)
         self._lines[name].listen(None)
-        if name in self._relays:
-            self._relays[name].listen(None)
+        if name in self._ports:
+            self._ports[name].end.listen(None)
 
-    @staticmethod
-    def _from_port(line: Line, data: bytes) -> None:
-        try:
-            line.send(data)
-        except NoLine:
-            # As on a cable that is not plugged in.
-            pass
+    def _hear(self, name: str) -> None:
+        """Pass on what programs write to the port of the line NAME, while the line has room."""
+        if name in self._ports and name not in self._left:
+            self._ports[name].end.listen(lambda data: self._from_port(name, data))
+
+    def _from_port(self, name: str, data: bytes) -> None:
+        line = self._lines[name]
+        _say(line, data)
+        if line.is_full:
+            # Whoever writes to the port has to wait, as for a handset that does not read.
+            self._ports[name].end.listen(None)
+            line.when_said(lambda: self._hear(name))

@@ -83,9 +83,11 @@ class ControlServer:
             client.close()
             return
         reply = Reply(client)
+        # An operation that keeps descriptors takes them out.
+        left = list(fds)
         try:
             request = json.loads(message)
-            request["fds"] = list(fds)
+            request["fds"] = left
             operation = self._operations.get(request.get("op", ""))
             if operation is None:
                 raise Refused(f"no such operation: {request.get('op')}")
@@ -96,3 +98,6 @@ class ControlServer:
             reply.refuse(error.strerror or str(error))
         except (KeyError, TypeError, ValueError) as error:
             reply.refuse(f"bad request: {error!r}")
+        finally:
+            for fd in left:
+                os.close(fd)

@@ -6,13 +6,12 @@ import termios
 import tty
 from typing import Callable
 
+from amt_simulator.inside.endpoint import MOST_WAITING, Endpoint
 from amt_simulator.inside.loop import Loop
-
-READ_SIZE = 4096
 
 
 class NoLine(Exception):
-    """The line is not there: hung up, absent, or not published by the daemon."""
+    """The line is not there (hung up, absent, not published by the daemon), or nobody reads it."""
 
 
 def place_link(path: str, target: str) -> None:
@@ -32,78 +31,73 @@ class Line:
         self._loop = loop
         self._master = -1
         self._slave = -1
-        self._waiting = b""
-        self._listener: Callable[[bytes], None] | None = None
+        self._end: Endpoint | None = None
 
     @property
     def is_up(self) -> bool:
         """Whether the tty exists."""
-        return self._master >= 0
+        return self._end is not None
 
     def connect(self) -> None:
         """Make the tty, raw and without echo, under its name."""
         if self.is_up:
             return
-        self._master, self._slave = os.openpty()
+        try:
+            self._master, self._slave = os.openpty()
+        except OSError as error:
+            raise OSError(error.errno, "this system gives no pseudo-terminal for the line "
+                                       f"{self.name}: {error.strerror}") from None
         tty.setraw(self._slave)
-        os.set_blocking(self._master, False)
+        self._end = Endpoint(self._loop, self._master)
         # The slave stays open here: the master must not see a hang-up while nobody serves the tty.
         place_link(self.path, os.ttyname(self._slave))
-        self._watch()
 
     def hang_up(self) -> None:
         """Take the tty away: whoever holds it gets EIO, its name is gone."""
-        if not self.is_up:
+        if self._end is None:
             return
-        self._loop.watch(self._master, None)
+        self._end.close()
+        self._end = None
         os.unlink(self.path)
         for fd in (self._master, self._slave):
             os.close(fd)
-        self._master = self._slave = -1
-        self._waiting = b""
 
     def listen(self, listener: Callable[[bytes], None] | None) -> None:
         """Hand what arrives to LISTENER; without one, leave it to the master's other holders."""
-        self._listener = listener
-        if self.is_up:
-            self._watch()
+        if self._end:
+            self._end.listen(listener)
 
     def send(self, data: bytes) -> None:
-        """Say DATA on the line, now or as soon as there is room."""
-        if not self.is_up:
-            raise NoLine(f"{self.name} is hung up")
-        self._waiting += data
-        self._flush()
+        """Say DATA on the line, now or as soon as there is room for it."""
+        end = self._there()
+        if end.waiting + len(data) > MOST_WAITING:
+            raise NoLine(f"nobody reads {self.name}: {end.waiting} bytes are waiting already")
+        end.say(data)
+
+    @property
+    def is_full(self) -> bool:
+        """Whether whoever has more to say should wait until all has been said."""
+        return self._end is not None and self._end.waiting >= MOST_WAITING // 2
+
+    def when_said(self, callback: Callable[[], None]) -> None:
+        """Call back once, when all has been said that waits, unless the line goes away first."""
+        self._there().when_said(callback)
 
     def master(self) -> int:
         """The master side, to be handed out."""
-        if not self.is_up:
-            raise NoLine(f"{self.name} is hung up or absent")
+        self._there()
         return self._master
 
     def discard_input(self) -> None:
         """Forget what the daemon has not read, as a tty does when its last user closes it."""
-        if self.is_up:
+        if self._end:
+            self._end.forget()
             termios.tcflush(self._slave, termios.TCIFLUSH)
 
-    def _watch(self) -> None:
-        self._loop.watch(self._master, self._receive if self._listener else None,
-                         self._flush if self._waiting else None)
-
-    def _receive(self) -> None:
-        try:
-            data = os.read(self._master, READ_SIZE)
-        except BlockingIOError:
-            return
-        if data and self._listener:
-            self._listener(data)
-
-    def _flush(self) -> None:
-        try:
-            self._waiting = self._waiting[os.write(self._master, self._waiting):]
-        except BlockingIOError:
-            pass
-        self._watch()
+    def _there(self) -> Endpoint:
+        if self._end is None:
+            raise NoLine(f"{self.name} is hung up or absent")
+        return self._end
 
 
 class AppLine:

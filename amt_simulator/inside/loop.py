@@ -38,13 +38,11 @@ class Loop:
         """Serve for ever."""
         while True:
             for key, events in self._selector.select(self._pause()):
-                on_read, on_write = key.data
-                if events & selectors.EVENT_READ and on_read:
-                    on_read()
-                # The read may have taken the descriptor away.
-                if events & selectors.EVENT_WRITE and on_write and (
-                        key.fd in self._selector.get_map()):
-                    on_write()
+                for place, event in enumerate((selectors.EVENT_READ, selectors.EVENT_WRITE)):
+                    # A callback before may have taken the descriptor away, or changed this one.
+                    known = self._selector.get_map().get(key.fd)
+                    if events & event and known and known.data[place]:
+                        known.data[place]()
             self._fire()
 
     def _pause(self) -> float | None:

@@ -6,6 +6,9 @@ selected, everything else to the modem as a whole.
 
 from dataclasses import dataclass
 
+# What the modem can be told: to answer, to hear only, to leave its ttys to others, to be away.
+MODES = ("table", "silent", "held", "absent")
+
 # What the modem holds when it comes up.
 MEMORY = {
     "maker": "Handset Works",

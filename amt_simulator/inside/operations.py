@@ -12,8 +12,10 @@ from amt_simulator.inside.control import Operation, Refused, Reply, Request
 from amt_simulator.inside.lines import AppLine, Line, NoLine
 from amt_simulator.inside.loop import Loop
 from amt_simulator.inside.processes import Launch, Process, Processes, Service
-from amt_simulator.inside.relay import AppRelay, PortRelay
+from amt_simulator.inside.relay import AppRelay, Port
 
+STATION_LINE = "pc"
+DISCONNECTED = "DISCONNECTED"
 TGKILL = {"x86_64": 234, "aarch64": 131, "armv7l": 268}
 
 
@@ -29,7 +31,7 @@ class Operations:
 
     def __init__(self, loop: Loop, processes: Processes, service: Service,
                  lines: dict[str, Line], attendance: Attendance, app: AppLine,
-                 start_on_plug: bool) -> None:
+                 start_on_plug: bool, has_ports: bool) -> None:
         self._loop = loop
         self._processes = processes
         self._service = service
@@ -37,6 +39,7 @@ class Operations:
         self._attendance = attendance
         self._app = app
         self._start_on_plug = start_on_plug
+        self._has_ports = has_ports
         self._runs = 0
 
     def table(self) -> dict[str, Operation]:
@@ -52,12 +55,18 @@ class Operations:
     # lines
 
     def _op_relay(self, request: Request, reply: Reply) -> None:
+        """Connect a port of the PC; its descriptors are init's from now on."""
+        fds = request["fds"]
         if request["line"] == "app":
-            master, watch = request["fds"]
+            master, watch = fds
             AppRelay(self._loop, master, watch, self._app)
         else:
             line = self._line(request)
-            self._attendance.relay(line.name, PortRelay(self._loop, *request["fds"]))
+            if self._attendance.has_port(line.name):
+                raise Refused(f"{line.name} has its port already")
+            master, slave = fds
+            self._attendance.add_port(line.name, Port(self._loop, master, slave))
+        fds.clear()
         reply()
 
     def _op_take(self, request: Request, reply: Reply) -> None:
@@ -181,10 +190,15 @@ class Operations:
         reply()
 
     def _op_usb(self, request: Request, reply: Reply) -> None:
-        uevent.set_usb_state(request["state"])
-        if request["state"] == "CONNECTED" and self._start_on_plug:
+        state = request["state"]
+        uevent.set_usb_state(state)
+        if state == DISCONNECTED:
+            # The PC sees its port go with the cable.
+            self._attendance.remove_port(STATION_LINE)
+        if state == "CONNECTED" and self._start_on_plug:
             self._service.start()
-        reply()
+        reply({"has_ports": self._has_ports and STATION_LINE in self._attendance.lines,
+               "has_port": self._attendance.has_port(STATION_LINE)})
 
     def _op_uevent_listeners(self, _request: Request, reply: Reply) -> None:
         reply({"listeners": uevent.listeners()})

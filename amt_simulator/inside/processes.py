@@ -86,6 +86,7 @@ class Processes:
         self._loop = loop
         self._known: dict[int, Process] = {}
         self._count = 0
+        self._unwritten = ""
         wake_read, wake_write = os.pipe2(os.O_NONBLOCK | os.O_CLOEXEC)
         signal.set_wakeup_fd(wake_write, warn_on_full_buffer=False)
         signal.signal(signal.SIGCHLD, lambda *_: None)
@@ -130,8 +131,14 @@ class Processes:
     def _record(self, text: str) -> None:
         now = time.time()
         stamp = time.strftime("%H:%M:%S", time.gmtime(now)) + f".{int(now * 1000) % 1000:03d}"
-        with open(RECORD, "a", encoding="utf-8") as stream:
-            stream.write(f"{stamp} {text}\n")
+        self._unwritten += f"{stamp} {text}\n"
+        try:
+            with open(RECORD, "a", encoding="utf-8") as stream:
+                stream.write(self._unwritten)
+        except OSError:
+            # The disk is full: the next record may find room for this one too.
+            return
+        self._unwritten = ""
 
 
 class Service:

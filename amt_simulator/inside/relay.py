@@ -1,72 +1,37 @@
 """Ports of the PC, connected with lines of the handset: pseudo-terminals that programs can open.
 
-The PC's side makes the pseudo-terminal and hands its master in here.
+The PC's side makes the pseudo-terminal and hands its descriptors in here.
 """
 
 import os
 import select
 import struct
-from typing import Callable
 
-from amt_simulator.inside.lines import READ_SIZE, AppLine, NoLine
+from amt_simulator.inside.endpoint import MOST_WAITING, READ_SIZE, Endpoint
+from amt_simulator.inside.lines import AppLine, NoLine
 from amt_simulator.inside.loop import Loop
 
 LOOK_SECONDS = 0.02
 # Of inotify: opened; closed, whether written to or not; an event without a name.
 OPENED, CLOSED = 0x20, 0x18
 EVENT = struct.Struct("iIII")
-FULL = 1 << 16
 
 
-class PortRelay:
-    """A port whose other side is held open on the PC, so that programs may come and go."""
+class Port:
+    """A port that is held open here, so that programs may come and go unnoticed.
 
-    def __init__(self, loop: Loop, master: int) -> None:
-        os.set_blocking(master, False)
-        self._loop = loop
-        self._master = master
-        self._waiting = b""
-        self._listener: Callable[[bytes], None] | None = None
+    A port that nobody reads loses what is too much, the oldest first.
+    """
 
-    def listen(self, listener: Callable[[bytes], None] | None) -> None:
-        """Hand what a program writes to LISTENER; without one, leave it in the port."""
-        self._listener = listener
-        self._watch()
+    def __init__(self, loop: Loop, master: int, slave: int) -> None:
+        self._fds = (master, slave)
+        self.end = Endpoint(loop, master)
 
-    def send(self, data: bytes) -> None:
-        """Give DATA to whoever reads the port; a port that nobody reads loses what is too much."""
-        self._waiting = (self._waiting + data)[-FULL:]
-        self._flush()
-
-    def _watch(self) -> None:
-        self._loop.watch(self._master, self._receive if self._listener else None,
-                         self._flush if self._waiting else None)
-
-    def _receive(self) -> None:
-        data = read_all(self._master)
-        if data and self._listener:
-            self._listener(data)
-
-    def _flush(self) -> None:
-        try:
-            self._waiting = self._waiting[os.write(self._master, self._waiting):]
-        except BlockingIOError:
-            pass
-        self._watch()
-
-
-def read_all(fd: int) -> bytes:
-    """Everything that is there; a request that arrived in pieces goes on in one."""
-    data = b""
-    while len(data) < FULL:
-        try:
-            piece = os.read(fd, READ_SIZE)
-        except BlockingIOError:
-            break
-        if not piece:
-            break
-        data += piece
-    return data
+    def close(self) -> None:
+        """Take the port away: a program that holds it sees the hang-up."""
+        self.end.close()
+        for fd in self._fds:
+            os.close(fd)
 
 
 class AppRelay:
@@ -79,12 +44,13 @@ class AppRelay:
     def __init__(self, loop: Loop, master: int, watch: int, line: AppLine) -> None:
         self._loop = loop
         self._master = master
+        self._port = Endpoint(loop, master)
         self._watch = watch
         self._line = line
         self._slave = -1
+        self._daemon: Endpoint | None = None
         self._passed = ""
-        for fd in (master, watch):
-            os.set_blocking(fd, False)
+        os.set_blocking(watch, False)
         loop.watch(watch, self._look)
 
     def _look(self) -> None:
@@ -94,11 +60,11 @@ class AppRelay:
             is_closed = is_closed or bool(mask & CLOSED)
             is_reopened = is_closed and bool(mask & OPENED)
         is_open = self._port_is_open()
-        if self._slave >= 0 and is_closed and (is_reopened or not is_open):
+        if self._daemon and is_closed and (is_reopened or not is_open):
             if not is_open:
-                self._copy(self._master, self._slave)
+                self._daemon.say(self._port.read())
             self._disconnect()
-        if is_open and self._slave < 0:
+        if is_open and not self._daemon:
             self._connect()
 
     def _events(self) -> list[int]:
@@ -116,7 +82,7 @@ class AppRelay:
 
     def _connect(self) -> None:
         """Open the app line for the program, as soon as the daemon has published it (again)."""
-        if self._slave >= 0 or not self._port_is_open():
+        if self._daemon or not self._port_is_open():
             return
         try:
             self._slave = self._line.open(self._passed)
@@ -124,37 +90,39 @@ class AppRelay:
             self._loop.after(LOOK_SECONDS, self._connect)
             return
         self._passed = self._line.identity()
-        self._loop.watch(self._master, self._from_port)
-        self._loop.watch(self._slave, self._from_line)
+        self._daemon = Endpoint(self._loop, self._slave)
+        self._daemon.watch(self._from_daemon)
+        self._port.watch(self._from_port)
 
     def _disconnect(self) -> None:
-        self._loop.watch(self._master, None)
-        if self._slave >= 0:
-            self._loop.watch(self._slave, None)
+        self._port.watch(None)
+        self._port.forget()
+        if self._daemon:
+            self._daemon.close()
+            self._daemon = None
             os.close(self._slave)
-            self._slave = -1
 
     def _from_port(self) -> None:
         # What a new program says must not go to the app line that an old one has left.
         self._look()
-        if self._slave >= 0 and not self._copy(self._master, self._slave):
+        if not self._daemon:
+            return
+        data = self._port.read()
+        if not data:
             self._disconnect()
+            return
+        self._daemon.say(data)
+        if self._daemon.waiting >= MOST_WAITING // 2:
+            # Whoever writes to the port has to wait, as for an app line that is not read.
+            self._port.watch(None)
+            self._daemon.when_said(lambda: self._port.watch(self._from_port))
 
-    def _from_line(self) -> None:
-        if not self._copy(self._slave, self._master):
+    def _from_daemon(self) -> None:
+        assert self._daemon is not None
+        data = self._daemon.read()
+        if data:
+            self._port.say(data)
+        else:
             # The daemon has gone; a program that stays is connected to the next one.
             self._disconnect()
             self._connect()
-
-    @staticmethod
-    def _copy(source: int, target: int) -> bool:
-        """Pass on what is there; False when one of the sides is gone."""
-        try:
-            data = read_all(source)
-            os.write(target, data)
-        except BlockingIOError:
-            # Nobody reads there; a line without flow control loses it.
-            return True
-        except OSError:
-            return False
-        return bool(data)

@@ -31,8 +31,8 @@ def _launch(given: dict[str, Any]) -> Launch:
                   no_randomize=given["no_randomize"])
 
 
-def main() -> None:
-    """Bring the handset up and serve it until the sandbox ends."""
+def _bring_up() -> Loop:
+    """Bring the handset up; whoever runs the loop serves it."""
     control_fd, ready_fd = int(sys.argv[1]), int(sys.argv[2])
     # Process 1 gets only the signals it asks for; the sandbox is ended from outside.
     for number in (signal.SIGINT, signal.SIGTERM, signal.SIGHUP):
@@ -57,13 +57,23 @@ def main() -> None:
                       orders["restart"], orders["restart_pause"], forget_input)
     operations = Operations(loop, processes, service, lines, attendance,
                             AppLine(orders["lines"]["app"]),
-                            orders["start_on_plug"])
-    # The loop holds the server through its callbacks, and runs until the sandbox ends.
+                            orders["start_on_plug"], orders["ports"])
+    # The loop holds the server through its callbacks.
     ControlServer(loop, control_fd, operations.table())
     if orders["start"]:
         service.start()
     os.write(ready_fd, b"up\n")
     os.close(ready_fd)
+    return loop
+
+
+def main() -> None:
+    """Bring the handset up and serve it until the sandbox ends."""
+    try:
+        loop = _bring_up()
+    except OSError as error:
+        where = f" ({error.filename})" if error.filename else ""
+        sys.exit(f"{error.strerror}{where}")
     loop.run()
 
 

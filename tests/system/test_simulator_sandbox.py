@@ -1,15 +1,18 @@
 """The sandbox of the handset: what is in it, what it cannot reach, how it ends."""
 
 import os
+import re
 import time
 from pathlib import Path
 
 import pytest
 
 from amt_simulator import Handset, HandsetError, HandsetTimeout
+from amt_simulator.root import STAND_INS
 from amt_simulator.waiting import scaled
 
 SHELL = "/bin/sh"
+PLATFORM = Path(__file__).resolve().parents[2] / "platform"
 DEVICE_MODES = {name: os.stat(f"/dev/{name}").st_mode for name in ("null", "zero", "tty")}
 
 
@@ -165,6 +168,19 @@ def test_a_system_without_namespaces_is_told(make_fake, tmp_path: Path, message:
     with pytest.raises(HandsetError, match=text) as caught:
         make_fake()
     assert "\n" not in str(caught.value)
+
+
+def test_the_names_of_the_stand_ins_are_theirs() -> None:
+    """What can be scripted is what their sources ask an answer for, no more and no less."""
+    host = PLATFORM / "host"
+    text = "\n".join(path.read_text() for path in host.rglob("*.cpp"))
+    macros = dict(re.findall(r'#define +(\w+) +"([^"]+)"', "\n".join(
+        path.read_text() for path in (PLATFORM / "include").glob("*.h"))))
+    asked = re.findall(r'(?:stand_in_take_answer|stand_in_answer_call|answer_number)\('
+                       r'("[^"]+"|[A-Z_]+)', text)
+    names = {word.strip('"') if word.startswith('"') else macros[word] for word in asked}
+    names |= set(re.findall(r'\{\w+, "(\w+)", DEVICE_ARGUMENT', text))
+    assert names == set(STAND_INS)
 
 
 def test_a_build_that_is_not_whole(tmp_path: Path) -> None:
