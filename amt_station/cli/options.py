@@ -2,21 +2,27 @@
 
 from __future__ import annotations
 
+import math
 import os
 from dataclasses import dataclass
-from typing import Any, Callable, TypeVar
+from typing import TYPE_CHECKING, Any, Callable, TypeVar
 
 import click
 
 from amt_station.errors import NoPort, UsageProblem
-from amt_station.link import Link
 from amt_station.requests.model import Channel
+
+if TYPE_CHECKING:
+    from amt_station.link import Link
 
 _Command = TypeVar("_Command", bound=Callable[..., Any])
 
 PORT_VARIABLE = "AMT_STATION_PORT"
 CHANNEL_VARIABLE = "AMT_STATION_CHANNEL"
 TIMEOUT_VARIABLE = "AMT_STATION_TIMEOUT"
+
+DEFAULT_BAUD = 115200
+_FASTEST = 4_000_000
 
 
 @dataclass
@@ -26,8 +32,15 @@ class Settings:
     port: str | None = None
     line: str | None = None
     timeout: float | None = None
-    baud: int = 115200
+    baud: int | None = None
     json: bool = False
+
+    def say(self, name: str, value: Any) -> None:
+        """Take what an option says; two that contradict each other are refused."""
+        said = getattr(self, name)
+        if said is not None and said is not False and said != value:
+            raise UsageProblem(f"{said} and {value} contradict each other")
+        setattr(self, name, value)
 
     @property
     def chosen_channel(self) -> Channel:
@@ -45,39 +58,75 @@ class Settings:
         if self.timeout is not None or not word:
             return self.timeout
         try:
-            seconds = float(word)
-        except ValueError:
-            seconds = 0.0
-        if not seconds > 0:
-            raise UsageProblem(f"{TIMEOUT_VARIABLE}: {word!r} is not a number of seconds")
-        return seconds
+            return seconds_of(word)
+        except ValueError as error:
+            raise UsageProblem(f"{TIMEOUT_VARIABLE}: {error}") from None
 
-    def open_link(self) -> Link:
-        """Open the port."""
-        channel, timeout = self.chosen_channel, self.chosen_timeout
+    @property
+    def chosen_port(self) -> str:
+        """Flag before environment; without either there is no port."""
         port = self.port or os.environ.get(PORT_VARIABLE)
         if not port:
             raise NoPort(f"no port named; give --port or set {PORT_VARIABLE}")
-        return Link.open(port, channel, timeout, self.baud)
+        return port
+
+    def open_link(self) -> Link:
+        """Open the port."""
+        from amt_station.link import Link
+
+        channel, timeout = self.chosen_channel, self.chosen_timeout
+        return Link.open(self.chosen_port, channel, timeout, self.baud or DEFAULT_BAUD)
+
+
+def seconds_of(text: str) -> float:
+    """A time in seconds: a finite number above 0."""
+    try:
+        seconds = float(text)
+    except ValueError:
+        seconds = math.nan
+    if not (math.isfinite(seconds) and seconds > 0):
+        raise ValueError(f"{text!r} is not a finite number of seconds above 0")
+    return seconds
+
+
+class Seconds(click.ParamType):
+    """A time on the command line."""
+
+    name = "seconds"
+
+    def convert(self, value: Any, param: click.Parameter | None,
+                ctx: click.Context | None) -> float:
+        """As ``seconds_of``."""
+        try:
+            return seconds_of(str(value))
+        except ValueError as error:
+            self.fail(str(error), param, ctx)
 
 
 def _remember(context: click.Context, parameter: click.Parameter, value: Any) -> None:
-    if value is not None and value is not False and parameter.name is not None:
-        setattr(context.ensure_object(Settings), parameter.name, value)
+    settings = context.ensure_object(Settings)
+    for one in value if isinstance(value, tuple) else (value,):
+        if parameter.name in ("pc", "app"):
+            if one:
+                settings.say("line", parameter.name)
+        elif one is not None and one is not False and parameter.name is not None:
+            settings.say(parameter.name, one)
 
 
 _OPTIONS = (
-    click.option("-p", "--port", metavar="URL", expose_value=False, callback=_remember,
+    click.option("-p", "--port", metavar="URL", multiple=True, expose_value=False,
+                 callback=_remember,
                  help=f"Port to the handset, any pySerial URL  [${PORT_VARIABLE}]"),
-    click.option("--pc", "line", flag_value="pc", expose_value=False, callback=_remember,
+    click.option("--pc", is_flag=True, expose_value=False, callback=_remember,
                  help=f"The port is the PC line (default)  [${CHANNEL_VARIABLE}]"),
-    click.option("--app", "line", flag_value="app", expose_value=False, callback=_remember,
+    click.option("--app", is_flag=True, expose_value=False, callback=_remember,
                  help="The port is the app channel: packets without envelope"),
-    click.option("--timeout", type=click.FloatRange(min=0, min_open=True), metavar="SECONDS",
+    click.option("--timeout", type=Seconds(), metavar="SECONDS", multiple=True,
                  expose_value=False, callback=_remember,
                  help=f"Wait so long for an answer  [${TIMEOUT_VARIABLE}]"),
-    click.option("--baud", type=click.IntRange(min=1), expose_value=False, callback=_remember,
-                 help="Speed of a real serial port (default 115200)"),
+    click.option("--baud", type=click.IntRange(1, _FASTEST), multiple=True, expose_value=False,
+                 callback=_remember,
+                 help=f"Speed of a real serial port (default {DEFAULT_BAUD})"),
     click.option("--json", is_flag=True, expose_value=False, callback=_remember,
                  help="Print the result as one JSON document"),
 )

@@ -76,7 +76,7 @@ def _report(settings: Settings, steps: Plan, results: list[StepResult],
         console.data_json(plan_json(steps, results))
     else:
         for line in verdict_table(results):
-            console.data(line)
+            print(line)
         console.data(summary(steps, results))
     if junit is not None:
         try:
