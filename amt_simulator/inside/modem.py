@@ -12,6 +12,8 @@ MAGIC_START = b"\xaa"
 STALE_SECONDS = 1.0
 CME_NO_SIM = "+CME ERROR: 10"
 CME_PARAMETER = "+CME ERROR: 50"
+# Of a station that has written none: its verdict and its description.
+NO_RESULT = ("0", "")
 
 # A semicolon ends a command of the line only when another command follows it.
 COMMAND_END = re.compile(r";(?=[+^&]|$)")
@@ -56,12 +58,10 @@ class Modem:
         return "".join(f"\r\n{text}\r\n" for text in said if text).encode(
             "utf-8", "surrogateescape")
 
-    def answer_packet(self, command: int, values: dict[int, str]) -> tuple[int, list[table.Field]]:
-        """Answer a request packet with a response id and the fields after its result."""
-        if command == 5 and 21 in values:
-            self._identity()["imei"] = values[21]
-        if command == 87 and 38 in values:
-            self._identity()["sn"] = values[38]
+    def answer_block(self, command: int, content: str) -> tuple[int, list[table.Field]]:
+        """Answer a tunnelled request with a response id and the fields after its result."""
+        if command in table.WRITES:
+            self._identity()[table.WRITES[command][1]] = content
         response = table.RESPONSE_IDS.get(command, command + 1 & 0xFF)
         fields = []
         for field in table.RESPONSES.get(response, ()):
@@ -70,6 +70,47 @@ class Modem:
                 field = table.Blob(field.atom, imei, field.length_size)
             fields.append(field)
         return response, fields
+
+    def answer_packet(self, command: int, values: dict[int, "int | str"]) -> tuple[
+            int, list[table.Field]]:
+        """Answer a request packet, whose atoms have these VALUES, likewise."""
+        if command == table.CHANNEL_SWITCH and table.CHANNEL_ATOM in values:
+            self._memory["channel"] = str(values[table.CHANNEL_ATOM])
+        row = table.PACKETS.get(command)
+        if row is None:
+            atom = table.WRITES[command][0] if command in table.WRITES else 0
+            if command in table.WRITES and atom not in values:
+                return command + 1, []
+            return self.answer_block(command, str(values.get(atom, "")))
+        if isinstance(row, str):
+            special: Callable[[int, dict[int, "int | str"]], list[table.Field]] = getattr(
+                self, f"_{row}")
+            return command + 1, special(command, values)
+        return command + 1, [field._replace(value=self._filled(field.value))
+                             if isinstance(field, table.Text) else field for field in row]
+
+    def _filled(self, text: str) -> str:
+        return text.format_map({**self._memory, **self._identity()})
+
+    @staticmethod
+    def _packet_version(_command: int, values: dict[int, "int | str"]) -> list[table.Field]:
+        module = values.get(19, 0)
+        version = table.MODULE_VERSIONS.get(str(module), "")
+        return [table.Int(19, int(module)), table.Blob(18, version.encode())]
+
+    def _packet_result(self, command: int, values: dict[int, "int | str"]) -> list[table.Field]:
+        station = values.get(39, 0)
+        verdict, description = self._results.get(str(station), NO_RESULT)
+        fields: list[table.Field] = [table.Int(39, int(station)), table.Int(36, int(verdict))]
+        return fields + ([table.Text(37, description)] if command == 89 else [])
+
+    def _packet_capability(self, _command: int,
+                           _values: dict[int, "int | str"]) -> list[table.Field]:
+        return [table.Int(202, int(self._memory["capability"].rpartition(",")[2]))]
+
+    def _packet_serial_number(self, _command: int,
+                              _values: dict[int, "int | str"]) -> list[table.Field]:
+        return [table.Blob(163, self._identity()["sn"].encode())]
 
     @staticmethod
     def _plain(line: str) -> str:
@@ -91,7 +132,7 @@ class Modem:
                 return special(parameter)
             if row.store:
                 self._store(row.store, parameter)
-            return row.info.format_map({**self._memory, **self._identity()})
+            return self._filled(row.info)
         raise Refused("ERROR")
 
     def _store(self, name: str, value: str) -> None:
@@ -124,7 +165,7 @@ class Modem:
         station = parameter.partition(",")[2].strip()
         if not station:
             raise Refused(CME_PARAMETER)
-        result, description = self._results.get(station, ("0", ""))
+        result, description = self._results.get(station, NO_RESULT)
         return f"^DATOMR: {station},{result}" + (f",{description}" if description else "")
 
     def _tunnel(self, parameter: str) -> str:
@@ -134,8 +175,7 @@ class Modem:
             raise Refused(CME_PARAMETER) from None
         if not block:
             raise Refused(CME_PARAMETER)
-        text = block[1:].decode("latin-1")
-        response, fields = self.answer_packet(block[0], {21: text, 38: text})
+        response, fields = self.answer_block(block[0], block[1:].decode("latin-1"))
         return f"^DTTEST: {encode_block(response, fields).hex().upper()}"
 
 
@@ -148,7 +188,7 @@ def encode_block(response: int, fields: list[table.Field]) -> bytes:
             parts.append(field.value.to_bytes(4, "big", signed=True))
         elif isinstance(field, table.Flag):
             parts.append(bytes((field.value,)))
-        else:
+        elif isinstance(field, table.Blob):
             parts.append(len(field.value).to_bytes(field.length_size, "little")
                          if field.length_size else b"")
             parts.append(field.value)
@@ -198,7 +238,9 @@ class Conversation:
     def _answer_frame(self, packet: object) -> bytes:
         from amt_station import wire
         assert isinstance(packet, wire.Packet)
-        values = {atom.id: atom.content.decode("latin-1") for atom in packet.atoms}
+        values: dict[int, int | str] = {
+            atom.id: atom.value if isinstance(atom.value, int) else atom.content.decode("latin-1")
+            for atom in packet.atoms}
         response, fields = self._modem.answer_packet(packet.command, values)
         atoms = [wire.Atom.integer(wire.RESULT_ATOM, 0)]
         for field in fields:
@@ -206,6 +248,8 @@ class Conversation:
                 atoms.append(wire.Atom.integer(field.atom, field.value))
             elif isinstance(field, table.Flag):
                 atoms.append(wire.Atom.boolean(field.atom, field.value))
+            elif isinstance(field, table.Text):
+                atoms.append(wire.Atom.string(field.atom, field.value))
             else:
                 atoms.append(wire.Atom.raw(field.atom, field.value))
         return wire.encode_envelope(wire.Packet(response, tuple(atoms)))

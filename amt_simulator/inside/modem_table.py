@@ -4,7 +4,7 @@ Texts are formatted with the modem's memory: `{imei}` and `{sn}` belong to the c
 selected, everything else to the modem as a whole.
 """
 
-from dataclasses import dataclass
+from typing import NamedTuple
 
 # What the modem can be told: to answer, to hear only, to leave its ttys to others, to be away.
 MODES = ("table", "silent", "held", "absent")
@@ -36,8 +36,7 @@ DEFAULT_IDENTITY = {"imei": "860000000000009", "sn": "KEL0000000000000"}
 MODULE_VERSIONS = {"17": "KEL-1 L1 1.17.0", "18": "KEL-1 HLS 2.18.0"}
 
 
-@dataclass(frozen=True)
-class Row:
+class Row(NamedTuple):
     """One command of the modem.
 
     The command is matched without regard to case; one that ends in "=" takes what follows.
@@ -92,24 +91,21 @@ COMMANDS = (
 )
 
 
-@dataclass(frozen=True)
-class Int:
+class Int(NamedTuple):
     """A 32-bit number of a response, under an atom id."""
 
     atom: int
     value: int
 
 
-@dataclass(frozen=True)
-class Flag:
+class Flag(NamedTuple):
     """A one-byte value of a response."""
 
     atom: int
     value: int
 
 
-@dataclass(frozen=True)
-class Blob:
+class Blob(NamedTuple):
     """Bytes of a response; LENGTH_SIZE bytes (0, 2 or 4) of length stand before them in a block."""
 
     atom: int
@@ -117,7 +113,14 @@ class Blob:
     length_size: int = 4
 
 
-Field = Int | Flag | Blob
+class Text(NamedTuple):
+    """A text of a response packet, formatted with the modem's memory."""
+
+    atom: int
+    value: str
+
+
+Field = Int | Flag | Blob | Text
 
 # What follows the result in the answer to a request, by response id. Any other response holds the
 # result alone. An IMEI of {imei} is filled in from the memory.
@@ -140,3 +143,19 @@ RESPONSES: dict[int, tuple[Field, ...]] = {
 
 # Requests that are not answered with the next id.
 RESPONSE_IDS = {0xDD: 0xDD}
+
+# What follows the result when the request came as a packet, by request id; special answers are
+# named after a method of the modem. Any other request is answered as in the tunnel.
+PACKETS: dict[int, tuple[Field, ...] | str] = {
+    45: "packet_version",
+    65: (Text(27, "{factory_date}"),),
+    85: (Text(38, "{sn}"),),
+    89: "packet_result",
+    197: "packet_capability",
+    228: "packet_result",
+    234: "packet_serial_number",
+}
+
+# Values that a packet writes: under which atom of which request, and into what of the memory.
+WRITES = {5: (21, "imei"), 87: (38, "sn")}
+CHANNEL_SWITCH, CHANNEL_ATOM = 232, 159

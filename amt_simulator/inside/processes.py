@@ -5,38 +5,34 @@ import resource
 import signal
 import sys
 import time
-from dataclasses import dataclass, field
-from typing import Callable, NoReturn
+from typing import Callable, NamedTuple, NoReturn
 
 from amt_simulator.inside.loop import Loop
 
 RECORD = "/handset/init.txt"
 
 
-@dataclass
 class Process:
     """A process that init started, and how it ended."""
 
-    number: int
-    pid: int
-    argv: list[str]
-    returncode: int | None = None
-    # It was ended because it took too long.
-    is_late: bool = False
-    on_exit: list[Callable[["Process"], None]] = field(default_factory=list)
+    def __init__(self, number: int, pid: int, on_exit: Callable[["Process"], None]) -> None:
+        self.number = number
+        self.pid = pid
+        self.on_exit = on_exit
+        self.returncode: int | None = None
+        # It was ended because it took too long.
+        self.is_late = False
 
 
-@dataclass
-class Launch:
+class Launch(NamedTuple):
     """How to start a process."""
 
     argv: list[str]
-    program: str = ""
-    env: dict[str, str] = field(default_factory=dict)
+    program: str
+    env: dict[str, str]
+    stdout: str
+    stderr: str
     directory: str = "/"
-    stdout: str = "/dev/null"
-    stderr: str = "/dev/null"
-    stdin: str = "/dev/null"
     no_randomize: bool = False
 
 
@@ -54,7 +50,7 @@ def _become(launch: Launch) -> NoReturn:
         import ctypes
         ctypes.CDLL(None).personality(0x0040000)
     append = os.O_WRONLY | os.O_CREAT | os.O_APPEND
-    for target, path, flags in ((0, launch.stdin, os.O_RDONLY), (1, launch.stdout, append),
+    for target, path, flags in ((0, "/dev/null", os.O_RDONLY), (1, launch.stdout, append),
                                 (2, launch.stderr, append)):
         fd = os.open(path, flags, 0o644)
         os.dup2(fd, target)
@@ -97,14 +93,10 @@ class Processes:
         """Start a process, WHAT in the record; ON_EXIT is told when it has ended."""
         self._count += 1
         pid = spawn(launch)
-        process = Process(self._count, pid, launch.argv, on_exit=[on_exit])
+        process = Process(self._count, pid, on_exit)
         self._known[pid] = process
         self._record(f"start #{process.number} pid {pid}: {what}: {' '.join(launch.argv)}")
         return process
-
-    def running(self) -> list[Process]:
-        """The processes that have not ended yet."""
-        return list(self._known.values())
 
     def _reap(self) -> None:
         try:
@@ -125,8 +117,7 @@ class Processes:
             how = (f"status {process.returncode}" if process.returncode >= 0
                    else f"signal {-process.returncode}")
             self._record(f"exit #{process.number} pid {pid}: {how}")
-            for callback in process.on_exit:
-                callback(process)
+            process.on_exit(process)
 
     def _record(self, text: str) -> None:
         now = time.time()

@@ -6,6 +6,9 @@ from amt_simulator import Handset
 from amt_simulator.inside import modem_table
 from amt_simulator.inside.modem import Modem, Conversation
 from amt_station import wire
+from amt_station.requests.model import Channel
+from amt_station.requests.table import REQUESTS
+from support.channels import PcChannel, integer, packet, raw, string
 
 OK = b"\r\nOK\r\n"
 ERROR = b"\r\nERROR\r\n"
@@ -113,6 +116,55 @@ def test_packets(tty: Conversation) -> None:
         201, (wire.Atom.integer(1, 0),))
 
 
+def test_each_read_of_the_pc_line_brings_its_values(tty: Conversation) -> None:
+    """What a station can read of the modem by a packet: every value that its answer must hold."""
+    asked = {"module": wire.Atom.integer(19, 17), "station": wire.Atom.integer(39, 25)}
+    reads = [(request, operation) for request in REQUESTS for operation in request.operations
+             if Channel.PC in operation.channels and operation.brings
+             and request.pc and (request.pc.by == "modem" or request.pc.passes_on)]
+    assert {request.id for request, _ in reads} >= {7, 45, 65, 85, 89, 99, 234}
+    for request, operation in reads:
+        atoms = tuple(asked[field.name] for field in request.fields)
+        answer = answered(tty, wire.encode_envelope(wire.Packet(request.id, atoms)))
+        assert answer.command == request.answer_id
+        assert answer.get_int(1) == 0
+        for field in request.answer_fields:
+            if field.name in operation.brings:
+                found = answer.find(field.atom)
+                assert found is not None and found.type is field.type, (operation.name, field)
+                assert found.content, (operation.name, field)
+
+
+@pytest.mark.parametrize("request_packet, atoms", [
+    (wire.Packet(65), (wire.Atom.string(27, "20130121"),)),
+    (wire.Packet(85), (wire.Atom.string(38, "KEL0000000000001"),)),
+    (wire.Packet(234), (wire.Atom.raw(163, b"KEL0000000000001"),)),
+    (wire.Packet(197), (wire.Atom.integer(202, 3),)),
+    (wire.Packet(45, (wire.Atom.integer(19, 18),)),
+     (wire.Atom.integer(19, 18), wire.Atom.raw(18, b"KEL-1 HLS 2.18.0"))),
+    (wire.Packet(89, (wire.Atom.integer(39, 7),)),
+     (wire.Atom.integer(39, 7), wire.Atom.integer(36, 2), wire.Atom.string(37, "it, failed"))),
+    (wire.Packet(228, (wire.Atom.integer(39, 7),)),
+     (wire.Atom.integer(39, 7), wire.Atom.integer(36, 2))),
+    (wire.Packet(89, (wire.Atom.integer(39, 8),)),
+     (wire.Atom.integer(39, 8), wire.Atom.integer(36, 0), wire.Atom.string(37, ""))),
+])
+def test_reads_by_packet(tty: Conversation, request_packet: wire.Packet,
+                         atoms: tuple[wire.Atom, ...]) -> None:
+    """They find the same memory as the AT commands."""
+    tty.feed(b"AT^DATOMW=7,2,it, failed\r")
+    answer = answered(tty, wire.encode_envelope(request_packet))
+    assert answer == wire.Packet(request_packet.command + 1, (wire.Atom.integer(1, 0), *atoms))
+
+
+def test_the_channel_is_switched_by_packet(tty: Conversation) -> None:
+    """What is read then belongs to the other channel."""
+    switch = wire.Packet(232, (wire.Atom.integer(159, 1),))
+    assert answered(tty, wire.encode_envelope(switch)).command == 233
+    board = answered(tty, wire.encode_envelope(wire.Packet(85)))
+    assert board.find(38) == wire.Atom.string(38, "KEL0000000000002")
+
+
 def test_packets_in_pieces_and_between_text(tty: Conversation) -> None:
     """A packet may come byte by byte, behind garbage, and before text."""
     data = b"\x00\xff" + wire.encode_envelope(wire.Packet(87)) + b"AT\r"
@@ -143,3 +195,16 @@ def test_in_the_handset(make_fake) -> None:
     assert handset.pc.read_until(OK) == info("+CSQ: 24,99")
     handset.client.ask("say", line="modem", text="\r\n^RING\r\n")
     assert handset.pc.read_exactly(9) == b"\r\n^RING\r\n"
+
+
+def test_reads_on_the_pc_line(pc: PcChannel) -> None:
+    """What the daemon passes on to the modem brings a value to the station."""
+    for request, value in (
+            (packet(45, integer(19, 17)), raw(18, b"KEL-1 L1 1.17.0")),
+            (packet(65), string(27, "20130121")),
+            (packet(85), string(38, "KEL0000000000001")),
+            (packet(89, integer(39, 4)), integer(36, 0)),
+            (packet(234), raw(163, b"KEL0000000000001"))):
+        answer = pc.request(request.command, *request.atoms, acknowledged=False)
+        assert (answer.command, answer.get_int(1)) == (request.command + 1, 0)
+        assert value in answer.atoms
