@@ -21,7 +21,7 @@ from amt_simulator.waiting import is_ready, scaled
 
 # Init needs the standard library only: what is installed beside it is not even looked for.
 PYTHON = ("/usr/bin/python3", "-s", "-S")
-UP_SECONDS = 20.0
+UP_SECONDS = 40.0
 END_SECONDS = 10.0
 
 # The status with which the sandbox ends when the handset's kernel was told to power off: the end
