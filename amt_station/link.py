@@ -10,34 +10,27 @@ One link has one user at a time: threads that share one take turns, an exchange 
 
 from __future__ import annotations
 
-import math
-import threading
 import time
-from contextlib import contextmanager
 from dataclasses import dataclass
-from types import TracebackType
-from typing import Callable, Iterator
 
-from amt_station import diagnosis, judge, log
-from amt_station.errors import BadFrame, OutOfStep, StationError, UsageProblem
-from amt_station.exchange import AtReply, Exchange, Purpose, ReplyReader, TimedItem, Transcript
+from amt_station import diagnosis, judge
+from amt_station.errors import BadFrame, OutOfStep, UsageProblem
+from amt_station.exchange import AtReply, Exchange, Purpose, ReplyReader, Transcript
+from amt_station.line import Deadline, Line, Observer, checked_seconds
 from amt_station.place import Place, Search, search
 from amt_station.port import Port, SerialPort
 from amt_station.requests.model import Channel
 from amt_station.requests.table import display_name, requests_by_id
 from amt_station.text import printable
-from amt_station.wire.decoder import BareDecoder, Decoder, EnvelopeDecoder, Frame, Item, Text
+from amt_station.wire.decoder import Frame, Item, Text
 from amt_station.wire.envelope import LARGEST_REQUEST, encode_request
 from amt_station.wire.errors import WireError
 from amt_station.wire.packet import Packet
 
+__all__ = ["DEFAULT_TIMEOUT", "RECOVER_TIMEOUT", "Link", "Observer", "Place", "Recovery"]
+
 DEFAULT_TIMEOUT = 10.0
 RECOVER_TIMEOUT = 3.0
-
-# A frame's bytes follow each other closely; after so long a silence its rest will not come.
-_SILENCE = 0.3
-_DRAIN_SECONDS = 1.0
-_MOST_DRAINED = 4096
 
 # Behind the answer to a search the line has to be silent for so long: a late OK of a lost text may
 # have been taken for it, and then the true one follows.
@@ -48,15 +41,6 @@ _LONGEST_UNREST = 3.0
 # After something that speaks against an answer, it comes within this time or not at all.
 _DOUBT_SECONDS = 0.5
 
-Observer = Callable[[Transcript], None]
-
-
-@dataclass
-class Deadline:
-    """Seconds from the sending, which may be shortened while waiting."""
-
-    seconds: float
-
 
 @dataclass(frozen=True)
 class Recovery:
@@ -66,33 +50,14 @@ class Recovery:
     late_answers: tuple[Packet, ...]
 
 
-class Link:
+class Link(Line):
     """A line to the handset; a context manager that closes its port.
 
     Threads that share a link take turns, an exchange being one turn.
     """
 
-    def __init__(self, port: Port, channel: Channel = Channel.PC, timeout: float | None = None,
-                 reopen: Callable[[], Port] | None = None) -> None:
-        """``timeout`` in seconds overrides the time that each request is given by itself.
-
-        ``reopen`` opens the port again after it went away.
-        """
-        self.port = port
-        self.channel = channel
-        self.timeout = None if timeout is None else _checked(timeout)
-        self.observers: list[Observer] = [log.exchange]
-        self._reopen = reopen
-        self._turn = threading.RLock()
-        self._in_step = True
-        self._text_is_lost = False
-        self._searches = 0
-        self._forget()
-
-    def _forget(self) -> None:
-        pc = self.channel is Channel.PC
-        self._decoder: Decoder = EnvelopeDecoder() if pc else BareDecoder()
-        self._watch = None if pc else diagnosis.WrongLineWatch()
+    _text_is_lost = False
+    _searches = 0
 
     @classmethod
     def open(cls, url: str, channel: Channel = Channel.PC, timeout: float | None = None,
@@ -103,17 +68,6 @@ class Link:
 
         return cls(reopen(), channel, timeout, reopen)
 
-    def __enter__(self) -> Link:
-        return self
-
-    def __exit__(self, kind: type[BaseException] | None, error: BaseException | None,
-                 trace: TracebackType | None) -> None:
-        self.close()
-
-    def close(self) -> None:
-        """Give the port back."""
-        self.port.close()
-
     @property
     def in_step(self) -> bool:
         """Whether everything that was sent has been answered."""
@@ -122,75 +76,6 @@ class Link:
     def doubt(self) -> None:
         """What came last may be the answer to something else: find the place before the next."""
         self._in_step = False
-
-    @contextmanager
-    def turn(self) -> Iterator[None]:
-        """Hold the turn over several exchanges: other threads wait until the end of the block."""
-        with self._turn:
-            yield
-
-    @contextmanager
-    def recorded(self) -> Iterator[list[Transcript]]:
-        """Collect the transcripts of all exchanges in the block, failed ones and searches too."""
-        transcripts: list[Transcript] = []
-        self.observers.append(transcripts.append)
-        try:
-            yield transcripts
-        finally:
-            self.observers.remove(transcripts.append)
-
-    # what arrives
-
-    def drain(self) -> list[Item]:
-        """Take what has arrived unasked, for a second at most where that never ends."""
-        items: list[Item] = []
-        end = time.monotonic() + _DRAIN_SECONDS
-        while time.monotonic() < end and (data := self.port.read(0.0)):
-            items = (items + self._decode(data))[:_MOST_DRAINED]
-        return items + self._decode(b"")
-
-    def _decode(self, data: bytes) -> list[Item]:
-        """What the next bytes complete; none mean a silence, in which a frame ends."""
-        items = self._decoder.feed(data) if data else self._decoder.give_up()
-        if self._watch is not None:
-            for item in items:
-                self._watch.look(item)
-        return items
-
-    def _arrivals(self, transcript: Transcript, deadline: Deadline) -> Iterator[TimedItem]:
-        """Send; everything that arrives until the deadline, which counts from then.
-
-        What arrived before is taken away first: it cannot be an answer.
-        """
-        transcript.late = self.drain()
-        start = time.monotonic()
-        self._in_step = False
-        self.port.write(transcript.sent, deadline.seconds)
-        seconds = 0.0
-        while seconds < deadline.seconds:
-            left = deadline.seconds - seconds
-            piece = self.port.read(min(left, _SILENCE) if self._decoder.pending else left)
-            seconds = transcript.seconds = time.monotonic() - start
-            items = self._decode(piece)
-            for item in items:
-                transcript.add(seconds, item)
-            for item in items:
-                yield TimedItem(seconds, item)
-
-    @contextmanager
-    def _conversation(self, transcript: Transcript) -> Iterator[None]:
-        """Tell the observers of an exchange, however it ends."""
-        try:
-            yield
-        except StationError as error:
-            transcript.error = str(error)
-            raise
-        except BaseException as error:
-            transcript.error = type(error).__name__
-            raise
-        finally:
-            for observer in list(self.observers):
-                observer(transcript)
 
     # requests
 
@@ -305,7 +190,7 @@ class Link:
         PC line it flushes a text that the handset holds; a packet that is held and refused again
         raises ``Refused`` with the advice. Without an answer it raises ``OutOfStep``.
         """
-        limit = _checked(timeout)
+        limit = checked_seconds(timeout)
         with self._turn:
             dropped: list[Item] = []
             for attempt in (1, 2):
@@ -372,31 +257,10 @@ class Link:
         place = self.find_place(timeout)
         return Recovery(place.attempts, place.late_answers)
 
-    def reconnect(self, timeout: float) -> None:
-        """Take the port again that went away or is about to, within ``timeout`` seconds.
-
-        The link is out of step afterwards and finds its place before the next exchange.
-        """
-        from amt_station.reopen import reopened
-
-        with self._turn:
-            if self._reopen is None:
-                raise UsageProblem(f"{self.port.name} cannot be opened again")
-            self._in_step = False
-            self.port.close()
-            self.port = reopened(self._reopen, _checked(timeout))
-            self._forget()
-
     def _limit(self, timeout: float | None, own: float | None = None) -> float:
         if timeout is not None:
-            return _checked(timeout)
+            return checked_seconds(timeout)
         return self.timeout or own or DEFAULT_TIMEOUT
-
-
-def _checked(timeout: float) -> float:
-    if isinstance(timeout, bool) or not math.isfinite(timeout) or timeout <= 0:
-        raise UsageProblem(f"a time of {timeout} s: it has to be a finite number above 0")
-    return timeout
 
 
 def _encode(packet: Packet, channel: Channel) -> bytes:

@@ -15,7 +15,7 @@ from __future__ import annotations
 from dataclasses import dataclass
 from typing import Mapping
 
-from amt_station.errors import IncompleteAnswer, Refused, UsageProblem
+from amt_station.errors import IncompleteAnswer, Refused, StationError, UsageProblem
 from amt_station.exchange import AtReply, Exchange
 from amt_station.link import Link
 from amt_station.requests.at_commands import known_read
@@ -81,21 +81,32 @@ def _ask(link: Link, prepared: Prepared,
 def _say(link: Link, prepared: Prepared,
          timeout: float | None) -> tuple[tuple[NamedValue, ...], Exchange | AtReply]:
     reply = link.at(prepared.text, timeout)
-    said = printable(prepared.text)
-    if not reply.ok:
-        raise Refused(f"{said} was answered with {printable(reply.final)}",
-                      causes=_causes(prepared.row, prepared))
-    whole = NamedValue("reply", "\n".join(reply.lines))
-    prefix = prepared.at.prefix if prepared.at else known_read(prepared.text)
-    if not prefix:
-        return (whole,), reply
-    found = [line[len(prefix):].strip() for line in reply.lines if line.startswith(prefix)]
-    if not found or not found[-1].strip('"'):
-        link.doubt()
-        raise IncompleteAnswer(f"{said}: the answer holds no {prefix.strip()} line")
+    problem = reply_problem(reply, _causes(prepared.row, prepared))
+    if problem is not None:
+        if reply.ok:
+            link.doubt()
+        raise problem
     if prepared.at is None:
-        return (whole,), reply
-    return (_read_text(prepared, found[-1]),), reply
+        return (NamedValue("reply", "\n".join(reply.lines)),), reply
+    return (_read_text(prepared, _read_lines(reply)[-1]),), reply
+
+
+def reply_problem(reply: AtReply, causes: tuple[str, ...] = ()) -> StationError | None:
+    """Why a reply is no pass: an error, or a read that brought nothing."""
+    said = printable(reply.sent)
+    if not reply.ok:
+        return Refused(f"{said} was answered with {printable(reply.final)}", causes=causes)
+    prefix = known_read(reply.sent)
+    if prefix and not any(line.strip('"') for line in _read_lines(reply)):
+        return IncompleteAnswer(f"{said}: the answer holds no {prefix} line with a value")
+    return None
+
+
+def _read_lines(reply: AtReply) -> list[str]:
+    """What stands behind the prefix of a text that reads something."""
+    prefix = known_read(reply.sent)
+    return [line[len(prefix):].strip() for line in reply.lines
+            if prefix and line.startswith(prefix)]
 
 
 def _read_text(prepared: Prepared, text: str) -> NamedValue:

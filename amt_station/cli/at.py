@@ -7,10 +7,9 @@ import click
 from amt_station.cli import console
 from amt_station.cli.options import Settings, common_options
 from amt_station.cli.outcome import raise_reported, refusal_json
-from amt_station.errors import Refused, UsageProblem
+from amt_station.perform import reply_problem
 from amt_station.render import at_json, item_line
-from amt_station.requests.at_commands import known_refusal
-from amt_station.requests.model import Channel
+from amt_station.requests.operations import prepare_text
 
 
 @click.command()
@@ -20,15 +19,12 @@ from amt_station.requests.model import Channel
 @click.pass_obj
 def at(settings: Settings, text: str, force: bool) -> None:
     """Send an AT text on the PC line and show its reply; the line end is added."""
-    if settings.chosen_channel is not Channel.PC:
-        raise UsageProblem("AT text is understood on the PC line only")
-    why = known_refusal(text)
-    if why and not force:
-        raise UsageProblem(f"the handset is known to refuse {text}: {why}; it would keep the "
-                           "text and read it again with what follows (--force sends it)")
+    prepared = prepare_text(text, settings.chosen_channel, force)
+    for problem in prepared.forced:
+        console.talk(f"forced: {problem}")
     with settings.open_link() as link, console.waiting(text):
         reply = link.at(text)
-    refusal = None if reply.ok else Refused(f"{reply.sent} was answered with {reply.final}")
+    refusal = reply_problem(reply)
     if settings.json:
         console.data_json({"ok": reply.ok, **at_json(reply), **refusal_json(refusal)})
     else:

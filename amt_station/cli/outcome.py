@@ -4,19 +4,19 @@ from __future__ import annotations
 
 from amt_station import judge
 from amt_station.cli import console
-from amt_station.errors import Refused
+from amt_station.errors import Refused, StationError
 from amt_station.exchange import AtReply, Exchange
 from amt_station.perform import Outcome
 from amt_station.render import at_json, exchange_json, item_line, values_json
 from amt_station.requests.table import display_name
 
 
-def refusal_json(refusal: Refused | None) -> dict[str, object]:
+def refusal_json(refusal: StationError | None) -> dict[str, object]:
     """What a refusal adds to a JSON document."""
     return {"error": refusal.details()} if refusal else {}
 
 
-def raise_reported(refusal: Refused | None) -> None:
+def raise_reported(refusal: StationError | None) -> None:
     """Let a refusal end the command, after its JSON document was printed."""
     if refusal is not None:
         refusal.reported = True
