@@ -1,0 +1,60 @@
+"""Regular expressions of a plan, matched with a time limit.
+
+An expression can take longer than the universe has; a line cannot wait for it.
+"""
+
+from __future__ import annotations
+
+from functools import lru_cache
+from typing import Any
+
+import regex
+
+from amt_station.errors import StationError
+
+SECONDS = 1.0
+_LONGEST_PATTERN = 2000
+_LONGEST_TEXT = 65536
+
+
+class PatternTooSlow(StationError):
+    """A regular expression did not come to an end."""
+
+    exit_status = 7
+    kind = "pattern"
+
+
+class BadPattern(ValueError):
+    """A text that is no regular expression."""
+
+
+@lru_cache(maxsize=256)
+def compiled(pattern: str) -> Any:
+    """The expression, or ``BadPattern`` with the reason."""
+    if len(pattern) > _LONGEST_PATTERN:
+        raise BadPattern(f"longer than {_LONGEST_PATTERN} characters")
+    try:
+        return regex.compile(pattern)
+    except (regex.error, ValueError, OverflowError, RecursionError, MemoryError) as error:
+        raise BadPattern(str(error)) from error
+
+
+def is_whole(pattern: str, text: str) -> bool:
+    """Whether the pattern describes the whole text."""
+    return _timed(pattern, text, "fullmatch")
+
+
+def is_found(pattern: str, text: str) -> bool:
+    """Whether the pattern describes some part of the text."""
+    return _timed(pattern, text, "search")
+
+
+def _timed(pattern: str, text: str, how: str) -> bool:
+    if len(text) > _LONGEST_TEXT:
+        raise PatternTooSlow(f"a text of {len(text)} characters is too long for a pattern")
+    method = getattr(compiled(pattern), how)
+    try:
+        # Other handsets' threads go on meanwhile.
+        return method(text, timeout=SECONDS, concurrent=True) is not None
+    except TimeoutError:
+        raise PatternTooSlow(f"the pattern {pattern!r} took longer than {SECONDS:g} s") from None
