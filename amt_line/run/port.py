@@ -1,0 +1,36 @@
+"""A port on which a run can be ended while it waits."""
+
+from __future__ import annotations
+
+import time
+
+from amt_line.run.stop import SLICE, Stop
+from amt_station.port import Port
+
+
+class StoppablePort:
+    """The port of a link, which raises ``Ended`` as soon as the run ends."""
+
+    def __init__(self, port: Port, stop: Stop) -> None:
+        self.name = port.name
+        self._port = port
+        self._stop = stop
+
+    def read(self, timeout: float) -> bytes:
+        """As in ``Port``."""
+        end = time.monotonic() + timeout
+        while True:
+            self._stop.check()
+            left = max(0.0, end - time.monotonic())
+            data = self._port.read(min(left, SLICE))
+            if data or left <= SLICE:
+                return data
+
+    def write(self, data: bytes, timeout: float) -> None:
+        """As in ``Port``."""
+        self._stop.check()
+        self._port.write(data, timeout)
+
+    def close(self) -> None:
+        """As in ``Port``."""
+        self._port.close()
