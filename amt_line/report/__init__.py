@@ -1,0 +1,1 @@
+"""Reports: all are made from records, from nothing else."""
