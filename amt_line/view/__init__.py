@@ -1,0 +1,1 @@
+"""Live views of a run: made from its events, from nothing else."""
