@@ -226,8 +226,9 @@ def test_an_entered_text_is_a_variable(tmp_path: Path, peer: Peer) -> None:
 def test_a_slow_pattern_ends_the_step_not_the_run(tmp_path: Path, peer: Peer) -> None:
     slow = (b"a" * 64 + b"b\r\n" + OK)
     peer.script = Script(texts={"AT+X": [slow]}, requests={224: [[ACKNOWLEDGEMENT, adc(15)]]})
-    document = Bench(load(tmp_path, "[[step]]\nat = 'AT+X'\nlimits.reply = { matches = '(a|aa)+$' }\n"
-                          + ADC), peer).run()
+    plan = load(tmp_path,
+                "[[step]]\nat = 'AT+X'\nlimits.reply = { matches = '(a|aa)+$' }\n" + ADC)
+    document = Bench(plan, peer).run()
     assert verdicts(document) == ["error", "pass"] and "took longer" in document["reason"]
 
 
