@@ -61,7 +61,7 @@ constexpr uint32_t AMT_ENVELOPE_HEAD_SIZE = 12;
 constexpr uint32_t AMT_ENVELOPE_CHECKSUM_SIZE = 4;
 constexpr uint32_t AMT_ENVELOPE_OVERHEAD = AMT_ENVELOPE_HEAD_SIZE + AMT_ENVELOPE_CHECKSUM_SIZE;
 
-/* What amt_checksum answers when it has no memory to work in. */
+/* What amt_checksum answers when it cannot check what it is given. */
 constexpr uint32_t AMT_CHECKSUM_FAILED = 0xFFFFFFFFU;
 
 /* Zeroes size bytes at buf. Nothing happens for an absent buf. */
@@ -77,8 +77,8 @@ uint8_t amt_packet_get_cmd(const uint8_t *packet);
 uint16_t amt_packet_get_length(const uint8_t *packet);
 
 /*
- * Where the next atom goes: packet + total length, which lies behind the area when the packet claims so (the
- * adders below check that themselves). Absent for an absent packet.
+ * Where the next atom goes: packet + total length. Requires that the total length is at most AMT_PACKET_SIZE
+ * (the adders below check that themselves). Absent for an absent packet.
  */
 uint8_t *amt_packet_get_end(uint8_t *packet);
 
@@ -136,7 +136,8 @@ uint32_t amt_packet_get_string(const uint8_t *packet, uint8_t atom_id, char *dst
 
 /*
  * The checksum of the envelope over length bytes of data. Not the standard CRC-32: stations expect its
- * reflected table applied most significant bit first. Returns AMT_CHECKSUM_FAILED for absent data with a
- * length, or when there is no memory for a copy of data and 4 bytes more. Any thread may call it at any time.
+ * reflected table applied most significant bit first, and four zero bytes behind the data. Returns
+ * AMT_CHECKSUM_FAILED for absent data with a length, or when data and zeros together are more bytes than 32
+ * bits count. Any thread may call it at any time.
  */
 uint32_t amt_checksum(const uint8_t *data, uint32_t length);
