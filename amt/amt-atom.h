@@ -3,25 +3,33 @@
 #include <stdint.h>
 
 /*
- * The ids of the atoms that the daemon's own requests and responses carry, in id order, with the type of the
- * value. Stations know them by number.
+ * The ids of the atoms that requests and responses carry, in id order, with the type of the value: those of
+ * the daemon's own, and those that the modem's answers are taken apart into. Stations know them by number.
  */
 constexpr uint8_t AMT_ATOM_RESULT = 1;                 /* int: 0, or the reason of a refusal */
+constexpr uint8_t AMT_ATOM_DATA = 4;                   /* bytes: received data, or a table's */
 constexpr uint8_t AMT_ATOM_BATTERY_VOLTAGE = 5;        /* int: in the kernel's unit */
+constexpr uint8_t AMT_ATOM_RX_NUMBER = 12;             /* int: before the data of a reception */
+constexpr uint8_t AMT_ATOM_IQ_POWER = 13;              /* int */
 constexpr uint8_t AMT_ATOM_SWITCH = 15;                /* bool: on or off; on when it is missing */
 constexpr uint8_t AMT_ATOM_VERSION = 18;               /* bytes: the text of a version */
 constexpr uint8_t AMT_ATOM_MODULE = 19;                /* int: the module whose version is asked for */
 constexpr uint8_t AMT_ATOM_IMEI = 21;                  /* string */
 constexpr uint8_t AMT_ATOM_TEMPERATURE = 22;           /* int */
+constexpr uint8_t AMT_ATOM_RF_ADC = 24;                /* int */
 constexpr uint8_t AMT_ATOM_LCD_LEVEL = 26;             /* int: 0 to 255; any other restores the first level */
 constexpr uint8_t AMT_ATOM_OUTDATE = 27;               /* string */
 constexpr uint8_t AMT_ATOM_LOOP_TYPE = 30;             /* int: which loop the codec closes */
+constexpr uint8_t AMT_ATOM_IQ_SERIAL = 34;             /* bytes */
 constexpr uint8_t AMT_ATOM_VERDICT = 36;               /* int: the result of a station's test */
 constexpr uint8_t AMT_ATOM_DESCRIPTION = 37;           /* string: what the station says about its verdict */
 constexpr uint8_t AMT_ATOM_BOARD = 38;                 /* string: the board's serial number */
 constexpr uint8_t AMT_ATOM_STATION = 39;               /* int: the number of the station */
 constexpr uint8_t AMT_ATOM_SIM_CHECK = 41;             /* bool: there is a SIM */
+constexpr uint8_t AMT_ATOM_GSM_DATA = 43;              /* bytes: what the GSM side answers */
+constexpr uint8_t AMT_ATOM_TABLE_FLAG = 44;            /* bool: the flag of a table in the flash */
 constexpr uint8_t AMT_ATOM_CARD_CAPACITY = 55;         /* int: KiB of the external memory card */
+constexpr uint8_t AMT_ATOM_DSP_DATA = 62;              /* bytes: what the DSP answers or tells unasked */
 constexpr uint8_t AMT_ATOM_BT_OPERATION = 110;         /* int: 1 read, 2 write, 3 check */
 constexpr uint8_t AMT_ATOM_BT_ADDRESS = 111;           /* string */
 constexpr uint8_t AMT_ATOM_CAMERA_CONTROL = 112;       /* int: the self-test to run, 1 or 2 */

@@ -1,5 +1,6 @@
 #include <string.h>
 
+#include "amt/amt-atom.h"
 #include "amt/amt-byte-order.h"
 #include "amt/amt-command.h"
 #include "amt/amt-convert.h"
@@ -10,7 +11,7 @@
 namespace {
 
 /* What one step reads from a block. */
-enum class field_e
+enum class field_en : uint8_t
 {
     NONE,
     INT,          /* 4 bytes, big-endian */
@@ -22,12 +23,12 @@ enum class field_e
 
 struct step_st
 {
-    field_e m_field = field_e::NONE;
+    field_en m_field = field_en::NONE;
     uint8_t m_atom_id = 0;
     uint32_t m_count = 0; /* of BYTES */
 };
 
-/* Two fields are the most a response has. Only the last one's result counts. */
+/* Two fields are the most a response has. Only the last one's status counts. */
 constexpr uint32_t STEP_COUNT = 2;
 
 struct row_st
@@ -36,24 +37,22 @@ struct row_st
     step_st m_step_a[STEP_COUNT];
 };
 
-constexpr uint8_t RESULT_ATOM_ID = 1;
-
 /* What follows the result code, by command. A command without a row has nothing more. */
 constexpr row_st g_row_a[] = {
-    {AMT_READIMEI_RSPCMD, {{field_e::BYTES, 21, 15}}},
-    {AMT_RXDATA_RSPCMD, {{field_e::INT, 12}, {field_e::BYTES_U32_LE, 4}}},
-    {AMT_IQPOWER_RSPCMD, {{field_e::INT, 13}}},
-    {AMT_VERSION_RSPCMD, {{field_e::INT, 19}, {field_e::BYTES, 18, 64}}},
-    {AMT_READTABLE_MEMORY_RSPCMD, {{field_e::BYTES_U32_LE, 4}}},
-    {AMT_READTABLE_FLASH_RSPCMD, {{field_e::BYTES_U32_LE, 4}}},
-    {AMT_GSM_READTABLE_MEMORY_RSPCMD, {{field_e::BYTES_U32_LE, 4}}},
-    {AMT_READ_RFADC_RSPCMD, {{field_e::INT, 24}}},
-    {AMT_IQSERIAL_RSPCMD, {{field_e::BYTES_U32_LE, 34}}},
-    {AMT_USIMCHECK_RSPCMD, {{field_e::BOOL, 41}}},
-    {AMT_GSM_TRANSPARENT_CONTROL_RSPCMD, {{field_e::BYTES_U32_LE, 43}}},
-    {AMT_GSM_READTABLE_FLAG_FLASH_RSPCMD, {{field_e::BOOL, 44}}},
-    {AMT_DSP_TRANSPARENT_CONTROL_RSPCMD, {{field_e::BYTES_U16_LE, 62}}},
-    {AMT_DSP_TRANSPARENT_CONTROL_INDCMD, {{field_e::BYTES_U16_LE, 62}}},
+    {AMT_READIMEI_RSPCMD, {{field_en::BYTES, AMT_ATOM_IMEI, 15}}},
+    {AMT_RXDATA_RSPCMD, {{field_en::INT, AMT_ATOM_RX_NUMBER}, {field_en::BYTES_U32_LE, AMT_ATOM_DATA}}},
+    {AMT_IQPOWER_RSPCMD, {{field_en::INT, AMT_ATOM_IQ_POWER}}},
+    {AMT_VERSION_RSPCMD, {{field_en::INT, AMT_ATOM_MODULE}, {field_en::BYTES, AMT_ATOM_VERSION, 64}}},
+    {AMT_READTABLE_MEMORY_RSPCMD, {{field_en::BYTES_U32_LE, AMT_ATOM_DATA}}},
+    {AMT_READTABLE_FLASH_RSPCMD, {{field_en::BYTES_U32_LE, AMT_ATOM_DATA}}},
+    {AMT_GSM_READTABLE_MEMORY_RSPCMD, {{field_en::BYTES_U32_LE, AMT_ATOM_DATA}}},
+    {AMT_READ_RFADC_RSPCMD, {{field_en::INT, AMT_ATOM_RF_ADC}}},
+    {AMT_IQSERIAL_RSPCMD, {{field_en::BYTES_U32_LE, AMT_ATOM_IQ_SERIAL}}},
+    {AMT_USIMCHECK_RSPCMD, {{field_en::BOOL, AMT_ATOM_SIM_CHECK}}},
+    {AMT_GSM_TRANSPARENT_CONTROL_RSPCMD, {{field_en::BYTES_U32_LE, AMT_ATOM_GSM_DATA}}},
+    {AMT_GSM_READTABLE_FLAG_FLASH_RSPCMD, {{field_en::BOOL, AMT_ATOM_TABLE_FLAG}}},
+    {AMT_DSP_TRANSPARENT_CONTROL_RSPCMD, {{field_en::BYTES_U16_LE, AMT_ATOM_DSP_DATA}}},
+    {AMT_DSP_TRANSPARENT_CONTROL_INDCMD, {{field_en::BYTES_U16_LE, AMT_ATOM_DSP_DATA}}},
 };
 
 /*
@@ -81,10 +80,10 @@ bool is_target_absent(const uint8_t **cursor)
 uint32_t read_count(const uint8_t **cursor, const step_st &step)
 {
     uint32_t count = step.m_count;
-    if (step.m_field == field_e::BYTES_U16_LE) {
+    if (step.m_field == field_en::BYTES_U16_LE) {
         count = amt_get_u16_le(*cursor);
         *cursor += sizeof(uint16_t);
-    } else if (step.m_field == field_e::BYTES_U32_LE) {
+    } else if (step.m_field == field_en::BYTES_U32_LE) {
         count = amt_get_u32_le(*cursor);
         *cursor += sizeof(uint32_t);
     }
@@ -94,17 +93,17 @@ uint32_t read_count(const uint8_t **cursor, const step_st &step)
 int run_step(const uint8_t **cursor, uint8_t *packet, const step_st &step)
 {
     switch (step.m_field) {
-    case field_e::INT:
+    case field_en::INT:
         return rsp_at_data_2_amt_data_atom_int(cursor, packet, step.m_atom_id);
-    case field_e::BOOL:
+    case field_en::BOOL:
         return rsp_at_data_2_amt_data_atom_bool(cursor, packet, step.m_atom_id);
-    case field_e::BYTES:
-    case field_e::BYTES_U16_LE:
-    case field_e::BYTES_U32_LE: {
+    case field_en::BYTES:
+    case field_en::BYTES_U16_LE:
+    case field_en::BYTES_U32_LE: {
         const uint32_t count = read_count(cursor, step);
         return rsp_at_data_2_amt_data_atom_byte(cursor, packet, count, step.m_atom_id);
     }
-    case field_e::NONE:
+    case field_en::NONE:
         break;
     }
     return PUB_ERR_NONE;
@@ -112,17 +111,18 @@ int run_step(const uint8_t **cursor, uint8_t *packet, const step_st &step)
 
 int run_row(const uint8_t **cursor, uint8_t *packet, const row_st &row)
 {
-    int result = PUB_ERR_NONE;
+    int status = PUB_ERR_NONE;
     for (const step_st &step : row.m_step_a) {
-        if (step.m_field != field_e::NONE) {
-            result = run_step(cursor, packet, step);
+        if (step.m_field != field_en::NONE) {
+            status = run_step(cursor, packet, step);
         }
     }
-    return result;
+    return status;
 }
 
 /* The check of the steps that read a field of fixed size. The last flag is the atom id's: any id will do. */
-int check_step(int line, const char *func, const uint8_t **cursor, const uint8_t *packet)
+int check_step(const uint8_t **cursor, const uint8_t *packet, const char *func = __builtin_FUNCTION(),
+               int line = __builtin_LINE())
 {
     if (!is_target_absent(cursor) && packet != nullptr) {
         return PUB_ERR_NONE;
@@ -136,7 +136,7 @@ int check_step(int line, const char *func, const uint8_t **cursor, const uint8_t
 
 int rsp_at_data_2_amt_data_atom_int(const uint8_t **cursor, uint8_t *packet, uint8_t atom_id)
 {
-    if (check_step(__LINE__, __func__, cursor, packet) != PUB_ERR_NONE) {
+    if (check_step(cursor, packet) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
     amt_packet_add_int(packet, atom_id, static_cast<int32_t>(amt_get_u32_be(*cursor)));
@@ -146,7 +146,7 @@ int rsp_at_data_2_amt_data_atom_int(const uint8_t **cursor, uint8_t *packet, uin
 
 int rsp_at_data_2_amt_data_atom_bool(const uint8_t **cursor, uint8_t *packet, uint8_t atom_id)
 {
-    if (check_step(__LINE__, __func__, cursor, packet) != PUB_ERR_NONE) {
+    if (check_step(cursor, packet) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
     amt_packet_add_bool(packet, atom_id, **cursor);
@@ -189,9 +189,9 @@ int amt_convert_rsp_at_data_2_amt_data(const uint8_t *block, uint32_t len, uint8
     const uint8_t *cursor = area_a;
     const uint8_t cmd = *cursor++;
     amt_packet_init(packet, cmd);
-    const int result = rsp_at_data_2_amt_data_atom_int(&cursor, packet, RESULT_ATOM_ID);
-    if (result != PUB_ERR_NONE || cursor >= area_a + len) {
-        return result;
+    const int status = rsp_at_data_2_amt_data_atom_int(&cursor, packet, AMT_ATOM_RESULT);
+    if (status != PUB_ERR_NONE || static_cast<uint32_t>(cursor - area_a) >= len) {
+        return status;
     }
     const row_st *row_ptr = find_row(cmd);
     return row_ptr == nullptr ? PUB_ERR_NONE : run_row(&cursor, packet, *row_ptr);

@@ -334,6 +334,17 @@ TEST_F(amt_convert_rsp, block_longer_than_its_area_is_read_to_the_areas_end)
     EXPECT_EQ(value(4), counted_bytes(4076));
 }
 
+/* Where addresses have 32 bits, such a length added to one leads around. */
+TEST_F(amt_convert_rsp, block_that_claims_the_longest_length_is_read_too)
+{
+    const std::vector<uint8_t> block =
+        block_of(0x30, u32_le(4076) + counted_bytes(4076)) + std::vector<uint8_t>(5000);
+    std::vector<uint8_t> packet(AMT_PACKET_SIZE);
+    EXPECT_EQ(amt_convert_rsp_at_data_2_amt_data(block.data(), UINT32_MAX, packet.data(), AMT_PACKET_SIZE),
+              PUB_ERR_NONE);
+    EXPECT_EQ(amt_packet_get_bytes(packet.data(), 4, nullptr, 0), 4076U);
+}
+
 TEST_F(amt_convert_rsp, absent_arguments_and_foreign_capacities_are_refused)
 {
     const uint8_t block_a[] = {0x1A, 0, 0, 0, 0};
@@ -415,7 +426,7 @@ TEST_F(amt_convert_rsp, bytes_step_that_does_not_fit_moves_nothing)
     EXPECT_EQ(amt_packet_get_length(packet()), 6);
 }
 
-/* Whatever a modem sends: inside the areas, and a status that is described. */
+/* Whatever a modem sends: inside the areas, and one of the three statuses. */
 TEST_F(amt_convert_rsp, random_blocks)
 {
     std::mt19937 random(5);
