@@ -2,13 +2,13 @@
 
 #include <limits.h>
 #include <stddef.h>
-#include <stdio.h>
 #include <stdlib.h>
 #include <string.h>
 
 #include "amt/amt-log.h"
 #include "pub/cfg/cfg.h"
 #include "pub/error.h"
+#include "pub/file/file.h"
 
 amt_cfg_st g_amt_cfg;
 
@@ -17,7 +17,7 @@ namespace {
 /* What counts of a line. The reader may fill all of it, so that the terminator needs one byte more. */
 constexpr uint32_t LINE_SIZE = 100;
 
-enum class kind_e
+enum class kind_en : uint8_t
 {
     TEXT,
     NUMBER,
@@ -26,14 +26,14 @@ enum class kind_e
 struct key_st
 {
     const char *m_name_ptr;
-    kind_e m_kind;
+    kind_en m_kind;
     size_t m_offset; /* of the field in amt_cfg_st */
     size_t m_size;   /* of the field */
 };
 
 #define KEY(name, kind, field)                                                                               \
     {                                                                                                        \
-        name, kind_e::kind, offsetof(amt_cfg_st, field), sizeof(amt_cfg_st::field)                           \
+        name, kind_en::kind, offsetof(amt_cfg_st, field), sizeof(amt_cfg_st::field)                          \
     }
 
 constexpr key_st g_key_a[] = {
@@ -65,7 +65,7 @@ int32_t to_number(const char *value)
 void store(const key_st &key, const char *value)
 {
     char *field = reinterpret_cast<char *>(&g_amt_cfg) + key.m_offset;
-    if (key.m_kind == kind_e::NUMBER) {
+    if (key.m_kind == kind_en::NUMBER) {
         const int32_t number = to_number(value);
         memcpy(field, &number, sizeof(number));
         PUB_LOG(g_amt_cfg_log, "[cfg]%s = %d", key.m_name_ptr, number);
@@ -93,8 +93,8 @@ void store_setting(const char *name, const char *value)
 int parse_amt_cfg(const char *path)
 {
     pub_log_entry(g_amt_cfg_log);
-    FILE *stream = fopen(path, "r");
-    if (stream == nullptr) {
+    const pub_file_st file(path, pub_file_mode_en::READ);
+    if (!file.is_open()) {
         pub_log_sys_call(g_amt_cfg_log, "fopen");
         pub_log_error(g_amt_cfg_log, PUB_ERR_SYS_CALL);
         pub_log_error(g_amt_cfg_log, PUB_ERR_FILE);
@@ -107,13 +107,12 @@ int parse_amt_cfg(const char *path)
         uint32_t length = 0;
         char *name = nullptr;
         char *value = nullptr;
-        if (pub_cfg_get_line(stream, line_a, LINE_SIZE, &length, &is_eof) == PUB_ERR_NONE &&
+        if (pub_cfg_get_line(file.m_stream_ptr, line_a, LINE_SIZE, &length, &is_eof) == PUB_ERR_NONE &&
             pub_cfg_get_param_and_value(line_a, &name, &value) == PUB_ERR_NONE)
         {
             store_setting(name, value);
         }
     }
-    fclose(stream);
     return PUB_ERR_NONE;
 }
 

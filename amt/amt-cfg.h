@@ -35,6 +35,6 @@ extern amt_cfg_st g_amt_cfg;
  * Resets g_amt_cfg to the defaults and reads the file at path into it. What is wrong inside the file is
  * ignored line by line.
  *
- * Returns 0; -101 for an absent path; -118 when the file cannot be opened.
+ * Returns 0; PUB_ERR_PARAM for an absent path; PUB_ERR_FILE when the file cannot be opened.
  */
 int amt_cfg_init(const char *path);

@@ -23,8 +23,8 @@ constexpr gid_t RADIO_GROUP = 1001;
 /* Whether something is there, be it a link that leads nowhere. */
 bool is_present(const char *path)
 {
-    struct stat status = {};
-    return lstat(path, &status) == 0;
+    struct stat info = {};
+    return lstat(path, &info) == 0;
 }
 
 const char *presence(const char *path)
@@ -79,24 +79,24 @@ void remove_stale_mapping(const char *path)
 const char *make_ptm_raw(int fd)
 {
     termios attr = {};
-    int ret_val = tcgetattr(fd, &attr);
-    PUB_LOG(g_pub_pty_log, "set_ptm_attr tcgetattr(%d) ret_val[%d]", fd, ret_val);
-    if (ret_val != 0) {
+    int status = tcgetattr(fd, &attr);
+    PUB_LOG(g_pub_pty_log, "set_ptm_attr tcgetattr(%d) ret_val[%d]", fd, status);
+    if (status != 0) {
         return "tcgetattr";
     }
     attr.c_iflag = 0;
     attr.c_oflag &= ~static_cast<tcflag_t>(OPOST | OLCUC | OCRNL | ONOCR | ONLRET);
     attr.c_lflag &= ~static_cast<tcflag_t>(ISIG | ICANON | ECHO | ECHOE);
-    ret_val = tcsetattr(fd, TCSANOW, &attr);
-    PUB_LOG(g_pub_pty_log, "set_ptm_attr tcsetattr(%d) ret_val[%d]", fd, ret_val);
-    if (ret_val != 0) {
+    status = tcsetattr(fd, TCSANOW, &attr);
+    PUB_LOG(g_pub_pty_log, "set_ptm_attr tcsetattr(%d) ret_val[%d]", fd, status);
+    if (status != 0) {
         return "tcsetattr";
     }
     /* The kernel grants access to the slave by itself; the line stays for those who read the log by it. */
     PUB_LOG(g_pub_pty_log, "set_ptm_attr grantpt(%d) ret_val[%d]", fd, 0);
-    ret_val = unlockpt(fd);
-    PUB_LOG(g_pub_pty_log, "set_ptm_attr unlockpt(%d) ret_val[%d]", fd, ret_val);
-    return ret_val != 0 ? "unlockpt" : nullptr;
+    status = unlockpt(fd);
+    PUB_LOG(g_pub_pty_log, "set_ptm_attr unlockpt(%d) ret_val[%d]", fd, status);
+    return status != 0 ? "unlockpt" : nullptr;
 }
 
 } // namespace
@@ -121,19 +121,19 @@ int pub_pty_open(pub_pty_st *pty_ptr)
         pub_pty_close(pty_ptr);
         return PUB_ERR_FILE;
     }
-    int ret_val = create_pts_mapping(pty_ptr);
-    if (ret_val != PUB_ERR_NONE) {
+    int status = create_pts_mapping(pty_ptr);
+    if (status != PUB_ERR_NONE) {
         pub_pty_delete_mapping(pty_ptr);
         pub_pty_close(pty_ptr);
-        return ret_val;
+        return status;
     }
-    ret_val = set_ptm_attr(pty_ptr->m_ptm_fd);
-    if (ret_val == PUB_ERR_NONE && pty_ptr->m_is_nonblock != 0) {
-        ret_val = pub_util_set_fd_mode(pty_ptr->m_ptm_fd, pty_ptr->m_is_nonblock);
+    status = set_ptm_attr(pty_ptr->m_ptm_fd);
+    if (status == PUB_ERR_NONE && pty_ptr->m_is_nonblock != 0) {
+        status = pub_util_set_fd_mode(pty_ptr->m_ptm_fd, pty_ptr->m_is_nonblock);
     }
-    if (ret_val != PUB_ERR_NONE) {
+    if (status != PUB_ERR_NONE) {
         pub_pty_close(pty_ptr);
-        return ret_val;
+        return status;
     }
     PUB_LOG(g_pub_pty_log, "pub_pty_open \"%s\" %s", pty_ptr->m_pts_mapping_name_a,
             presence(pty_ptr->m_pts_mapping_name_a));
@@ -149,12 +149,12 @@ int pub_pty_close(pub_pty_st *pty_ptr)
         pub_log_flags(g_pub_pty_log, {pty_ptr == nullptr, pty_ptr != nullptr});
         return PUB_ERR_SYS_CALL;
     }
-    const int ret_val = pub_pty_delete_mapping(pty_ptr);
-    PUB_LOG(g_pub_pty_log, "pub_pty_close pub_pty_delete_mapping ret_val[%d]", ret_val);
-    if (ret_val == PUB_ERR_NONE) {
+    const int status = pub_pty_delete_mapping(pty_ptr);
+    PUB_LOG(g_pub_pty_log, "pub_pty_close pub_pty_delete_mapping ret_val[%d]", status);
+    if (status == PUB_ERR_NONE) {
         close_master(pty_ptr);
     }
-    return ret_val;
+    return status;
 }
 
 int pub_pty_delete_mapping(pub_pty_st *pty_ptr)
@@ -231,11 +231,11 @@ int set_ptm_attr(int fd)
 {
     PUB_LOG(g_pub_pty_log, "set_ptm_attr fd[%d]", fd);
     const char *failed_call = make_ptm_raw(fd);
-    const int ret_val = failed_call == nullptr ? PUB_ERR_NONE : PUB_ERR_FILE;
+    const int status = failed_call == nullptr ? PUB_ERR_NONE : PUB_ERR_FILE;
     if (failed_call != nullptr) {
         pub_log_sys_call(g_pub_pty_log, failed_call);
         pub_log_error(g_pub_pty_log, PUB_ERR_SYS_CALL);
     }
-    PUB_LOG(g_pub_pty_log, "set_ptm_attr fd[%d] ret_val[%d]", fd, ret_val);
-    return ret_val;
+    PUB_LOG(g_pub_pty_log, "set_ptm_attr fd[%d] ret_val[%d]", fd, status);
+    return status;
 }
