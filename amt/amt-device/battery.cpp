@@ -8,8 +8,8 @@
 #include "amt/amt-device/device-fail.h"
 #include "amt/amt-device/device-file.h"
 #include "amt/amt-device/device-request.h"
+#include "amt/amt-handle/channel/factory-file.h"
 #include "amt/amt-handle/channel/reply.h"
-#include "amt/amt-handle/request/factory-file.h"
 #include "amt/amt-packet.h"
 #include "pub/error.h"
 #include "pub/file/scan.h"
@@ -113,13 +113,12 @@ int amt_write_adc_diff_value(int32_t a, int32_t b, int32_t c, int32_t d)
 {
     char text_a[CALIBRATION_SIZE];
     snprintf(text_a, sizeof(text_a), CALIBRATION_FORMAT, a, b, c, d);
-    const amt_factory_step_en step = amt_factory_file_put(CALIBRATION_FILE, text_a);
-    if (step == amt_factory_step_en::OPEN_FAILED) {
+    const pub_file_step_en step = amt_factory_file_write(CALIBRATION_FILE, text_a);
+    if (step == pub_file_step_en::OPEN_FAILED) {
         return amt_device_fail_call({}, "fopen");
     }
     PUB_LOG(g_amt_device_log, "SAVA ADC value: %d %d %d %d", a, b, c, d);
-    amt_factory_file_sync();
-    return step == amt_factory_step_en::DONE ? PUB_ERR_NONE : amt_device_fail_call({}, "fprintf");
+    return step == pub_file_step_en::DONE ? PUB_ERR_NONE : amt_device_fail_call({}, "fprintf");
 }
 
 int amt_device_battery_voltage(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)

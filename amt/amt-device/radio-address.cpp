@@ -10,8 +10,8 @@
 #include "amt/amt-device/device-fail.h"
 #include "amt/amt-device/device-request.h"
 #include "amt/amt-device/radio-step.h"
+#include "amt/amt-handle/channel/factory-file.h"
 #include "amt/amt-handle/channel/reply.h"
-#include "amt/amt-handle/request/factory-file.h"
 #include "amt/amt-handle/request/identity-store.h"
 #include "amt/amt-packet.h"
 #include "platform/include/ldt.h"
@@ -75,12 +75,12 @@ int finish_bt_write(bool is_address, bool is_written, const char *address)
 int write_bt_address(const char *address, uint32_t length)
 {
     const bool is_address = length != 0 && length == strlen(address);
-    const amt_factory_step_en step =
-        amt_factory_file_put(AMT_BT_ADDRESS_FILE, is_address ? address : "", is_address ? "\n" : "");
-    if (step == amt_factory_step_en::OPEN_FAILED) {
+    const pub_file_step_en step =
+        pub_file_write(AMT_BT_ADDRESS_FILE, is_address ? address : "", is_address ? "\n" : "");
+    if (step == pub_file_step_en::OPEN_FAILED) {
         return fail_bt_open();
     }
-    const int status = finish_bt_write(is_address, step == amt_factory_step_en::DONE, address);
+    const int status = finish_bt_write(is_address, step == pub_file_step_en::DONE, address);
     amt_factory_file_sync();
     return status;
 }

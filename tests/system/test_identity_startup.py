@@ -15,11 +15,12 @@ ADDRESS_FILE = "/amt/WIFI/WIFI_nvram.txt"
 STOCK = "/system/etc/wifi/nvram.txt"
 STOCK_2 = "/system/etc/wifi/bcmdhd.cal"
 DRIVER = "/data/misc/wifi/nvram.txt"
+SYNC = "/system/bin/sync"
 REWRITE = "amt_write_wifi_to_nvram_file"
 MAC = "00:11:22:33:44:55\n"
 MAC_LINE = f"macaddr={MAC}"
 
-NO_ENTRY, IS_DIRECTORY = 2, 21
+NO_ENTRY, IS_DIRECTORY, READ_ONLY = 2, 21, 30
 
 Start = Callable[..., tuple[Handset, Trace]]
 
@@ -174,6 +175,18 @@ def test_a_copy_that_cannot_be_opened(start: Start) -> None:
     assert trace.calls() == []
     trace.expect(error_line(REWRITE, -100, IS_DIRECTORY), f"open  {DRIVER} fail")
     trace.expect_none(f"fchmod  {DRIVER} successfully")
+
+
+def test_a_copy_that_vanishes_before_its_mode_is_set(start: Start) -> None:
+    handset, trace = start({STOCK: "a=1\n", SYNC: (f"#!/bin/sh\nrm -f {DRIVER}\n", 0o755)})
+    assert not handset.path(DRIVER).exists()
+    trace.expect(error_line(REWRITE, -118, NO_ENTRY), f"open {DRIVER} failed")
+
+
+def test_a_copy_whose_mode_cannot_be_set(start: Start) -> None:
+    _, trace = start({STOCK: "a=1\n", SYNC: (f"#!/bin/sh\nln -sf /usr/bin/true {DRIVER}\n", 0o755)})
+    trace.expect(error_line(REWRITE, -118, READ_ONLY),
+                 f"fchmod  {DRIVER} failed, Read-only file system")
 
 
 def test_no_file_stays_open(start: Start) -> None:

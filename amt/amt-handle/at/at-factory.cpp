@@ -8,7 +8,7 @@
 
 #include "amt/amt-handle/at/at-operand.h"
 #include "amt/amt-handle/at/at-reply.h"
-#include "amt/amt-handle/request/factory-file.h"
+#include "amt/amt-handle/channel/factory-file.h"
 #include "amt/amt-handle/request/handshake-permission.h"
 #include "amt/amt-handle/request/identity-store.h"
 #include "amt/amt-log.h"
@@ -36,15 +36,13 @@ int read_bt_address(char *word)
     if (path == nullptr) {
         return PUB_ERR_FILE;
     }
-    FILE *const file = fopen(path, "r");
-    if (file == nullptr) {
+    const pub_file_step_en step = pub_file_read_word(path, word, LINE_SIZE);
+    if (step == pub_file_step_en::OPEN_FAILED) {
         pub_log_error(g_amt_handle_log, PUB_ERR_FILE);
         PUB_LOG(g_amt_handle_log, "open(\"%s\") fail: %d - %s", path, errno, strerror(errno));
         return PUB_ERR_FILE;
     }
-    const bool is_read = fscanf(file, "%99s", word) == 1;
-    fclose(file);
-    if (!is_read) {
+    if (step != pub_file_step_en::DONE) {
         pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
         PUB_LOG(g_amt_handle_log, "read not completed");
         return PUB_ERR_FAIL;
@@ -52,31 +50,23 @@ int read_bt_address(char *word)
     return PUB_ERR_NONE;
 }
 
-int put_bt_address(const char *path, const char *address)
+/* Writes the address to the file that holds one, or to where the first one goes. */
+int write_bt_address(const char *address)
 {
-    const amt_factory_step_en step = amt_factory_file_put(path, address, "\n");
-    if (step == amt_factory_step_en::DONE) {
+    const char *const known_path = get_bt_addr_file();
+    const char *const path = known_path != nullptr ? known_path : AMT_BT_ADDRESS_FILE;
+    const pub_file_step_en step = amt_factory_file_write(path, address, "\n");
+    if (step == pub_file_step_en::DONE) {
         PUB_LOG(g_amt_handle_log, "write BT address: %s", address);
         return PUB_ERR_NONE;
     }
     pub_log_error(g_amt_handle_log, PUB_ERR_FILE);
-    if (step == amt_factory_step_en::OPEN_FAILED) {
+    if (step == pub_file_step_en::OPEN_FAILED) {
         PUB_LOG(g_amt_handle_log, "open(\"%s\") fail: %d - %s", path, errno, strerror(errno));
         return PUB_ERR_FILE;
     }
     PUB_LOG(g_amt_handle_log, "fputs() fail");
     return PUB_ERR_INCOMPLETE;
-}
-
-/* Writes the address to the file that holds one, or to where the first one goes. */
-int write_bt_address(const char *address)
-{
-    const char *const known_path = get_bt_addr_file();
-    const int status = put_bt_address(known_path != nullptr ? known_path : AMT_BT_ADDRESS_FILE, address);
-    if (status != PUB_ERR_FILE) {
-        amt_factory_file_sync();
-    }
-    return status;
 }
 
 int reply_pcba_sn()

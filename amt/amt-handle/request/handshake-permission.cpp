@@ -4,7 +4,7 @@
 #include <stdlib.h>
 #include <string.h>
 
-#include "amt/amt-handle/request/factory-file.h"
+#include "amt/amt-handle/channel/factory-file.h"
 #include "amt/amt-handle/request/identity-store.h"
 #include "amt/amt-log.h"
 #include "pub/error.h"
@@ -14,20 +14,19 @@ namespace {
 /* Makes the digit durable. The log says which step failed. */
 int amt_write_content_to_file_sync(const char *digit)
 {
-    switch (amt_factory_file_write(AMT_PERMISSION_FILE, digit)) {
-    case amt_factory_step_en::DONE:
-        PUB_LOG(g_amt_handle_log, "Writed to file(%s) success.flag: %s.", AMT_PERMISSION_FILE, digit);
-        return PUB_ERR_NONE;
-    case amt_factory_step_en::OPEN_FAILED:
+    const pub_file_step_en step = amt_factory_file_write(AMT_PERMISSION_FILE, digit);
+    if (step == pub_file_step_en::OPEN_FAILED) {
         pub_log_error(g_amt_handle_log, PUB_ERR_FILE);
         PUB_LOG(g_amt_handle_log, "open(\"%s\") fail: %d - %s", AMT_PERMISSION_FILE, errno, strerror(errno));
-        break;
-    case amt_factory_step_en::WRITE_FAILED:
+        return PUB_ERR_FILE;
+    }
+    if (step != pub_file_step_en::DONE) {
         pub_log_error(g_amt_handle_log, PUB_ERR_FILE);
         PUB_LOG(g_amt_handle_log, "fputs fail: %d - %s", errno, strerror(errno));
-        break;
+        return PUB_ERR_FILE;
     }
-    return PUB_ERR_FILE;
+    PUB_LOG(g_amt_handle_log, "Writed to file(%s) success.flag: %s.", AMT_PERMISSION_FILE, digit);
+    return PUB_ERR_NONE;
 }
 
 } // namespace

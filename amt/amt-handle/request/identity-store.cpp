@@ -6,26 +6,26 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include "amt/amt-handle/channel/factory-file.h"
 #include "amt/amt-handle/channel/identity-slots.h"
-#include "amt/amt-handle/request/factory-file.h"
 #include "amt/amt-log.h"
 #include "pub/error.h"
 #include "pub/file/file.h"
 #include "pub/util/process.h"
 
+namespace {
+
 /* A handset whose system was reflashed from an older layout has its Bluetooth address here. */
-static constexpr const char *BT_ADDRESS_FILE_2 = "/mnt/opl/nvm/BT_Address.txt";
+constexpr const char *BT_ADDRESS_FILE_2 = "/mnt/opl/nvm/BT_Address.txt";
 
 /* Room for the longest line that counts, 98 characters with the line feed. */
-static constexpr uint32_t LINE_SIZE = 99;
+constexpr uint32_t LINE_SIZE = 99;
 
-static constexpr mode_t FOLDER_MODE = 0777;
-static constexpr uint32_t FOLDER_COMMAND_SIZE = 100;
+constexpr mode_t FOLDER_MODE = 0777;
+constexpr uint32_t FOLDER_COMMAND_SIZE = 100;
 
 /* The modem channel whose texts have files of their own. */
-static constexpr uint8_t SECOND_CHANNEL = 1;
-
-namespace {
+constexpr uint8_t SECOND_CHANNEL = 1;
 
 /* One kind of identity text: where it is saved, and what the log calls it. */
 struct identity_file_st
@@ -41,10 +41,8 @@ constexpr identity_file_st g_identity_file_a[] = {
     {AMT_IDENTITY_SN, "sn", "/amt/sn.txt", AMT_PCBA_SN_FILE},
 };
 
-} // namespace
-
 /* The open line is one text for readers and writers, under the name of the operation that failed. */
-static int fail_open(int line, const char *func, const char *path)
+int fail_open(const char *path, const char *func = __builtin_FUNCTION(), int line = __builtin_LINE())
 {
     pub_log_error(g_amt_handle_log, PUB_ERR_FILE, func, line);
     PUB_LOG(g_amt_handle_log, "open(\"%s\") fail: %d - %s", path, errno, strerror(errno));
@@ -52,13 +50,14 @@ static int fail_open(int line, const char *func, const char *path)
 }
 
 /* Reads the first line of the file, cut to what fits buf (size bytes), for the operation of that name. */
-static int read_first_line(int line, const char *func, const char *path, char *buf, uint32_t size)
+int read_first_line(const char *path, char *buf, uint32_t size, const char *func = __builtin_FUNCTION(),
+                    int line = __builtin_LINE())
 {
     memset(buf, 0, size);
     char line_a[LINE_SIZE];
     switch (pub_file_read_line(path, line_a, sizeof(line_a))) {
     case pub_file_step_en::OPEN_FAILED:
-        return fail_open(line, func, path);
+        return fail_open(path, func, line);
     case pub_file_step_en::DONE:
         memcpy(buf, line_a, strnlen(line_a, size - 1));
         return PUB_ERR_NONE;
@@ -71,6 +70,27 @@ static int read_first_line(int line, const char *func, const char *path, char *b
     return PUB_ERR_FILE;
 }
 
+const identity_file_st *find_identity_file(int kind)
+{
+    for (const identity_file_st &file : g_identity_file_a) {
+        if (file.m_kind == kind) {
+            return &file;
+        }
+    }
+    return nullptr;
+}
+
+/* verb is a constant of this file; only the path is cut when both do not fit. */
+void run_on_folder(const char *verb, const char *path)
+{
+    char command_a[FOLDER_COMMAND_SIZE];
+    snprintf(command_a, sizeof(command_a), "%s %s", verb, path);
+    const int ignored_status = pub_util_run_shell(command_a);
+    static_cast<void>(ignored_status);
+}
+
+} // namespace
+
 int amt_write_pcba_sn(const char *text, const char *path)
 {
     pub_log_entry(g_amt_handle_log);
@@ -79,29 +99,25 @@ int amt_write_pcba_sn(const char *text, const char *path)
         pub_log_flags(g_amt_handle_log, {text == nullptr, text != nullptr});
         return PUB_ERR_PARAM;
     }
-    int ret_val = PUB_ERR_NONE;
-    switch (amt_factory_file_put(path, text)) {
-    case amt_factory_step_en::OPEN_FAILED:
-        return fail_open(__LINE__, __func__, path);
-    case amt_factory_step_en::WRITE_FAILED:
-        ret_val = PUB_ERR_FILE;
-        pub_log_error(g_amt_handle_log, ret_val);
-        PUB_LOG(g_amt_handle_log, "fputs fail: %d - %s", errno, strerror(errno));
-        break;
-    case amt_factory_step_en::DONE:
-        PUB_LOG(g_amt_handle_log, "write pcba-sn: %s", text);
-        break;
+    const pub_file_step_en step = amt_factory_file_write(path, text);
+    if (step == pub_file_step_en::OPEN_FAILED) {
+        return fail_open(path);
     }
-    amt_factory_file_sync();
-    return ret_val;
+    if (step != pub_file_step_en::DONE) {
+        pub_log_error(g_amt_handle_log, PUB_ERR_FILE);
+        PUB_LOG(g_amt_handle_log, "fputs fail: %d - %s", errno, strerror(errno));
+        return PUB_ERR_FILE;
+    }
+    PUB_LOG(g_amt_handle_log, "write pcba-sn: %s", text);
+    return PUB_ERR_NONE;
 }
 
 int amt_read_pcba_sn(char *buf)
 {
     pub_log_entry(g_amt_handle_log);
-    const int ret_val = read_first_line(__LINE__, __func__, AMT_PCBA_SN_FILE, buf, AMT_PCBA_SN_SIZE);
-    if (ret_val != PUB_ERR_NONE) {
-        return ret_val;
+    const int status = read_first_line(AMT_PCBA_SN_FILE, buf, AMT_PCBA_SN_SIZE);
+    if (status != PUB_ERR_NONE) {
+        return status;
     }
     PUB_LOG(g_amt_handle_log, "read pcba-sn: %s", buf);
     return PUB_ERR_NONE;
@@ -115,22 +131,12 @@ int amt_read_data_from_file(char *buf, uint32_t size, const char *path)
         pub_log_flags(g_amt_handle_log, {buf == nullptr, size == 0, path == nullptr});
         return PUB_ERR_PARAM;
     }
-    const int ret_val = read_first_line(__LINE__, __func__, path, buf, size);
-    if (ret_val != PUB_ERR_NONE) {
-        return ret_val;
+    const int status = read_first_line(path, buf, size);
+    if (status != PUB_ERR_NONE) {
+        return status;
     }
     PUB_LOG(g_amt_handle_log, "read content: %s", buf);
     return PUB_ERR_NONE;
-}
-
-static const identity_file_st *find_identity_file(int kind)
-{
-    for (const identity_file_st &file : g_identity_file_a) {
-        if (file.m_kind == kind) {
-            return &file;
-        }
-    }
-    return nullptr;
 }
 
 int handle_amt_imei_and_sn_save_file(int kind)
@@ -148,11 +154,11 @@ int handle_amt_imei_and_sn_save_file(int kind)
         return PUB_ERR_NONE;
     }
     const uint8_t channel = amt_identity_get_channel();
-    const int ret_val = amt_write_pcba_sn(text_a, channel == SECOND_CHANNEL ? file_ptr->m_second_path_ptr
-                                                                            : file_ptr->m_path_ptr);
+    const int status = amt_write_pcba_sn(text_a, channel == SECOND_CHANNEL ? file_ptr->m_second_path_ptr
+                                                                           : file_ptr->m_path_ptr);
     PUB_LOG(g_amt_handle_log, "save %s to file. channel:%d; content:%s;", file_ptr->m_name_ptr, channel,
             text_a);
-    if (ret_val != PUB_ERR_NONE) {
+    if (status != PUB_ERR_NONE) {
         pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
         PUB_LOG(g_amt_handle_log, "write %s error.", file_ptr->m_name_ptr);
         return PUB_ERR_FAIL;
@@ -172,15 +178,6 @@ const char *get_bt_addr_file()
     pub_log_error(g_amt_handle_log, PUB_ERR_FILE);
     PUB_LOG(g_amt_handle_log, "can not access file \"%s\" or \"%s\"", AMT_BT_ADDRESS_FILE, BT_ADDRESS_FILE_2);
     return nullptr;
-}
-
-/* verb is a constant of this file; only the path is cut when both do not fit. */
-static void run_on_folder(const char *verb, const char *path)
-{
-    char command_a[FOLDER_COMMAND_SIZE];
-    snprintf(command_a, sizeof(command_a), "%s %s", verb, path);
-    const int ignored_status = pub_util_run_shell(command_a);
-    static_cast<void>(ignored_status);
 }
 
 int amt_make_folder(const char *path)
@@ -239,22 +236,18 @@ int amt_write_wifi_address(const char *text)
         pub_log_flags(g_amt_handle_log, {text == nullptr, text != nullptr});
         return PUB_ERR_PARAM;
     }
-    int ret_val = PUB_ERR_NONE;
-    switch (amt_factory_file_put(AMT_WIFI_ADDRESS_FILE, text, "\n")) {
-    case amt_factory_step_en::OPEN_FAILED:
+    const pub_file_step_en step = amt_factory_file_write(AMT_WIFI_ADDRESS_FILE, text, "\n");
+    if (step == pub_file_step_en::OPEN_FAILED) {
         pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
         PUB_LOG(g_amt_handle_log, "open %s fail", AMT_WIFI_ADDRESS_FILE);
         return PUB_ERR_FAIL;
-    case amt_factory_step_en::WRITE_FAILED:
-        ret_val = PUB_ERR_FILE;
-        pub_log_error(g_amt_handle_log, ret_val);
-        pub_log_sys_call(g_amt_handle_log, "fputs");
-        break;
-    case amt_factory_step_en::DONE:
-        /* The station's log readers know this text, and it is about this file in spite of its words. */
-        PUB_LOG(g_amt_handle_log, "write BT address: %s", text);
-        break;
     }
-    amt_factory_file_sync();
-    return ret_val;
+    if (step != pub_file_step_en::DONE) {
+        pub_log_error(g_amt_handle_log, PUB_ERR_FILE);
+        pub_log_sys_call(g_amt_handle_log, "fputs");
+        return PUB_ERR_FILE;
+    }
+    /* The station's log readers know this text, and it is about this file in spite of its words. */
+    PUB_LOG(g_amt_handle_log, "write BT address: %s", text);
+    return PUB_ERR_NONE;
 }

@@ -25,25 +25,25 @@ constexpr const char *AMT_BT_ADDRESS_FILE = "/amt/BT/BT_Address.txt";
 
 /*
  * Writes a text without a line end to the file: the common writer of the PCBA number, the IMEI and the serial
- * number. Returns 0, -101 (absent or empty text) or -118 (open or write failed; a failed write leaves the
- * file truncated).
+ * number. Returns 0, PUB_ERR_PARAM (absent or empty text) or PUB_ERR_FILE (open or write failed; a failed write
+ * leaves the file truncated).
  */
 int amt_write_pcba_sn(const char *text, const char *path);
 
-/* Reads the PCBA number, terminated, into buf (AMT_PCBA_SN_SIZE bytes). Returns 0 or -118; buf is empty then.
- */
+/* Reads the PCBA number, terminated, into buf (AMT_PCBA_SN_SIZE bytes). Returns 0 or PUB_ERR_FILE; buf is empty
+ * then. */
 int amt_read_pcba_sn(char *buf);
 
 /*
  * Saves the captured IMEI (kind 1) or serial number (kind 2) to the file of the captured channel. An empty
- * text writes nothing. Returns 0, -100 (not written) or -101 (any other kind).
+ * text writes nothing. Returns 0, PUB_ERR_FAIL (not written) or PUB_ERR_PARAM (any other kind).
  */
 int handle_amt_imei_and_sn_save_file(int kind);
 
 /*
  * Reads the first line of a file, at most 98 characters with its line feed kept, into buf (size bytes),
- * terminated and cut to size - 1. Returns 0, -101 (absent buffer, size 0 or absent path) or -118 (not opened,
- * not read or empty; buf is empty then).
+ * terminated and cut to size - 1. Returns 0, PUB_ERR_PARAM (absent buffer, size 0 or absent path) or
+ * PUB_ERR_FILE (not opened, not read or empty; buf is empty then).
  */
 int amt_read_data_from_file(char *buf, uint32_t size, const char *path);
 
@@ -52,15 +52,16 @@ const char *get_bt_addr_file();
 
 /*
  * Makes the folder if nothing of that name exists, and gives it to the group "radio" with mode 766: written
- * by all, searched by its owner only. Returns 0, -101 (absent path) or -118 (it cannot be made).
+ * by all, searched by its owner only. Returns 0, PUB_ERR_PARAM (absent path) or PUB_ERR_FILE (it cannot be made).
  */
 int amt_make_folder(const char *path);
 
 /*
  * Reads the Wi-Fi address into buf (AMT_WIFI_ADDRESS_SIZE bytes), less the last character of its line, which
- * is the line feed. Returns 0 or -100; buf is empty then.
+ * is the line feed. Returns 0 or PUB_ERR_FAIL; buf is empty then.
  */
 int amt_read_wifi_address(char *buf);
 
-/* Writes the Wi-Fi address and a line feed. Returns 0, -100 (not opened), -101 (absent or empty) or -118. */
+/* Writes the Wi-Fi address and a line feed. Returns 0, PUB_ERR_FAIL (not opened), PUB_ERR_PARAM (absent or
+ * empty) or PUB_ERR_FILE. */
 int amt_write_wifi_address(const char *text);

@@ -4,7 +4,7 @@
 #include <string.h>
 #include <sys/stat.h>
 
-#include "amt/amt-handle/request/factory-file.h"
+#include "amt/amt-handle/channel/factory-file.h"
 #include "amt/amt-log.h"
 #include "pub/error.h"
 

@@ -1,4 +1,4 @@
-#include "amt/amt-handle/request/factory-file.h"
+#include "amt/amt-handle/channel/factory-file.h"
 
 #include <chrono>
 #include <errno.h>
@@ -24,9 +24,9 @@ TEST(factory_file, writes_the_text_as_it_stands_and_takes_the_time_of_a_flush)
 {
     const temp_folder_c folder;
     const std::string path = folder.path("sn.txt");
-    amt_factory_step_en step = amt_factory_step_en::OPEN_FAILED;
+    pub_file_step_en step = pub_file_step_en::OPEN_FAILED;
     EXPECT_GE(time_of([&] { step = amt_factory_file_write(path.c_str(), "A%sB\r"); }), FLUSH_TIME);
-    EXPECT_EQ(step, amt_factory_step_en::DONE);
+    EXPECT_EQ(step, pub_file_step_en::DONE);
     EXPECT_EQ(read_whole_file(path), "A%sB\r");
 }
 
@@ -35,33 +35,25 @@ TEST(factory_file, replaces_a_longer_text)
     const temp_folder_c folder;
     const std::string path = folder.path("sn.txt");
     write_whole_file(path, "0123456789\nsecond line\n");
-    EXPECT_EQ(amt_factory_file_put(path.c_str(), "12", "\n"), amt_factory_step_en::DONE);
+    EXPECT_EQ(amt_factory_file_write(path.c_str(), "12", "\n"), pub_file_step_en::DONE);
     EXPECT_EQ(read_whole_file(path), "12\n");
-}
-
-TEST(factory_file, put_does_not_flush)
-{
-    const temp_folder_c folder;
-    const std::string path = folder.path("sn.txt");
-    EXPECT_LT(time_of([&] { amt_factory_file_put(path.c_str(), "12"); }), FLUSH_TIME);
-    EXPECT_EQ(read_whole_file(path), "12");
 }
 
 TEST(factory_file, a_file_that_cannot_be_opened_is_not_flushed)
 {
     const temp_folder_c folder;
     const std::string path = folder.path("no-such-folder/sn.txt");
-    amt_factory_step_en step = amt_factory_step_en::DONE;
+    pub_file_step_en step = pub_file_step_en::DONE;
     EXPECT_LT(time_of([&] { step = amt_factory_file_write(path.c_str(), "12"); }), FLUSH_TIME);
-    EXPECT_EQ(step, amt_factory_step_en::OPEN_FAILED);
+    EXPECT_EQ(step, pub_file_step_en::OPEN_FAILED);
     EXPECT_EQ(errno, ENOENT);
 }
 
 TEST(factory_file, a_full_file_system_is_a_failed_write_and_is_flushed_all_the_same)
 {
-    amt_factory_step_en step = amt_factory_step_en::DONE;
+    pub_file_step_en step = pub_file_step_en::DONE;
     EXPECT_GE(time_of([&] { step = amt_factory_file_write("/dev/full", "12"); }), FLUSH_TIME);
-    EXPECT_EQ(step, amt_factory_step_en::WRITE_FAILED);
+    EXPECT_EQ(step, pub_file_step_en::WRITE_FAILED);
     EXPECT_EQ(errno, ENOSPC);
 }
 

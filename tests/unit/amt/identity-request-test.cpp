@@ -1,5 +1,7 @@
 #include "amt/amt-handle/request/identity-request.h"
 
+#include <string.h>
+
 #include <gtest/gtest.h>
 
 #include "amt/amt-packet.h"
@@ -40,6 +42,16 @@ TEST_P(identity_request_check, refuses_no_channel_no_request_and_no_response)
 
 INSTANTIATE_TEST_SUITE_P(handlers, identity_request_check,
                          testing::Values(&amt_handle_board_pcba_ctrl, &amt_handle_adb_serial_no));
+
+/* The acknowledgement that went before may still be there, if it could not be sent. */
+TEST_P(identity_request_check, starts_its_response_afresh)
+{
+    exchange_st exchange(PCBA_ID);
+    memset(&exchange.m_rsp, 0xA5, sizeof(exchange.m_rsp));
+    EXPECT_NE(GetParam()(AMT_CHANNEL_PC, &exchange.m_req, &exchange.m_rsp), PUB_ERR_NONE);
+    EXPECT_EQ(exchange.m_rsp.m_buf_len, 0U);
+    EXPECT_EQ(amt_packet_get_length(exchange.m_rsp.m_buf_a), AMT_PACKET_HEADER_SIZE);
+}
 
 /* The operation is the first byte of the atom, whatever its type. */
 void expect_unknown_pcba_operation(exchange_st *exchange_ptr, const std::string &operation)

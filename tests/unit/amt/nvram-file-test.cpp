@@ -1,9 +1,12 @@
 #include "amt/amt-handle/request/nvram-file.h"
 
+#include <errno.h>
+
 #include <gtest/gtest.h>
 
 #include "pub/error.h"
 #include "tests/unit/support/log-capture.h"
+#include "tests/unit/support/log-lines.h"
 #include "tests/unit/support/temp-folder.h"
 
 namespace {
@@ -135,6 +138,30 @@ INSTANTIATE_TEST_SUITE_P(limits, nvram_file_count,
                                          count_case_st{100, 100, PUB_ERR_FAIL},
                                          count_case_st{101, 100, PUB_ERR_FAIL},
                                          count_case_st{5000, 100, PUB_ERR_FAIL}));
+
+TEST(nvram_file, a_cut_is_logged)
+{
+    const log_capture_c capture;
+    copy(make_lines(99), "");
+    EXPECT_TRUE(capture.texts().empty());
+    copy(make_lines(100), "");
+    EXPECT_EQ(capture.texts().size(), 1U);
+    EXPECT_EQ(capture.count_containing("FUNC-amt_write_wifi_to_nvram_file(), error_code=-100, "), 1);
+}
+
+TEST(nvram_file, a_full_file_system_is_a_failure)
+{
+    const temp_folder_c folder;
+    write_whole_file(folder.path("source"), "a=1\n");
+    const pub_file_st in(folder.path("source").c_str(), pub_file_mode_en::READ);
+    const pub_file_st out("/dev/full", pub_file_mode_en::RENEW);
+    const log_capture_c capture;
+    EXPECT_EQ(amt_nvram_copy(in, out, ""), PUB_ERR_FAIL);
+    EXPECT_EQ(without_line_numbers(capture),
+              (std::vector<std::string>{
+                  error_line("amt/amt-handle", "amt_write_wifi_to_nvram_file", PUB_ERR_FAIL, ENOSPC),
+                  "sys call: fputs() failed! errno = " + std::to_string(ENOSPC)}));
+}
 
 TEST(nvram_file, address_lines_are_not_counted)
 {

@@ -1,0 +1,34 @@
+#include "amt/amt-handle/channel/factory-file.h"
+
+#include <errno.h>
+
+#include "pub/util/process.h"
+#include "pub/util/thread-end.h"
+
+namespace {
+
+constexpr int FLUSH_COUNT = 2;
+constexpr uint32_t FLUSH_PAUSE_MS = 50;
+constexpr const char *SYNC_COMMAND = "/system/bin/sync";
+
+} // namespace
+
+pub_file_step_en amt_factory_file_write(const char *path, const char *text, const char *line_end)
+{
+    const pub_file_step_en step = pub_file_write(path, text, line_end);
+    if (step != pub_file_step_en::OPEN_FAILED) {
+        amt_factory_file_sync();
+    }
+    return step;
+}
+
+void amt_factory_file_sync()
+{
+    const int saved_errno = errno;
+    for (int i = 0; i < FLUSH_COUNT; i++) {
+        pub_util_sleep_ms(FLUSH_PAUSE_MS);
+        const int ignored_status = pub_util_run_shell(SYNC_COMMAND);
+        static_cast<void>(ignored_status);
+    }
+    errno = saved_errno;
+}
