@@ -8,7 +8,7 @@
 #include "amt/amt-device/device-request.h"
 #include "amt/amt-device/hal-library.h"
 #include "amt/amt-handle/channel/reply.h"
-#include "amt/amt-handle/request/version.h"
+#include "amt/amt-handle/request/ap-version.h"
 #include "amt/amt-packet.h"
 #include "platform/include/amt-misc-hal.h"
 #include "pub/error.h"

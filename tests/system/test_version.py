@@ -93,6 +93,7 @@ def query(desk: ModemDesk, value: bytes, *packets: wire.Packet, module: int = 17
 def test_modem_version_and_its_log(desk: ModemDesk, module: int, name: str) -> None:
     trace = query(desk, b" 1,0D414243", version(module, b"ABC"), module=module)
     trace.expect("handle_amt_req_version()", shown(module), "handle_amt_req_l1_hls_version()",
+                 "get_l1_hls_version()",
                  f"will send at command:AT^DCMR={module}\\r", "write_at()",
                  f"get version success.type:{module}, version:[len:3 content:ABC]",
                  dump(APP_OUT, version(module, b"ABC").encode()))
@@ -386,9 +387,9 @@ def test_missing_emmc_and_carrier_are_left_out(software: Software) -> None:
         error_line("amt_read_emmc_info", -100, 2), f"open {EMMC} fail")
     software.handset.place(EMMC, "")
     software.expect(start + "(Freenet)").expect(
-        error_line("amt_read_emmc_info", -100), "read fail")
+        error_line("amt_read_emmc_info", -100, 0), "read fail")
     software.handset.place(CARRIER, "ro.carrier.code=001\nro.carrier.nam=X\n")
-    software.expect(start).expect("amt_read_cm_info()", error_line("amt_read_cm_info", -100))
+    software.expect(start).expect("amt_read_cm_info()", error_line("amt_read_cm_info", -100, 0))
     software.handset.place(CARRIER, None)
     software.expect(start).expect(
         error_line("amt_read_cm_info", -100, 2), f"open cm file {CARRIER} fail")

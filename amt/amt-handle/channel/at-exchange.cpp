@@ -106,14 +106,14 @@ void amt_at_set_command(const char *format, ...)
     g_at_transmit.m_len = static_cast<uint32_t>(strlen(g_at_transmit.m_text_a));
 }
 
-int amt_at_exchange(const amt_at_exchange_st &exchange, void *context)
+int amt_at_exchange(const amt_at_exchange_st &exchange, void *context, int line)
 {
     int status = write_at(g_at_transmit.m_text_a, g_at_transmit.m_len);
     if (status == PUB_ERR_NONE) {
         status = wait_final(exchange, context);
     }
     if (status != PUB_ERR_NONE) {
-        pub_log_error(g_amt_handle_log, status, exchange.m_name_ptr);
+        pub_log_error(g_amt_handle_log, status, exchange.m_name_ptr, line);
     }
     return status;
 }

@@ -56,9 +56,9 @@ void amt_at_set_command(const char *format, ...) __attribute__((format(printf, 1
  * Sends the transmit area and collects the answer in the receive area until a final result: "\r\n+CME ERROR",
  * "\r\n+CMS ERROR" and "\r\nERROR\r\n" are the bad ones. Waits without limit. Returns 0, -100 for a bad final
  * result, -101 when the receive area is full without one, the status of m_step_ptr, or the failing status of
- * the AT channel.
+ * the AT channel; the error line of a failure names m_name_ptr and the caller's line.
  */
-int amt_at_exchange(const amt_at_exchange_st &exchange, void *context);
+int amt_at_exchange(const amt_at_exchange_st &exchange, void *context, int line = __builtin_LINE());
 
 /* What the receive area holds. */
 std::string_view amt_at_received();

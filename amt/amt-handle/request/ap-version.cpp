@@ -1,6 +1,5 @@
 #include "amt/amt-handle/request/ap-version.h"
 
-#include <errno.h>
 #include <stdio.h>
 #include <string.h>
 #include <strings.h>
@@ -9,6 +8,7 @@
 #include "amt/amt-log.h"
 #include "platform/include/cutils/properties.h"
 #include "pub/error.h"
+#include "pub/file/file.h"
 
 namespace {
 
@@ -22,6 +22,10 @@ constexpr const char *UNSET = " ";
 constexpr const char *UNSET_MAKER = "null";
 
 constexpr uint32_t BOARD_INFO_SIZE = 92;
+
+/* Room for a line of 48 characters, as much as is read of the eMMC and carrier files' lines. */
+constexpr uint32_t LINE_SIZE = 49;
+static_assert(LINE_SIZE < AMT_AP_LINE_SIZE);
 
 /* The version text while it grows: room for every source at its longest, so that the real length can be
  * logged. */
@@ -59,7 +63,7 @@ bool read_property(const char *key, char *value, const char *unset)
 }
 
 /* The failure of a property that the text starts with. */
-int fail_property(int line, const char *key)
+int fail_property(const char *key, int line = __builtin_LINE())
 {
     pub_log_error(g_amt_handle_log, PUB_ERR_FAIL, "get_ap_sw_version", line);
     PUB_LOG(g_amt_handle_log, "read %s error", key);
@@ -81,7 +85,7 @@ int append_own_brand(version_text_st *version_ptr, bool *is_complete_ptr)
 {
     char value_a[PROPERTY_VALUE_MAX];
     if (!read_property("ro.build.version.incremental", value_a, UNSET)) {
-        return fail_property(__LINE__, "ro.build.version.incremental");
+        return fail_property("ro.build.version.incremental");
     }
     append(version_ptr, "ORLA ", value_a, "");
     *is_complete_ptr = !read_property("ro.build.display.vx.id", value_a, UNSET);
@@ -96,7 +100,7 @@ int append_other_brand(version_text_st *version_ptr)
 {
     char value_a[PROPERTY_VALUE_MAX];
     if (!read_property("ro.build.display.id", value_a, UNSET)) {
-        return fail_property(__LINE__, "ro.build.display.id");
+        return fail_property("ro.build.display.id");
     }
     append_field(version_ptr, value_a);
     return PUB_ERR_NONE;
@@ -175,18 +179,13 @@ int get_ap_sw_version(char *buf, uint32_t *length_ptr)
 int amt_read_emmc_info(char *buf)
 {
     pub_log_entry(g_amt_handle_log);
-    buf[0] = '\0';
-    FILE *const stream = fopen(EMMC_INFO_FILE, "r");
-    if (stream == nullptr) {
+    const pub_file_step_en step = pub_file_read_line(EMMC_INFO_FILE, buf, LINE_SIZE);
+    if (step == pub_file_step_en::OPEN_FAILED) {
         pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
         PUB_LOG(g_amt_handle_log, "open %s fail", EMMC_INFO_FILE);
         return PUB_ERR_FAIL;
     }
-    const bool is_read = fgets(buf, AMT_AP_LINE_SIZE - 1, stream) != nullptr;
-    const int read_errno = errno;
-    fclose(stream);
-    if (!is_read) {
-        errno = read_errno;
+    if (step != pub_file_step_en::DONE) {
         pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
         PUB_LOG(g_amt_handle_log, "read fail");
         return PUB_ERR_FAIL;
@@ -203,21 +202,18 @@ int amt_read_cm_info(char *buf)
 {
     pub_log_entry(g_amt_handle_log);
     buf[0] = '\0';
-    FILE *const stream = fopen(CARRIER_FILE, "r");
-    if (stream == nullptr) {
+    const pub_file_st file(CARRIER_FILE, pub_file_mode_en::READ);
+    if (!file.is_open()) {
         pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
         PUB_LOG(g_amt_handle_log, "open cm file %s fail", CARRIER_FILE);
         return PUB_ERR_FAIL;
     }
-    char line_a[AMT_AP_LINE_SIZE] = {};
-    bool is_found = false;
-    while (!is_found && fgets(line_a, AMT_AP_LINE_SIZE - 1, stream) != nullptr) {
-        is_found = strstr(line_a, CARRIER_KEY) != nullptr;
-    }
-    fclose(stream);
-    if (!is_found) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
-        return PUB_ERR_FAIL;
+    char line_a[LINE_SIZE] = {};
+    while (strstr(line_a, CARRIER_KEY) == nullptr) {
+        if (pub_file_get_line(file, line_a, sizeof(line_a)) == 0) {
+            pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
+            return PUB_ERR_FAIL;
+        }
     }
     /* The path in this line is not the file's; log readers know it so. */
     PUB_LOG(g_amt_handle_log, "line_a(%s). flag: %s.", BOARD_INFO_FILE, line_a);

@@ -3,23 +3,20 @@
 #include <inttypes.h>
 #include <signal.h>
 #include <string.h>
+#include <sys/reboot.h>
 #include <unistd.h>
 
+#include "amt/amt-atom.h"
 #include "amt/amt-command.h"
 #include "amt/amt-handle/channel/at-exchange.h"
+#include "amt/amt-handle/channel/reply.h"
 #include "amt/amt-handle/request/handshake-permission.h"
-#include "amt/amt-handle/request/power-off.h"
-#include "amt/amt-handle/request/request-frame.h"
 #include "amt/amt-packet.h"
 #include "platform/include/cutils/properties.h"
 #include "pub/error.h"
 #include "pub/util/thread-end.h"
 
 namespace {
-
-constexpr uint8_t ATOM_HANDSHAKE = 192; /* operation in a request, flag in a response */
-constexpr uint8_t ATOM_WANTED_MODE = 201;
-constexpr uint8_t RSP_POWER_OFF = 237;
 
 constexpr int HANDSHAKE_NOT_PERMITTED = 0;
 
@@ -29,8 +26,9 @@ constexpr const char *USB_UNSET = "@#no_set_config#@"; /* holds no function that
 constexpr const char *STOP_PROPERTY = "ctl.stop";
 constexpr const char *SIBLING_SERVICE = "vx-kel-mla0";
 
-/* How long the app has for reading the answer before its line goes down. */
-constexpr uint32_t ANSWER_PAUSE_MS = 500;
+/* How long the app and the station have for reading the answer before their line goes down. */
+constexpr uint32_t APP_PAUSE_MS = 500;
+constexpr uint32_t PC_PAUSE_MS = 2000;
 
 constexpr amt_at_exchange_st g_band_exchange = {"amt_change_band", amt_at_trace_en::TEXT, AMT_AT_OK, false,
                                                 nullptr};
@@ -63,15 +61,15 @@ void activate_usb_serial()
 void end_program()
 {
     PUB_LOG(g_amt_handle_log, "will exit program.");
-    pub_util_sleep_ms(ANSWER_PAUSE_MS);
+    pub_util_sleep_ms(APP_PAUSE_MS);
     const int stopped = property_set(STOP_PROPERTY, SIBLING_SERVICE);
     PUB_LOG(g_amt_handle_log, "stop vx-kel-mla return: %d", stopped);
     kill(getpid(), SIGTERM);
 }
 
-/* The check of the handlers that accept an empty request. */
-int check_presence(int line, const char *func, uint32_t channel, const amt_buf_st *req_ptr,
-                   const amt_buf_st *rsp_ptr)
+/* As amt_reply_enter, for the handlers that accept an empty request. */
+int enter_with_any_request(uint32_t channel, const amt_buf_st *req_ptr, const amt_buf_st *rsp_ptr,
+                           const char *func = __builtin_FUNCTION(), int line = __builtin_LINE())
 {
     pub_log_entry(g_amt_handle_log, func);
     if (channel != AMT_CHANNEL_NONE && req_ptr != nullptr && rsp_ptr != nullptr) {
@@ -94,19 +92,20 @@ int amt_change_band(int32_t band)
 
 int amt_handle_normal_to_amt(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    if (const int status = AMT_BEGIN_MODEM_REQUEST(channel, req_ptr, rsp_ptr); status != PUB_ERR_NONE) {
+    int status = amt_reply_enter_modem(g_amt_handle_log, channel, req_ptr, rsp_ptr);
+    if (status != PUB_ERR_NONE) {
         return status;
     }
-    const int32_t mode = amt_packet_get_int(req_ptr->m_buf_a, ATOM_WANTED_MODE);
+    const int32_t mode = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_WANTED_MODE);
     PUB_LOG(g_amt_handle_log, "amt_handle_normal_to_amt amt_mode:%" PRId32, mode);
     if (switch_modem(mode) != PUB_ERR_NONE) {
-        return amt_reply_failed(channel, rsp_ptr, AMT_NORMAL_TO_AMT_RSPCMD);
+        return amt_reply_fail(channel, rsp_ptr, AMT_NORMAL_TO_AMT_RSPCMD);
     }
     constexpr const char *switched = "1";
     property_set(SWITCH_PROPERTY, switched);
     PUB_LOG(g_amt_handle_log, "set property(%s) to %s.", SWITCH_PROPERTY, switched);
     amt_reply_start(rsp_ptr, AMT_NORMAL_TO_AMT_RSPCMD);
-    const int status = amt_reply_finish_ok(channel, rsp_ptr);
+    status = amt_reply_finish_ok(channel, rsp_ptr);
     activate_usb_serial();
     end_program();
     return status;
@@ -114,26 +113,27 @@ int amt_handle_normal_to_amt(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *
 
 int amt_handle_damt1_cmd(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    if (const int status = AMT_BEGIN_MODEM_REQUEST(channel, req_ptr, rsp_ptr); status != PUB_ERR_NONE) {
+    int status = amt_reply_enter_modem(g_amt_handle_log, channel, req_ptr, rsp_ptr);
+    if (status != PUB_ERR_NONE) {
         return status;
     }
-    const int32_t operation = amt_packet_get_int(req_ptr->m_buf_a, ATOM_HANDSHAKE);
+    const int32_t operation = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_HANDSHAKE);
     PUB_LOG(g_amt_handle_log, "amt_handle_damt1_cmd op_type:%" PRId32, operation);
     int flag = 0;
-    const int status = handle_amt_damt1_operation(operation, &flag);
+    status = handle_amt_damt1_operation(operation, &flag);
     PUB_LOG(g_amt_handle_log, "amt_handle_damt1_cmd op_type:%" PRId32 "; flag:%d; ret_val:%d.", operation,
             flag, status);
     if (status != PUB_ERR_NONE) {
-        return amt_reply_failed(channel, rsp_ptr, AMT_DAMT1_RSPCMD);
+        return amt_reply_fail(channel, rsp_ptr, AMT_DAMT1_RSPCMD);
     }
     amt_reply_start(rsp_ptr, AMT_DAMT1_RSPCMD);
-    amt_packet_add_int(rsp_ptr->m_buf_a, ATOM_HANDSHAKE, flag);
+    amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_HANDSHAKE, flag);
     return amt_reply_finish_ok(channel, rsp_ptr);
 }
 
 int amt_handle_not_permit_handshake(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    if (check_presence(__LINE__, __func__, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+    if (enter_with_any_request(channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
     int flag = 0;
@@ -146,10 +146,19 @@ int amt_handle_not_permit_handshake(uint32_t channel, amt_buf_st *req_ptr, amt_b
 
 int amt_handle_power_off(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    if (check_presence(__LINE__, __func__, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+    if (enter_with_any_request(channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
-    const int status = amt_handle_send_rsp_ok(channel, rsp_ptr, RSP_POWER_OFF);
+    const int status = amt_handle_send_rsp_ok(channel, rsp_ptr, AMT_POWER_OFF_RSPCMD);
     amt_power_off_handset();
     return status;
+}
+
+void amt_power_off_handset()
+{
+    pub_util_sleep_ms(PC_PAUSE_MS);
+    if (reboot(RB_POWER_OFF) != 0) {
+        pub_log_sys_call(g_amt_handle_log, "reboot");
+        pub_log_error(g_amt_handle_log, PUB_ERR_SYS_CALL);
+    }
 }

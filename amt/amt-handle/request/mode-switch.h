@@ -6,9 +6,9 @@
 
 /*
  * Handlers (see amt_handle_func) of the requests that switch the handset between its normal and its
- * factory-test mode, or off. Unless stated otherwise: -101 for a bad channel, request or response and -111
- * without a modem, both without an answer; every other failure is answered with result 10, and the status of
- * that send is returned.
+ * factory-test mode, or off. Unless stated otherwise: PUB_ERR_PARAM for a bad channel, request or response
+ * and PUB_ERR_NO_MODEM without a modem, both without an answer; every other failure is answered with
+ * AMT_RESULT_MODEM_FAILED, and the status of that send is returned.
  */
 
 /*
@@ -26,8 +26,8 @@ int amt_change_band(int32_t band);
 int amt_handle_damt1_cmd(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr);
 
 /*
- * Id 219 from the PC: withdraws that permission. Needs no modem and accepts an empty request. Returns -101 or
- * the failing status of the file operation without an answer.
+ * Id 219 from the PC: withdraws that permission. Needs no modem and accepts an empty request. Returns
+ * PUB_ERR_PARAM or the failing status of the file operation without an answer.
  */
 int amt_handle_not_permit_handshake(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr);
 
@@ -36,3 +36,10 @@ int amt_handle_not_permit_handshake(uint32_t channel, amt_buf_st *req_ptr, amt_b
  * Returns the status of the answer if the system refuses to power off.
  */
 int amt_handle_power_off(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr);
+
+/*
+ * Powers the handset off: a pause of 2 seconds, in which the answer that announced it reaches the station,
+ * then the reboot system call with its power-off command. Returns only when the system refuses, which is
+ * logged.
+ */
+void amt_power_off_handset();

@@ -7,7 +7,7 @@
 #include "amt/amt-handle/channel/at-exchange.h"
 #include "amt/amt-handle/channel/context.h"
 #include "amt/amt-handle/channel/hex-digit.h"
-#include "amt/amt-handle/request/request-frame.h"
+#include "amt/amt-handle/channel/reply.h"
 #include "pub/error.h"
 
 namespace {
@@ -72,7 +72,7 @@ int forward_answer(void *context)
     amt_handle_clear_buf(tunnel.m_rsp_ptr);
     const int status = amt_convert_rsp_at_data_2_amt_data(g_decoded.m_buf_a, g_decoded.m_buf_len,
                                                           tunnel.m_rsp_ptr->m_buf_a, AMT_PACKET_SIZE);
-    return status == PUB_ERR_NONE ? amt_handle_finish_rsp(tunnel.m_channel, tunnel.m_rsp_ptr) : status;
+    return status == PUB_ERR_NONE ? amt_reply_finish(tunnel.m_channel, tunnel.m_rsp_ptr) : status;
 }
 
 constexpr amt_at_exchange_st g_tunnel_exchange = {"amt_modem_handle_req", amt_at_trace_en::NONE,
@@ -97,16 +97,15 @@ void encode_request()
 int amt_modem_handle_req(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
     const uint32_t checked_channel = channel == 0 ? AMT_CHANNEL_NONE : channel;
-    if (const int status = AMT_BEGIN_MODEM_REQUEST(checked_channel, req_ptr, rsp_ptr); status != PUB_ERR_NONE)
-    {
+    int status = amt_reply_enter_modem(g_amt_handle_log, checked_channel, req_ptr, rsp_ptr);
+    if (status != PUB_ERR_NONE) {
         return status;
     }
     amt_at_clear();
     amt_handle_clear_buf(&g_raw);
-    if (const int status = amt_convert_req_amt_data_2_at_data(req_ptr->m_buf_a, g_raw.m_buf_a,
-                                                              AMT_PACKET_SIZE, &g_raw.m_buf_len);
-        status != PUB_ERR_NONE)
-    {
+    status = amt_convert_req_amt_data_2_at_data(req_ptr->m_buf_a, g_raw.m_buf_a, AMT_PACKET_SIZE,
+                                                &g_raw.m_buf_len);
+    if (status != PUB_ERR_NONE) {
         pub_log_error(g_amt_handle_log, status);
         return status;
     }

@@ -1,139 +1,239 @@
 #include "amt/amt-handle/request/modem-value.h"
 
+#include <errno.h>
 #include <inttypes.h>
+#include <limits.h>
 #include <stdio.h>
+#include <stdlib.h>
 #include <string.h>
 
 #include "amt/amt-atom.h"
 #include "amt/amt-command.h"
 #include "amt/amt-handle/channel/at-exchange.h"
 #include "amt/amt-handle/channel/at-io.h"
-#include "amt/amt-handle/request/request-frame.h"
+#include "amt/amt-handle/channel/reply.h"
 #include "amt/amt-packet.h"
 #include "pub/error.h"
 #include "pub/file/scan.h"
 
 namespace {
 
-constexpr uint8_t ATOM_TEMPERATURE = 22;
-constexpr uint8_t ATOM_OUTDATE = 27;
-constexpr uint8_t ATOM_BOARD = 38;
-constexpr uint8_t ATOM_CHANNEL = 159;
-constexpr uint8_t RSP_CHANNEL_SWITCH = 233;
+constexpr uint32_t VALUE_LIMIT = 38;
+constexpr uint32_t OUTDATE_LIMIT = 14;
 
-constexpr const char *TEMPERATURE_HANDLER = "amt_modem_handle_temperature";
+/* An erased record of the modem begins with this byte. */
+constexpr char ERASED = '\xFF';
 
 /* Relative to the working directory, which is the root directory in service. */
 constexpr const char *TEMPERATURE_FILE = "sys/class/power_supply/battery/temp";
 
-constexpr uint32_t VALUE_LIMIT_MAX = 38;
-
-/* A text that the modem keeps, and the response it goes into. */
-struct text_request_st
+/* How a value is asked for. */
+struct question_st
 {
     amt_at_exchange_st m_exchange;
     const char *m_command_ptr;
     const char *m_prefix_ptr;
-    uint32_t m_limit;   /* characters, at most VALUE_LIMIT_MAX */
-    bool m_is_erasable; /* a value that begins with 0xFF was never written */
-    uint8_t m_rsp_id;
-    uint8_t m_atom;
+    const char *m_trace_name_ptr; /* of the value in the lines that trace the parse; null: there are none */
+    uint32_t m_limit;             /* characters, at most VALUE_LIMIT */
 };
 
-constexpr text_request_st g_board_request = {
+/* A value, or as much of it as was kept when it is too long. */
+struct value_st
+{
+    int m_status;
+    uint32_t m_length;
+    char m_text_a[VALUE_LIMIT + 1];
+};
+
+constexpr question_st g_board_question = {
     {"amt_modem_handle_read_board", amt_at_trace_en::NONE, AMT_AT_OK, false, nullptr},
     "AT^DMSN\r",
     "\r\n^DMSN:",
-    38,
-    false,
-    AMT_READ_BOARD_RSPCMD,
-    ATOM_BOARD};
-constexpr text_request_st g_outdate_request = {
+    nullptr,
+    VALUE_LIMIT};
+constexpr question_st g_outdate_question = {
     {"amt_modem_handle_read_outdate", amt_at_trace_en::NONE, AMT_AT_OK, false, nullptr},
     "AT^DMFD?\?\r",
     "\r\n^DMFD:",
-    14,
-    true,
-    AMT_READ_OUTDATE_RSPCMD,
-    ATOM_OUTDATE};
+    nullptr,
+    OUTDATE_LIMIT};
+constexpr question_st g_serial_question = {
+    {"amt_read_serial_number", amt_at_trace_en::TEXT, AMT_AT_OK, false, nullptr},
+    "AT^DMSN\r",
+    "\r\n^DMSN:",
+    "serial_number",
+    VALUE_LIMIT};
+constexpr question_st g_support_question = {
+    {"amt_query_amt_support", amt_at_trace_en::TEXT, AMT_AT_OK, false, nullptr},
+    "AT^DMCC?\r",
+    "\r\n^DMCC:",
+    "parameter",
+    VALUE_LIMIT};
+constexpr question_st g_sim_question = {
+    {"amt_dtoc_checkSIM", amt_at_trace_en::TEXT, AMT_AT_OK, false, nullptr},
+    "AT^DTOC\r",
+    "\r\n^DTOC:",
+    "board_a",
+    VALUE_LIMIT};
 
-/* Asks the modem for the text; -100 when its answer has none that can be passed on. */
-int ask_text(const text_request_st &request, char *value)
+/*
+ * Asks the modem. Returns the status of the exchange; that of the value, which some handlers go on reading
+ * when it is too long, is in *value_ptr.
+ */
+int ask(const question_st &question, value_st *value_ptr, int line = __builtin_LINE())
 {
-    amt_at_set_command("%s", request.m_command_ptr);
-    if (const int status = amt_at_exchange(request.m_exchange, nullptr); status != PUB_ERR_NONE) {
+    amt_at_set_command("%s", question.m_command_ptr);
+    if (const int status = amt_at_exchange(question.m_exchange, nullptr, line); status != PUB_ERR_NONE) {
         return status;
     }
-    uint32_t length = 0;
-    int status = amt_at_get_value(request.m_prefix_ptr, request.m_limit, value, &length);
-    if (request.m_is_erasable && value[0] == '\xFF') {
-        status = PUB_ERR_FAIL;
+    const char *const name = question.m_exchange.m_name_ptr;
+    value_ptr->m_status =
+        amt_at_get_value(question.m_prefix_ptr, question.m_limit, value_ptr->m_text_a, &value_ptr->m_length);
+    if (question.m_trace_name_ptr != nullptr) {
+        const char *const head = amt_at_find(question.m_prefix_ptr);
+        PUB_LOG(g_amt_handle_log, "%s head_ptr=%s", name, head == nullptr ? "(null)" : head);
+        PUB_LOG(g_amt_handle_log, "%s %s=%s", name, question.m_trace_name_ptr, value_ptr->m_text_a);
     }
-    if (status != PUB_ERR_NONE) {
-        pub_log_error(g_amt_handle_log, status, request.m_exchange.m_name_ptr);
-    }
-    return status;
-}
-
-int answer_text(const text_request_st &request, uint32_t channel, amt_buf_st *rsp_ptr)
-{
-    char value_a[VALUE_LIMIT_MAX + 1];
-    if (ask_text(request, value_a) != PUB_ERR_NONE) {
-        return amt_reply_failed(channel, rsp_ptr, request.m_rsp_id);
-    }
-    amt_reply_start(rsp_ptr, request.m_rsp_id);
-    amt_packet_add_string(rsp_ptr->m_buf_a, request.m_atom, value_a);
-    return amt_reply_finish_ok(channel, rsp_ptr);
-}
-
-/* Reads the battery driver's number. Returns 0 or -118, errno being the failing call's. */
-int read_temperature(uint32_t *temperature_ptr)
-{
-    const pub_file_st file(TEMPERATURE_FILE, pub_file_mode_en::READ);
-    if (!file.is_open()) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_FILE, TEMPERATURE_HANDLER);
-        PUB_LOG(g_amt_handle_log, "fopen error: errno=%d", errno);
-        return PUB_ERR_FILE;
-    }
-    if (pub_file_scan_unsigned(file, temperature_ptr) != 1) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_FILE, TEMPERATURE_HANDLER);
-        PUB_LOG(g_amt_handle_log, "fscanf error: errno=%d", errno);
-        return PUB_ERR_FILE;
+    if (value_ptr->m_status != PUB_ERR_NONE) {
+        pub_log_error(g_amt_handle_log, value_ptr->m_status, name, line);
     }
     return PUB_ERR_NONE;
+}
+
+/* As atoi; a number out of range becomes the nearest one in it. */
+int32_t get_number(const char *text)
+{
+    const long number = strtol(text, nullptr, 10);
+    return static_cast<int32_t>(number > INT32_MAX ? INT32_MAX : number < INT32_MIN ? INT32_MIN : number);
 }
 
 } // namespace
 
 int amt_modem_handle_read_board(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    if (const int status = AMT_BEGIN_MODEM_REQUEST(channel, req_ptr, rsp_ptr); status != PUB_ERR_NONE) {
+    const int status = amt_reply_enter_modem(g_amt_handle_log, channel, req_ptr, rsp_ptr);
+    if (status != PUB_ERR_NONE) {
         return status;
     }
-    return answer_text(g_board_request, channel, rsp_ptr);
+    value_st value;
+    if (ask(g_board_question, &value) != PUB_ERR_NONE || value.m_status != PUB_ERR_NONE) {
+        return amt_reply_fail(channel, rsp_ptr, AMT_READ_BOARD_RSPCMD);
+    }
+    amt_reply_start(rsp_ptr, AMT_READ_BOARD_RSPCMD);
+    amt_packet_add_string(rsp_ptr->m_buf_a, AMT_ATOM_BOARD, value.m_text_a);
+    return amt_reply_finish_ok(channel, rsp_ptr);
 }
 
 int amt_modem_handle_read_outdate(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    if (const int status = AMT_BEGIN_MODEM_REQUEST(channel, req_ptr, rsp_ptr); status != PUB_ERR_NONE) {
+    const int status = amt_reply_enter_modem(g_amt_handle_log, channel, req_ptr, rsp_ptr);
+    if (status != PUB_ERR_NONE) {
         return status;
     }
-    return answer_text(g_outdate_request, channel, rsp_ptr);
+    value_st value;
+    if (ask(g_outdate_question, &value) != PUB_ERR_NONE || value.m_status != PUB_ERR_NONE) {
+        return amt_reply_fail(channel, rsp_ptr, AMT_READ_OUTDATE_RSPCMD);
+    }
+    if (value.m_text_a[0] == ERASED) {
+        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
+        return amt_reply_fail(channel, rsp_ptr, AMT_READ_OUTDATE_RSPCMD);
+    }
+    amt_reply_start(rsp_ptr, AMT_READ_OUTDATE_RSPCMD);
+    amt_packet_add_string(rsp_ptr->m_buf_a, AMT_ATOM_OUTDATE, value.m_text_a);
+    return amt_reply_finish_ok(channel, rsp_ptr);
+}
+
+int amt_read_serial_number(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
+{
+    const int status = amt_reply_enter_modem(g_amt_handle_log, channel, req_ptr, rsp_ptr);
+    if (status != PUB_ERR_NONE) {
+        return status;
+    }
+    value_st value;
+    if (ask(g_serial_question, &value) != PUB_ERR_NONE || value.m_status != PUB_ERR_NONE) {
+        return amt_reply_fail(channel, rsp_ptr, AMT_READ_SERIAL_NUMBER_RSPCMD);
+    }
+    PUB_LOG(g_amt_handle_log, "get serial-number success. serial-number:[len:%u content:%s]", value.m_length,
+            value.m_text_a);
+    amt_reply_start(rsp_ptr, AMT_READ_SERIAL_NUMBER_RSPCMD);
+    amt_packet_add_bytes(rsp_ptr->m_buf_a, AMT_ATOM_SERIAL_NUMBER,
+                         reinterpret_cast<const uint8_t *>(value.m_text_a),
+                         static_cast<uint16_t>(value.m_length));
+    return amt_reply_finish_ok(channel, rsp_ptr);
+}
+
+int amt_query_amt_support(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
+{
+    const int status = amt_reply_enter_modem(g_amt_handle_log, channel, req_ptr, rsp_ptr);
+    if (status != PUB_ERR_NONE) {
+        return status;
+    }
+    value_st value;
+    if (ask(g_support_question, &value) != PUB_ERR_NONE) {
+        return amt_reply_fail(channel, rsp_ptr, AMT_NORMAL_TO_AMT_SUPPORT_RSPCMD);
+    }
+    char *rest = nullptr;
+    const char *field = nullptr;
+    for (const char *const name : {"sim_num", "standby_num", "rf_set_num", "standby0_rat"}) {
+        field = strtok_r(field == nullptr ? value.m_text_a : nullptr, ",", &rest);
+        if (field == nullptr) {
+            pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
+            PUB_LOG(g_amt_handle_log, "%s is null!!!", name);
+            return amt_reply_fail(channel, rsp_ptr, AMT_NORMAL_TO_AMT_SUPPORT_RSPCMD);
+        }
+    }
+    const int32_t standby0_rat = get_number(field);
+    PUB_LOG(g_amt_handle_log, "getted nstandby0_rat:%d.", standby0_rat);
+    if (value.m_status != PUB_ERR_NONE) {
+        return amt_reply_fail(channel, rsp_ptr, AMT_NORMAL_TO_AMT_SUPPORT_RSPCMD);
+    }
+    amt_reply_start(rsp_ptr, AMT_NORMAL_TO_AMT_SUPPORT_RSPCMD);
+    amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_STANDBY0_RAT, standby0_rat);
+    return amt_reply_finish_ok(channel, rsp_ptr);
+}
+
+int amt_dtoc_checkSIM(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
+{
+    const int status = amt_reply_enter_modem(g_amt_handle_log, channel, req_ptr, rsp_ptr);
+    if (status != PUB_ERR_NONE) {
+        return status;
+    }
+    value_st value;
+    if (ask(g_sim_question, &value) != PUB_ERR_NONE) {
+        return amt_reply_fail(channel, rsp_ptr, AMT_USIMCHECK_RSPCMD);
+    }
+    const int32_t sim_type = get_number(value.m_text_a);
+    PUB_LOG(g_amt_handle_log, "amt_dtoc_checkSIM simtype=%d", sim_type);
+    if (value.m_status != PUB_ERR_NONE) {
+        return amt_reply_fail(channel, rsp_ptr, AMT_USIMCHECK_RSPCMD);
+    }
+    amt_reply_start(rsp_ptr, AMT_USIMCHECK_RSPCMD);
+    amt_packet_add_bool(rsp_ptr->m_buf_a, AMT_ATOM_SIM_CHECK, sim_type == 1 || sim_type == 2);
+    return amt_reply_finish(channel, rsp_ptr);
 }
 
 int amt_modem_handle_temperature(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    if (const int status = AMT_BEGIN_REQUEST(channel, req_ptr, rsp_ptr); status != PUB_ERR_NONE) {
+    const int status = amt_reply_enter(g_amt_handle_log, channel, req_ptr, rsp_ptr);
+    if (status != PUB_ERR_NONE) {
         return status;
     }
     amt_at_clear();
+    const pub_file_st file(TEMPERATURE_FILE, pub_file_mode_en::READ);
+    if (!file.is_open()) {
+        pub_log_error(g_amt_handle_log, PUB_ERR_FILE);
+        PUB_LOG(g_amt_handle_log, "fopen error: errno=%d", errno);
+        return amt_reply_fail(channel, rsp_ptr, AMT_TEMPERATURE_RSPCMD);
+    }
     uint32_t temperature = 0;
-    if (read_temperature(&temperature) != PUB_ERR_NONE) {
-        return amt_reply_failed(channel, rsp_ptr, AMT_TEMPERATURE_RSPCMD);
+    if (pub_file_scan_unsigned(file, &temperature) != 1) {
+        pub_log_error(g_amt_handle_log, PUB_ERR_FILE);
+        PUB_LOG(g_amt_handle_log, "fscanf error: errno=%d", errno);
+        return amt_reply_fail(channel, rsp_ptr, AMT_TEMPERATURE_RSPCMD);
     }
     PUB_LOG(g_amt_handle_log, "Battery temperature: %u", temperature);
     amt_reply_start(rsp_ptr, AMT_TEMPERATURE_RSPCMD);
-    amt_packet_add_int(rsp_ptr->m_buf_a, ATOM_TEMPERATURE, static_cast<int32_t>(temperature));
+    amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_TEMPERATURE, static_cast<int32_t>(temperature));
     return amt_reply_finish_ok(channel, rsp_ptr);
 }
 
@@ -144,13 +244,13 @@ int amt_channel_switch(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_pt
     constexpr uint32_t command_length = 12;
 
     pub_log_entry(g_amt_handle_log);
-    if (const int status = amt_handle_check_modem(); status != PUB_ERR_NONE) {
+    if (const int status = amt_reply_check_modem(g_amt_handle_log); status != PUB_ERR_NONE) {
         return status;
     }
-    amt_reply_start(rsp_ptr, RSP_CHANNEL_SWITCH);
+    amt_reply_start(rsp_ptr, AMT_SWITCH_CHANNEL_RSPCMD);
     char text_a[text_size + 1] = {};
     snprintf(text_a, sizeof(text_a), "AT^DMPCHN=%" PRId32 "\r",
-             amt_packet_get_int(req_ptr->m_buf_a, ATOM_CHANNEL));
+             amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_MODEM_CHANNEL));
     if (const int status = write_at(text_a, command_length); status != PUB_ERR_NONE) {
         pub_log_error(g_amt_handle_log, status);
         return status;

@@ -18,7 +18,7 @@ constexpr amt_at_exchange_st g_version_exchange = {"get_l1_hls_version", amt_at_
 
 /*
  * Where the hexadecimal text ends. The end marker is looked for in the whole value and at any offset, between
- * two digit pairs too: the modems' versions have always been cut so.
+ * two digit pairs too: stations compare with versions that were cut so.
  */
 size_t find_end(std::string_view value)
 {
@@ -71,6 +71,7 @@ uint32_t decode_hex(std::string_view text, uint8_t *out)
 
 int get_l1_hls_version(int32_t type, uint8_t *version, uint32_t *length_ptr)
 {
+    pub_log_entry(g_amt_handle_log);
     memset(version, 0, AMT_MODEM_VERSION_SIZE);
     *length_ptr = 0;
     amt_at_set_command("AT^DCMR=%d\r", type);

@@ -1,13 +1,13 @@
 #include "amt/amt-handle/request/result-file.h"
 
 #include <errno.h>
-#include <stdio.h>
 #include <stdlib.h>
 #include <string.h>
 #include <unistd.h>
 
 #include "amt/amt-log.h"
 #include "pub/error.h"
+#include "pub/file/file.h"
 #include "pub/log/print.h"
 
 namespace {
@@ -23,45 +23,46 @@ void log_failure(const char *call, const char *path)
     PUB_LOG(g_amt_handle_log, "%s(%s) failure. errorr: %d - %s", call, path, errno, strerror(errno));
 }
 
-FILE *open_file(const char *func, const char *path, const char *mode)
+int fail_access(const char *call, const char *path, const char *func = __builtin_FUNCTION(),
+                int line = __builtin_LINE())
 {
-    FILE *const stream = fopen(path, mode);
-    if (stream == nullptr) {
-        pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_ACCESS, func);
-        log_failure("open file", path);
-    }
-    return stream;
+    pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_ACCESS, func, line);
+    log_failure(call, path);
+    return AMT_RESULT_FILE_ERR_ACCESS;
 }
 
-/* Seeks to an item. A negative index, before the start of any file, fails and leaves the stream where it is.
- */
-int seek_item(FILE *stream, int32_t index)
+/* Seeks to an item. A negative index, before the start of any file, fails and leaves the file where it is. */
+int seek_item(const pub_file_st &file, int32_t index)
 {
-    return fseek(stream, index < 0 ? -1L : 2L * index, SEEK_SET);
+    return fseek(file.m_stream_ptr, index < 0 ? -1L : 2L * index, SEEK_SET);
 }
 
-char get_digit(int32_t verdict)
+const char *get_digit(int32_t verdict)
 {
     if (verdict == VERDICT_PASS) {
-        return '1';
+        return "1";
     }
     pub_print("[TEST_RESULT] update item for %s", verdict == VERDICT_FAIL ? "TEST_FAIL" : "TEST_UNKNOWN");
-    return verdict == VERDICT_FAIL ? '2' : '0';
+    return verdict == VERDICT_FAIL ? "2" : "0";
 }
 
-int check_index(const char *func, int32_t index, int32_t count)
+int check_index(int32_t index, int32_t count, const char *func = __builtin_FUNCTION(),
+                int line = __builtin_LINE())
 {
     if (index < count) {
         return PUB_ERR_NONE;
     }
-    pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_ITEM, func);
+    pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_ITEM, func, line);
     PUB_LOG(g_amt_handle_log, "item index error: %d\n", index);
     return AMT_RESULT_FILE_ERR_ITEM;
 }
 
-int save_result(const char *func, const char *path, int32_t count, int32_t index, int32_t verdict)
+/* Stores a verdict for the operation that calls this. */
+int save_result(const char *path, int32_t count, int32_t index, int32_t verdict,
+                const char *func = __builtin_FUNCTION())
 {
-    if (check_index(func, index, count) != PUB_ERR_NONE) {
+    pub_log_entry(g_amt_handle_log, func);
+    if (check_index(index, count, func) != PUB_ERR_NONE) {
         return AMT_RESULT_FILE_ERR_ITEM;
     }
     if (access(FOLDER, R_OK | W_OK) != 0) {
@@ -82,27 +83,6 @@ int save_result(const char *func, const char *path, int32_t count, int32_t index
     return PUB_ERR_NONE;
 }
 
-/* The digit at an item of an open file; 0 at its end. Returns a digit or -1. */
-int read_item(FILE *stream, int32_t index)
-{
-    if (seek_item(stream, index) != 0) {
-        pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_ACCESS, "readProductResult");
-        PUB_LOG(g_amt_handle_log, "call fseek failure. errorr: %d - %s", errno, strerror(errno));
-        return AMT_RESULT_FILE_ERR_ACCESS;
-    }
-    char text_a[2] = {};
-    if (fgets(text_a, sizeof(text_a), stream) != nullptr) {
-        PUB_LOG(g_amt_handle_log, "itemIndex = %d, buf= %s\n", index, text_a);
-        return atoi(text_a);
-    }
-    if (ferror(stream) != 0) {
-        pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_ACCESS, "readProductResult");
-        PUB_LOG(g_amt_handle_log, "call fgets error. errorr: %d - %s", errno, strerror(errno));
-        return AMT_RESULT_FILE_ERR_ACCESS;
-    }
-    return 0;
-}
-
 } // namespace
 
 int initTestFile(const char *path, int32_t count)
@@ -114,59 +94,51 @@ int initTestFile(const char *path, int32_t count)
         return AMT_RESULT_FILE_ERR_ACCESS;
     }
     PUB_LOG(g_amt_handle_log, "initTestFile . path:%s; count: %d\n", path, count);
-    FILE *const stream = open_file(__func__, path, "w");
-    if (stream == nullptr) {
-        return AMT_RESULT_FILE_ERR_ACCESS;
+    const pub_file_st file(path, pub_file_mode_en::WRITE);
+    if (!file.is_open()) {
+        return fail_access("open file", path);
     }
     for (int32_t i = 0; i < count; i++) {
-        fputs("0\n", stream);
+        fputs("0\n", file.m_stream_ptr);
     }
-    fclose(stream);
     return PUB_ERR_NONE;
 }
 
 int updateTestItem(const char *path, int32_t index, int32_t verdict)
 {
     pub_log_entry(g_amt_handle_log);
-    FILE *const stream = open_file(__func__, path, "r+");
-    if (stream == nullptr) {
-        return AMT_RESULT_FILE_ERR_ACCESS;
+    const pub_file_st file(path, pub_file_mode_en::UPDATE);
+    if (!file.is_open()) {
+        return fail_access("open file", path);
     }
-    seek_item(stream, index);
-    const char digit = get_digit(verdict);
-    /* Flushed here: behind the C library's buffer a failed write would go unseen. */
-    const bool is_written = fputc(digit, stream) != EOF && fflush(stream) == 0;
-    if (is_written) {
-        PUB_LOG(g_amt_handle_log, "write item [%d], result= %c\n", index, digit);
-    } else {
+    seek_item(file, index);
+    const char *const digit = get_digit(verdict);
+    if (!pub_file_put(file, digit)) {
         pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_WRITE);
+        return AMT_RESULT_FILE_ERR_WRITE;
     }
-    fclose(stream);
-    return is_written ? PUB_ERR_NONE : AMT_RESULT_FILE_ERR_WRITE;
+    PUB_LOG(g_amt_handle_log, "write item [%d], result= %s\n", index, digit);
+    return PUB_ERR_NONE;
 }
 
 int saveAmtResult(int32_t index, int32_t verdict)
 {
-    pub_log_entry(g_amt_handle_log);
-    return save_result(__func__, AMT_RESULT_FILE, AMT_RESULT_COUNT, index, verdict);
+    return save_result(AMT_RESULT_FILE, AMT_RESULT_COUNT, index, verdict);
 }
 
 int saveProductResult(int32_t index, int32_t verdict)
 {
-    pub_log_entry(g_amt_handle_log);
-    return save_result(__func__, AMT_PRODUCT_FILE, AMT_PRODUCT_COUNT, index, verdict);
+    return save_result(AMT_PRODUCT_FILE, AMT_PRODUCT_COUNT, index, verdict);
 }
 
 int readProductResult(int32_t index)
 {
     pub_log_entry(g_amt_handle_log);
-    if (check_index(__func__, index, AMT_PRODUCT_COUNT) != PUB_ERR_NONE) {
+    if (check_index(index, AMT_PRODUCT_COUNT) != PUB_ERR_NONE) {
         return AMT_RESULT_FILE_ERR_ITEM;
     }
     if (access(FOLDER, R_OK) != 0) {
-        pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_ACCESS);
-        log_failure("access folder", FOLDER);
-        return AMT_RESULT_FILE_ERR_ACCESS;
+        return fail_access("access folder", FOLDER);
     }
     if (access(AMT_PRODUCT_FILE, F_OK) != 0) {
         log_failure("access file", AMT_PRODUCT_FILE);
@@ -176,11 +148,24 @@ int readProductResult(int32_t index)
             return AMT_RESULT_FILE_ERR_WRITE;
         }
     }
-    FILE *const stream = open_file(__func__, AMT_PRODUCT_FILE, "r");
-    if (stream == nullptr) {
+    const pub_file_st file(AMT_PRODUCT_FILE, pub_file_mode_en::READ);
+    if (!file.is_open()) {
+        return fail_access("open file", AMT_PRODUCT_FILE);
+    }
+    if (seek_item(file, index) != 0) {
+        pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_ACCESS);
+        PUB_LOG(g_amt_handle_log, "call fseek failure. errorr: %d - %s", errno, strerror(errno));
         return AMT_RESULT_FILE_ERR_ACCESS;
     }
-    const int digit = read_item(stream, index);
-    fclose(stream);
-    return digit;
+    char text_a[2] = {};
+    if (pub_file_get_line(file, text_a, sizeof(text_a)) > 0) {
+        PUB_LOG(g_amt_handle_log, "itemIndex = %d, buf= %s\n", index, text_a);
+        return atoi(text_a);
+    }
+    if (ferror(file.m_stream_ptr) != 0) {
+        pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_ACCESS);
+        PUB_LOG(g_amt_handle_log, "call fgets error. errorr: %d - %s", errno, strerror(errno));
+        return AMT_RESULT_FILE_ERR_ACCESS;
+    }
+    return 0;
 }

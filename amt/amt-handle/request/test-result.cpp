@@ -3,9 +3,10 @@
 #include <string.h>
 #include <string_view>
 
+#include "amt/amt-atom.h"
 #include "amt/amt-command.h"
 #include "amt/amt-handle/channel/at-exchange.h"
-#include "amt/amt-handle/request/request-frame.h"
+#include "amt/amt-handle/channel/reply.h"
 #include "amt/amt-handle/request/result-file.h"
 #include "amt/amt-handle/request/station-result.h"
 #include "amt/amt-packet.h"
@@ -13,12 +14,6 @@
 #include "pub/log/print.h"
 
 namespace {
-
-constexpr uint8_t ATOM_VERDICT = 36;
-constexpr uint8_t ATOM_DESCRIPTION = 37;
-constexpr uint8_t ATOM_STATION = 39;
-constexpr uint8_t RSP_ITEM_READ = 229;
-constexpr uint8_t RSP_ITEM_WRITE = 231;
 
 constexpr int32_t VERDICT_MAX = 2;
 constexpr const char *PROGRAM = "vx-kel-amt";
@@ -32,7 +27,7 @@ constexpr amt_at_exchange_st g_read_exchange = {"amt_modem_read_test_result", am
 
 /* Stores what the modem keeps in the factory file too. Whether that works is logged and changes nothing else.
  */
-void mirror_verdict(int32_t station_num, int32_t verdict, bool is_status_logged)
+void mirror_verdict(int32_t station_num, int32_t verdict, bool is_status_logged, int line = __builtin_LINE())
 {
     const int status = saveAmtResult(station_num, verdict);
     if (status == PUB_ERR_NONE) {
@@ -40,10 +35,10 @@ void mirror_verdict(int32_t station_num, int32_t verdict, bool is_status_logged)
                 station_num, verdict);
     } else if (is_status_logged) {
         PUB_LOG(g_amt_handle_log, "[%s:L%d] write fail amt station_num: %d, station_result: %d. rtn:%d.\n",
-                PROGRAM, __LINE__, station_num, verdict, status);
+                PROGRAM, line, station_num, verdict, status);
     } else {
         PUB_LOG(g_amt_handle_log, "[%s:L%d] write fail amt station_num: %d, station_result: %d\n", PROGRAM,
-                __LINE__, station_num, verdict);
+                line, station_num, verdict);
     }
 }
 
@@ -68,7 +63,7 @@ int read_answer(void *context)
 }
 
 /* Shows a command about to be sent. */
-void log_command(const char *name)
+void log_command(const char *name = __builtin_FUNCTION())
 {
     PUB_LOG(g_amt_handle_log, "%s m_buf_a[%s] m_buf_len[%d]", name, g_at_transmit.m_text_a,
             static_cast<int>(g_at_transmit.m_len));
@@ -78,14 +73,15 @@ void log_command(const char *name)
 
 int amt_modem_write_test_result(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    if (const int status = AMT_BEGIN_MODEM_REQUEST(channel, req_ptr, rsp_ptr); status != PUB_ERR_NONE) {
+    int status = amt_reply_enter_modem(g_amt_handle_log, channel, req_ptr, rsp_ptr);
+    if (status != PUB_ERR_NONE) {
         return status;
     }
     const uint8_t *const packet = req_ptr->m_buf_a;
-    const int32_t station_num = amt_packet_get_int(packet, ATOM_STATION);
-    const int32_t verdict = amt_packet_get_int(packet, ATOM_VERDICT);
+    const int32_t station_num = amt_packet_get_int(packet, AMT_ATOM_STATION);
+    const int32_t verdict = amt_packet_get_int(packet, AMT_ATOM_VERDICT);
     char description_a[AMT_REQUEST_DESCRIPTION_SIZE] = {};
-    amt_packet_get_string(packet, ATOM_DESCRIPTION, description_a, sizeof(description_a));
+    amt_packet_get_string(packet, AMT_ATOM_DESCRIPTION, description_a, sizeof(description_a));
     description_a[sizeof(description_a) - 1] = '\0';
     mirror_verdict(station_num, verdict, false);
     if (description_a[0] != '\0') {
@@ -93,11 +89,11 @@ int amt_modem_write_test_result(uint32_t channel, amt_buf_st *req_ptr, amt_buf_s
     } else {
         amt_at_set_command("AT^DATOMW=%d,%d\r", station_num, verdict);
     }
-    log_command(__func__);
-    const int status = amt_at_exchange(g_write_exchange, nullptr);
+    log_command();
+    status = amt_at_exchange(g_write_exchange, nullptr);
     PUB_LOG(g_amt_handle_log, "amt_modem_write_test_result\tret_val[%d]", status);
     if (status != PUB_ERR_NONE) {
-        return amt_reply_failed(channel, rsp_ptr, AMT_WRITE_TEST_RESULT_RSPCMD);
+        return amt_reply_fail(channel, rsp_ptr, AMT_WRITE_TEST_RESULT_RSPCMD);
     }
     amt_reply_start(rsp_ptr, AMT_WRITE_TEST_RESULT_RSPCMD);
     return amt_reply_finish_ok(channel, rsp_ptr);
@@ -105,32 +101,33 @@ int amt_modem_write_test_result(uint32_t channel, amt_buf_st *req_ptr, amt_buf_s
 
 int amt_modem_read_test_result(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    if (const int status = AMT_BEGIN_MODEM_REQUEST(channel, req_ptr, rsp_ptr); status != PUB_ERR_NONE) {
+    int status = amt_reply_enter_modem(g_amt_handle_log, channel, req_ptr, rsp_ptr);
+    if (status != PUB_ERR_NONE) {
         return status;
     }
     amt_station_result_st result = {};
-    result.m_station_num = amt_packet_get_int(req_ptr->m_buf_a, ATOM_STATION);
+    result.m_station_num = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_STATION);
     amt_at_set_command("AT^DATOMR=1,%d\r", result.m_station_num);
-    log_command(__func__);
-    const int status = amt_at_exchange(g_read_exchange, &result);
+    log_command();
+    status = amt_at_exchange(g_read_exchange, &result);
     PUB_LOG(g_amt_handle_log, "amt_modem_read_test_result ret_val[%d] station_num[%d] station_result[%d]",
             status, result.m_station_num, result.m_verdict);
     if (status != PUB_ERR_NONE) {
-        return amt_reply_failed(channel, rsp_ptr, AMT_READ_TEST_RESULT_RSPCMD);
+        return amt_reply_fail(channel, rsp_ptr, AMT_READ_TEST_RESULT_RSPCMD);
     }
     mirror_verdict(result.m_station_num, result.m_verdict, true);
     amt_reply_start(rsp_ptr, AMT_READ_TEST_RESULT_RSPCMD);
-    amt_packet_add_int(rsp_ptr->m_buf_a, ATOM_STATION, result.m_station_num);
-    amt_packet_add_int(rsp_ptr->m_buf_a, ATOM_VERDICT, result.m_verdict);
-    amt_packet_add_string(rsp_ptr->m_buf_a, ATOM_DESCRIPTION, result.m_description_a);
+    amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_STATION, result.m_station_num);
+    amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_VERDICT, result.m_verdict);
+    amt_packet_add_string(rsp_ptr->m_buf_a, AMT_ATOM_DESCRIPTION, result.m_description_a);
     return amt_reply_finish_ok(channel, rsp_ptr);
 }
 
 int amt_modem_write_pc_test_result(uint32_t, amt_buf_st *req_ptr, amt_buf_st *)
 {
     pub_log_entry(g_amt_handle_log);
-    const int32_t station_num = amt_packet_get_int(req_ptr->m_buf_a, ATOM_STATION);
-    const int32_t verdict = amt_packet_get_int(req_ptr->m_buf_a, ATOM_VERDICT);
+    const int32_t station_num = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_STATION);
+    const int32_t verdict = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_VERDICT);
     PUB_LOG(g_amt_handle_log, "amt_modem_write_pc_test_result station_num=%d,station_result=%d", station_num,
             verdict);
     mirror_verdict(station_num, verdict, false);
@@ -139,14 +136,14 @@ int amt_modem_write_pc_test_result(uint32_t, amt_buf_st *req_ptr, amt_buf_st *)
 
 int amt_item_write_test_result(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    if (const int status = AMT_BEGIN_REQUEST(channel, req_ptr, rsp_ptr); status != PUB_ERR_NONE) {
+    int status = amt_reply_enter(g_amt_handle_log, channel, req_ptr, rsp_ptr);
+    if (status != PUB_ERR_NONE) {
         return status;
     }
-    const int32_t station_num = amt_packet_get_int(req_ptr->m_buf_a, ATOM_STATION);
-    const int32_t verdict = amt_packet_get_int(req_ptr->m_buf_a, ATOM_VERDICT);
+    const int32_t station_num = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_STATION);
+    const int32_t verdict = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_VERDICT);
     PUB_LOG(g_amt_handle_log, "amt_item_write_test_result station_num[%d] station_result[%d]", station_num,
             verdict);
-    int status = PUB_ERR_NONE;
     /* The item before the number is written; the read below takes the number itself. Wraps as a 32-bit number
      * does. */
     if (saveProductResult(static_cast<int32_t>(static_cast<uint32_t>(station_num) - 1U), verdict) !=
@@ -158,31 +155,32 @@ int amt_item_write_test_result(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st
     }
     PUB_LOG(g_amt_handle_log, "amt_item_write_test_result write_item ret_val[%d]", status);
     if (status != PUB_ERR_NONE) {
-        return amt_reply_failed(channel, rsp_ptr, RSP_ITEM_WRITE);
+        return amt_reply_fail(channel, rsp_ptr, AMT_WRITE_ITEM_RESULT_RSPCMD);
     }
-    amt_reply_start(rsp_ptr, RSP_ITEM_WRITE);
+    amt_reply_start(rsp_ptr, AMT_WRITE_ITEM_RESULT_RSPCMD);
     return amt_reply_finish_ok(channel, rsp_ptr);
 }
 
 int amt_item_read_test_result(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    if (const int status = AMT_BEGIN_REQUEST(channel, req_ptr, rsp_ptr); status != PUB_ERR_NONE) {
+    int status = amt_reply_enter(g_amt_handle_log, channel, req_ptr, rsp_ptr);
+    if (status != PUB_ERR_NONE) {
         return status;
     }
-    const int32_t station_num = amt_packet_get_int(req_ptr->m_buf_a, ATOM_STATION);
+    const int32_t station_num = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_STATION);
     const int verdict = readProductResult(station_num);
     PUB_LOG(g_amt_handle_log, "amt_item_read_test_result station_num[%d] station_result[%d]", station_num,
             verdict);
-    const int status = verdict < 0 || verdict > VERDICT_MAX ? PUB_ERR_NOT_FOUND : PUB_ERR_NONE;
+    status = verdict < 0 || verdict > VERDICT_MAX ? PUB_ERR_NOT_FOUND : PUB_ERR_NONE;
     if (status != PUB_ERR_NONE) {
         pub_log_error(g_amt_handle_log, status);
     }
     PUB_LOG(g_amt_handle_log, "amt_item_read_test_result read_item ret_val[%d]", status);
     if (status != PUB_ERR_NONE) {
-        return amt_reply_failed(channel, rsp_ptr, RSP_ITEM_READ);
+        return amt_reply_fail(channel, rsp_ptr, AMT_READ_ITEM_RESULT_RSPCMD);
     }
-    amt_reply_start(rsp_ptr, RSP_ITEM_READ);
-    amt_packet_add_int(rsp_ptr->m_buf_a, ATOM_STATION, station_num);
-    amt_packet_add_int(rsp_ptr->m_buf_a, ATOM_VERDICT, verdict);
+    amt_reply_start(rsp_ptr, AMT_READ_ITEM_RESULT_RSPCMD);
+    amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_STATION, station_num);
+    amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_VERDICT, verdict);
     return amt_reply_finish_ok(channel, rsp_ptr);
 }

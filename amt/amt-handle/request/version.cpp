@@ -1,16 +1,14 @@
 #include "amt/amt-handle/request/version.h"
 
+#include "amt/amt-atom.h"
 #include "amt/amt-command.h"
-#include "amt/amt-handle/channel/context.h"
+#include "amt/amt-handle/channel/reply.h"
+#include "amt/amt-handle/request/ap-version.h"
 #include "amt/amt-handle/request/modem-version.h"
-#include "amt/amt-handle/request/request-frame.h"
 #include "amt/amt-packet.h"
 #include "pub/error.h"
 
 namespace {
-
-constexpr uint8_t ATOM_VERSION = 18;
-constexpr uint8_t ATOM_TYPE = 19;
 
 /* Stations compare all 64 bytes. */
 constexpr char g_fixed_version_a[] = "\rAndroid4.2,2013-01-21"
@@ -62,7 +60,7 @@ const module_st &find_module(int32_t type)
 /* Reads the wanted module from the request and logs it. */
 int32_t get_type(const amt_buf_st *req_ptr)
 {
-    const int32_t type = amt_packet_get_int(req_ptr->m_buf_a, ATOM_TYPE);
+    const int32_t type = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_MODULE);
     PUB_LOG(g_amt_handle_log, "version type: 0x%02x - %s", static_cast<unsigned int>(type),
             find_module(type).m_name_ptr);
     return type;
@@ -71,19 +69,20 @@ int32_t get_type(const amt_buf_st *req_ptr)
 void start_version(amt_buf_st *rsp_ptr, int32_t type)
 {
     amt_reply_start(rsp_ptr, AMT_VERSION_RSPCMD);
-    amt_packet_add_int(rsp_ptr->m_buf_a, ATOM_TYPE, type);
+    amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_MODULE, type);
 }
 
 void add_version(amt_buf_st *rsp_ptr, const void *version, uint32_t length)
 {
-    amt_packet_add_bytes(rsp_ptr->m_buf_a, ATOM_VERSION, static_cast<const uint8_t *>(version),
+    amt_packet_add_bytes(rsp_ptr->m_buf_a, AMT_ATOM_VERSION, static_cast<const uint8_t *>(version),
                          static_cast<uint16_t>(length));
 }
 
-void log_unknown_type(int line, const char *func, int32_t type)
+int fail_unknown_type(int32_t type, const char *func = __builtin_FUNCTION(), int line = __builtin_LINE())
 {
     pub_log_error(g_amt_handle_log, PUB_ERR_FAIL, func, line);
     PUB_LOG(g_amt_handle_log, "unknown version type: 0x%02x", static_cast<unsigned int>(type));
+    return PUB_ERR_FAIL;
 }
 
 } // namespace
@@ -95,14 +94,14 @@ const char *amt_version_module_name(int32_t type)
 
 int handle_amt_req_version(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    if (const int status = AMT_BEGIN_MODEM_REQUEST(channel, req_ptr, rsp_ptr); status != PUB_ERR_NONE) {
+    int status = amt_reply_enter_modem(g_amt_handle_log, channel, req_ptr, rsp_ptr);
+    if (status != PUB_ERR_NONE) {
         return status;
     }
     const int32_t type = get_type(req_ptr);
     const source_en source = find_module(type).m_app_source;
     if (source == source_en::NONE) {
-        log_unknown_type(__LINE__, __func__, type);
-        return PUB_ERR_FAIL;
+        return fail_unknown_type(type);
     }
     if (source == source_en::MODEM) {
         return handle_amt_req_l1_hls_version(channel, type, req_ptr, rsp_ptr);
@@ -140,7 +139,8 @@ int handle_amt_req_l1_hls_version(uint32_t channel, int32_t type, amt_buf_st *re
 
 int handle_amt_pc_req_version(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    if (const int status = AMT_BEGIN_REQUEST(channel, req_ptr, rsp_ptr); status != PUB_ERR_NONE) {
+    int status = amt_reply_enter(g_amt_handle_log, channel, req_ptr, rsp_ptr);
+    if (status != PUB_ERR_NONE) {
         return status;
     }
     const int32_t type = get_type(req_ptr);
@@ -149,18 +149,17 @@ int handle_amt_pc_req_version(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st 
         return PUB_ERR_NOT_FOUND;
     }
     if (source == source_en::NONE) {
-        log_unknown_type(__LINE__, __func__, type);
-        return PUB_ERR_FAIL;
+        return fail_unknown_type(type);
     }
     /* An acknowledgement that cannot be sent does not keep the answer back. */
     amt_handle_send_pre_rsp_for_pc(channel, rsp_ptr);
     start_version(rsp_ptr, type);
     if (source == source_en::FIXED) {
         add_version(rsp_ptr, g_fixed_version_a, FIXED_VERSION_LENGTH);
-    } else if (const int status = set_ap_sw_version_rsp(rsp_ptr); status != PUB_ERR_NONE) {
-        return status;
+    } else {
+        status = set_ap_sw_version_rsp(rsp_ptr);
     }
-    return amt_reply_finish_ok(channel, rsp_ptr);
+    return status != PUB_ERR_NONE ? status : amt_reply_finish_ok(channel, rsp_ptr);
 }
 
 int set_ap_sw_version_rsp(amt_buf_st *rsp_ptr)
