@@ -186,12 +186,3 @@ int amt_handle_send_pre_rsp_for_pc(uint32_t channel, amt_buf_st *rsp_ptr)
     rsp_ptr->m_buf_len = sizeof(g_pre_rsp_a);
     return amt_handle_send_rsp(channel, rsp_ptr);
 }
-
-/* The check alone, for handlers that log their entry line themselves: until the last of them has moved. */
-int amt_handle_check_request(const pub_log_source_st &source, int line, const char *func, uint32_t channel,
-                             const amt_buf_st *req_ptr, const amt_buf_st *rsp_ptr);
-int amt_handle_check_request(const pub_log_source_st &source, int line, const char *func, uint32_t channel,
-                             const amt_buf_st *req_ptr, const amt_buf_st *rsp_ptr)
-{
-    return amt_reply_check(source, channel, req_ptr, rsp_ptr, func, line);
-}

@@ -271,8 +271,7 @@ int amt_channel_switch(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_pt
 
 int amt_at_to_modem(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    pub_log_entry(g_amt_device_log);
-    if (AMT_CHECK_REQUEST(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+    if (amt_reply_enter(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
     if (amt_packet_get_cmd(req_ptr->m_buf_a) != AMT_SWITCH_CHANNEL_CMD) {
