@@ -6,7 +6,7 @@ from typing import Callable, Mapping
 import pytest
 
 from amt_simulator import Handset
-from amt_simulator.root import Content
+from amt_simulator.tree import Content
 from support.trace import Trace, error_line
 
 BT_FOLDER = "/amt/BT"

@@ -18,8 +18,6 @@
 
 namespace {
 
-constexpr int HANDSHAKE_NOT_PERMITTED = 0;
-
 constexpr const char *SWITCH_PROPERTY = "amt.normal.amt.switch_status";
 constexpr const char *USB_PROPERTY = "sys.usb.config";
 constexpr const char *USB_UNSET = "@#no_set_config#@"; /* holds no function that could be looked for */
@@ -137,7 +135,8 @@ int amt_handle_not_permit_handshake(uint32_t channel, amt_buf_st *req_ptr, amt_b
         return PUB_ERR_PARAM;
     }
     int flag = 0;
-    if (const int status = handle_amt_damt1_operation(HANDSHAKE_NOT_PERMITTED, &flag); status != PUB_ERR_NONE)
+    if (const int status = handle_amt_damt1_operation(static_cast<int>(amt_permission_en::FORBID), &flag);
+        status != PUB_ERR_NONE)
     {
         return status;
     }
