@@ -6,12 +6,10 @@ import time
 from conftest import HandsetFactory
 from amt_simulator import Handset
 from amt_simulator.waiting import scaled
-from support.channels import PcChannel, integer, packet
+from support.channels import ERROR, OK, PcChannel, integer, packet
 from support.moments import Patience
 from support.trace import Trace, error_line
 
-OK = "\r\nOK\r\n"
-ERROR = "\r\nERROR\r\n"
 CME = "\r\n+CME ERROR: 100\r\n"
 PERMISSION = "/amt/power_usb_amt.txt"
 EMMC = "/sys/devinfo/emmc_info"

@@ -8,6 +8,7 @@ from conftest import HandsetFactory
 from amt_simulator import Handset
 from amt_simulator.waiting import scaled
 from support.channels import AppChannel, integer, packet, string
+from support.modem_desk import OK
 from support.trace import Trace, error_line
 
 SILENCE = b"AT^DLKS=0\r"
@@ -17,7 +18,6 @@ ANSWER = b"\r\n^DMSN: 77\r\n\r\nOK\r\n"
 BOARD = packet(86, string(38, "77"), integer(1, 0))
 FAILED = packet(86, integer(1, 10))
 READER = "amt_handle_read_app_loop()"
-OK = b"\r\nOK\r\n"
 EIO = 5
 OPENED = 'open device "/dev/ttyMUX0" successfully'
 

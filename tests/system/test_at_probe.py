@@ -4,10 +4,9 @@ import re
 
 from conftest import HandsetFactory
 from amt_simulator import Handset
-from support.channels import PcChannel
+from support.channels import OK, PcChannel
 from support.traffic import MODEM_OUT, PC_IN, PcTrace, dump
 
-OK = "\r\nOK\r\n"
 REWRITTEN = b"AT;^DLKS=1\r"
 CHARGER = "amt_usb_charger_enable(1) = 0"
 SPEEDS = {"vx.tty.modem": "/dev/ttyS1", "vx.modem.uart.amt.default.baudrate": "460800",

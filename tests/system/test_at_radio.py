@@ -1,10 +1,7 @@
 """AT commands of the PC line that drive the radio test library: each reply, each call."""
 
-from support.channels import PcChannel
+from support.channels import ERROR, OK, PcChannel
 from support.trace import Trace, error_line
-
-OK = "\r\nOK\r\n"
-ERROR = "\r\nERROR\r\n"
 
 
 def gps_value(satellite: int, cnr: int) -> str:

@@ -3,12 +3,10 @@
 from conftest import HandsetFactory
 from amt_simulator import Handset
 from amt_station import wire
-from support.channels import PcChannel, flag, integer, packet, string
+from support.channels import ACK, OK, PcChannel, flag, integer, packet, string
 from support.trace import error_line
 from support.traffic import MODEM_OUT, PC_IN, PC_OUT, PcTrace, dump
 
-OK = "\r\nOK\r\n"
-ACK = wire.ACKNOWLEDGEMENT
 GPS_TEST, GPS_TEST_ANSWER = 176, packet(175, integer(1, 0))
 
 # One request an id that its handler serves without a long test, and the id of the answer.

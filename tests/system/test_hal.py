@@ -9,7 +9,7 @@ import pytest
 from conftest import HandsetFactory
 from amt_simulator import Handset
 from amt_station import wire
-from support.channels import AppChannel, PcChannel, integer, packet, string
+from support.channels import ERROR, OK, AppChannel, PcChannel, integer, packet, string
 from support.handler import NO_ENTRY, HandlerTrace, device_error, done, refusal, refused
 from support.trace import Wanted, error_line
 
@@ -18,7 +18,6 @@ INFO, INFO_HANDLER = 238, "amt_read_dev_info"
 IDLE, IDLE_HANDLER, IDLE_STEP = 240, "amt_enter_idle", "amt_make_ue_enter_idle"
 SANITY, SANITY_HANDLER = 244, "amt_modem_boot_dl_fin_read"
 EMMC, EMMC_HANDLER, EMMC_FILE = 246, "amt_device_emmc_info", "/sys/devinfo/emmc_info"
-OK, ERROR = "\r\nOK\r\n", "\r\nERROR\r\n"
 
 Channel = Union[AppChannel, PcChannel]
 PATHS: dict[str, Callable[[Handset], Channel]] = {"packet": AppChannel, "pc": PcChannel}

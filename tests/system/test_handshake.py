@@ -8,7 +8,7 @@ import pytest
 from conftest import HandsetFactory
 from amt_simulator import Handset
 from amt_simulator.waiting import scaled
-from support.channels import PcChannel
+from support.channels import OK, PcChannel
 from support.moments import Patience, logged_at
 from support.trace import TAG, Trace
 
@@ -16,7 +16,6 @@ PROPERTY = "sys.vx.amt.failure.handshake"
 PERMISSION = "/amt/power_usb_amt.txt"
 AC = "/sys/class/power_supply/ac/online"
 STATE = "/sys/class/android_usb/android0/state"
-OK = "\r\nOK\r\n"
 
 
 def skip_under_tsan(handset: Handset) -> None:

@@ -3,11 +3,10 @@
 from amt_simulator import Handset
 from amt_simulator.waiting import wait_until
 from amt_station import wire
-from support.channels import PcChannel, flag, integer, packet, string
+from support.channels import OK, PcChannel, flag, integer, packet, string
 from support.trace import TAG, error_line
 from support.traffic import PC_IN, PcTrace, dump
 
-OK = "\r\nOK\r\n"
 REFUSED_TEXT = b"AT^DPCBACTRL=2\r"
 NO_PACKET_REFUSED = packet(0, integer(1, 1))
 READ_PCBA = packet(193, flag(190, 1))

@@ -4,15 +4,13 @@ import pytest
 
 from amt_simulator import Handset
 from amt_station import wire
-from support.channels import PcChannel, integer, packet, string
+from support.channels import ERROR, OK, PcChannel, integer, packet, string
 from support.trace import Trace, error_line
 
 BT_FILE = "/amt/BT/BT_Address.txt"
 BT_FILE_2 = "/mnt/opl/nvm/BT_Address.txt"
 WIFI_FILE = "/amt/WIFI/WIFI_nvram.txt"
 PCBA_FILE = "/amt/sn-2.txt"
-OK = "\r\nOK\r\n"
-ERROR = "\r\nERROR\r\n"
 CME = "\r\n+CME ERROR: 100\r\n"
 MAC = "00:11:22:33:44:55"
 

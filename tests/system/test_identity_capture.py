@@ -5,6 +5,7 @@ import pytest
 from amt_simulator import Handset
 from amt_station import wire
 from support.channels import PcChannel, integer, packet, string
+from support.modem_desk import ERROR, OK
 from support.trace import Trace, error_line
 
 IMEI = "350000000000017"
@@ -12,8 +13,6 @@ SN = "KEL0000000000042"
 IMEI_FILES = ("/amt/imei.txt", "/amt/imei-2.txt")
 SN_FILES = ("/amt/sn.txt", "/amt/sn-2.txt")
 FILES = IMEI_FILES + SN_FILES
-OK = b"\r\nOK\r\n"
-ERROR = b"\r\nERROR\r\n"
 
 WRITE_IMEI = packet(5, string(21, IMEI))
 WRITE_BOARD = packet(87, string(38, SN))

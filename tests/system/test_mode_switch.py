@@ -7,13 +7,12 @@ import pytest
 from conftest import HandsetFactory
 from amt_simulator import Handset
 from amt_station import wire
-from support.channels import AppChannel, PcChannel, integer, packet
+from support.channels import ACK, AppChannel, PcChannel, integer, packet
 from support.modem_desk import ERRORS, MODEM_FAILED, NOT_SERVED, OK, ModemDesk, refusal
 from support.moments import logged_at
 from support.trace import Trace, error_line
 from support.traffic import APP_OUT, PC_OUT, PcTrace, dump
 
-ACK = wire.ACKNOWLEDGEMENT
 RESULT = integer(1, 0)
 USB = "sys.usb.config"
 SWITCH = "amt.normal.amt.switch_status"

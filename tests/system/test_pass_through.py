@@ -7,11 +7,10 @@ from conftest import HandsetFactory
 from amt_simulator import Handset
 from amt_simulator.waiting import wait_until
 from amt_station import wire
-from support.channels import PcChannel, integer, packet, raw
+from support.channels import OK, PcChannel, integer, packet, raw
 from support.trace import TAG, error_line
 from support.traffic import MODEM_IN, MODEM_OUT, PC_IN, PcTrace, dump
 
-OK = "\r\nOK\r\n"
 EIO, NO_ENTRY = 5, 2
 REOPENED = re.compile(r"pub_util_try_to_open_device, handle_context_st\.m_fd_modem  = \d+, "
                       r"amt_cfg_st\.m_tty_modem_a = /dev/ttyMODEM0\\n")

@@ -17,10 +17,10 @@ import pytest
 from amt_simulator.rundir import BASE_VARIABLE
 from amt_simulator.running import find
 from amt_station import wire
+from support.modem_desk import OK
 
 PROJECT = Path(__file__).resolve().parents[2]
 COMMAND = [sys.executable, "-m", "amt_simulator"]
-OK = b"\r\nOK\r\n"
 PROMPT = b"handset> "
 # The seconds that a stuck machine does not need.
 PATIENCE = 60

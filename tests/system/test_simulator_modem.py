@@ -9,9 +9,7 @@ from amt_station import wire
 from amt_station.requests.model import Channel
 from amt_station.requests.table import REQUESTS
 from support.channels import PcChannel, integer, packet, raw, string
-
-OK = b"\r\nOK\r\n"
-ERROR = b"\r\nERROR\r\n"
+from support.modem_desk import ERROR, OK
 
 
 @pytest.fixture

@@ -7,12 +7,11 @@ import signal
 from amt_simulator import Handset
 from amt_simulator.waiting import wait_until
 from amt_station import wire
-from support.channels import AppChannel, PcChannel, integer, packet, string
+from support.channels import OK, AppChannel, PcChannel, integer, packet, string
 from support.registrations import APP_ROWS
 from support.trace import TAG
 from support.traffic import PC_IN, PcTrace
 
-OK = "\r\nOK\r\n"
 PROBE, REWRITTEN = b"AT\r", b"AT;^DLKS=1\r"
 GPS_TEST = wire.encode_envelope(packet(176))
 GPS_ANSWER = packet(175, integer(1, 0))

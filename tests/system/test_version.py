@@ -9,7 +9,7 @@ import pytest
 from conftest import HandsetFactory
 from amt_simulator import Handset
 from amt_station import wire
-from support.channels import PcChannel, integer, packet, raw
+from support.channels import ACK, PcChannel, integer, packet, raw
 from support.modem_desk import NOT_SERVED, OK, ModemDesk, refusal
 from support.trace import Trace, error_line
 from support.traffic import APP_OUT, PC_OUT, PcTrace, dump
@@ -19,7 +19,6 @@ NAMES = {1: "AMT_PRODUCT_MODULE", 16: "AMT_SOFTWARE_MODULE", 17: "AMT_L1_MODULE"
          18: "AMT_HLS_MODULE", 19: "AMT_PLATFORM_MODULE", 20: "AMT_APP_MODULE",
          32: "AMT_HARDWARE_MODULE", 64: "AMT_WHOLE_MODULE"}
 UNKNOWN = (0, 2, 15, 21, 31, 33, 63, 65, 255, 0x110, -1)
-ACK = wire.ACKNOWLEDGEMENT
 CME = b"\r\n+CME ERROR: 100\r\n"
 
 

@@ -4,6 +4,9 @@ from amt_simulator import Handset, Line
 from amt_station import wire
 
 RESULT = wire.RESULT_ATOM
+ACK = wire.ACKNOWLEDGEMENT
+# Final results as a station reads them.
+OK, ERROR = "\r\nOK\r\n", "\r\nERROR\r\n"
 ENVELOPE_HEAD = 12
 PACKET_HEAD = 6
 

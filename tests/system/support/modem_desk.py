@@ -7,10 +7,12 @@ from typing import Iterable, Iterator, Sequence
 from amt_simulator import Handset
 from amt_simulator.waiting import wait_until
 from amt_station import wire
+from support import channels
 from support.channels import RESULT, AppChannel, integer, packet
 
-OK = b"\r\nOK\r\n"
-ERRORS = (b"\r\nERROR\r\n", b"\r\n+CME ERROR: 100\r\n", b"\r\n+CMS ERROR: 500\r\n")
+# Final results as the modem says them.
+OK, ERROR = channels.OK.encode(), channels.ERROR.encode()
+ERRORS = (ERROR, b"\r\n+CME ERROR: 100\r\n", b"\r\n+CMS ERROR: 500\r\n")
 MODEM_FAILED = 10
 NOT_SERVED = 1
 

@@ -4,10 +4,10 @@ from dataclasses import dataclass
 
 from amt_station import wire
 from support.channels import flag, integer, packet, raw, string
-from support.modem_desk import ERRORS, MODEM_FAILED, NOT_SERVED, OK, refusal
+from support.modem_desk import ERROR, ERRORS, MODEM_FAILED, NOT_SERVED, OK, refusal
 
 # These words are enough for an error result, wherever its line ends.
-ERROR_MARKS = (b"\r\nERROR\r\n", b"\r\n+CME ERROR", b"\r\n+CMS ERROR")
+ERROR_MARKS = (ERROR, b"\r\n+CME ERROR", b"\r\n+CMS ERROR")
 
 
 @dataclass(frozen=True)
