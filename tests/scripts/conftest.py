@@ -1,8 +1,10 @@
 """A project of one's own to run ./dev in: nothing of it touches the real one."""
 
 import os
+import shlex
 import shutil
 import stat
+import sys
 from pathlib import Path
 
 import pytest
@@ -34,6 +36,14 @@ class Copy:
         path = self.programs / name
         path.write_text(f"#!/bin/sh\n{script}\n")
         path.chmod(path.stat().st_mode | stat.S_IXUSR)
+
+    def slow_program(self, name: str, began: Path) -> None:
+        """Put one in a program's place that makes a file and then does not come to an end.
+
+        One process: a shell between two of them forgets a signal that comes just then.
+        """
+        code = f"import pathlib, time; pathlib.Path({str(began)!r}).touch(); time.sleep(600)"
+        self.program(name, f"exec {sys.executable} -c {shlex.quote(code)} 2>/dev/null")
 
     @property
     def calls(self) -> list[str]:

@@ -115,7 +115,7 @@ def test_an_unknown_preset_is_refused(copy: Copy) -> None:
 def test_an_interrupted_build_is_one_line(copy: Copy, tmp_path: Path, number: int, status: int,
                                           word: str) -> None:
     began = tmp_path / "began"
-    copy.program("cmake", f"echo begun; touch {began}; sleep 300; echo 'not shown'")
+    copy.slow_program("cmake", began)
     assert interrupt(copy, "build", when=began, number=number) == (
         status, f"\n== building release\n\ndev: {word}\n")
 
@@ -143,7 +143,7 @@ def test_an_interrupted_installation_is_one_line(copy: Copy, tmp_path: Path) -> 
     began = tmp_path / "began"
     copy.program("dpkg-query", "echo unknown ok not-installed")
     copy.program("sudo", 'exec "$@"')
-    copy.program("apt-get", f"touch {began}; sleep 300")
+    copy.slow_program("apt-get", began)
     status, said = interrupt(copy, "setup", when=began)
     assert status == 130
     assert said.splitlines()[1].startswith("== installing Debian packages: ")
