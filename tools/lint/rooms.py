@@ -20,6 +20,7 @@ CPP_FLOORS: Floors = (
     ("amt/amt-handle/channel",),
     ("amt/amt-handle/request", "amt/amt-device", "amt/amt-gps"),
     ("amt/amt-handle/at",),
+    ("amt/amt-handle/handshake",),
     ("amt/amt-handle/reader",),
     ("amt/amt-handle",),
     ("amt/signal-treatment",),
@@ -31,11 +32,17 @@ CPP_FLOORS: Floors = (
 
 PYTHON_FLOORS: Floors = (
     ("amt_station/wire",),
+    ("amt_station/errors",),
     ("amt_station/requests",),
     ("amt_station",),
     ("amt_station/cli", "amt_simulator/inside"),
     ("amt_simulator",),
-    ("tools", "amt", "platform"),
+    ("amt_line/plan",),
+    ("amt_line/run",),
+    ("amt_line/report", "amt_line/view"),
+    ("amt_line", "amt_line/cli"),
+    # What starts everything.
+    ("amt_station/__main__", "tools", "amt", "platform"),
     ("tests",),
 )
 
