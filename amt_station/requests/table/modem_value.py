@@ -70,8 +70,8 @@ REQUESTS: tuple[Request, ...] = (
                               brings=("out-date",)),)),
     Request(
         55, "temperature", "battery temperature",
-        answer_fields=(Field(22, INT, "temperature", "battery temperature; the driver gives "
-                             "tenths of a degree", unit="°C", scale=10), RESULT),
+        answer_fields=(Field(22, INT, "temperature", "battery temperature",
+                             unit="°C", scale=10), RESULT),
         app=on_app("reads sys/class/power_supply/battery/temp",
                    Refusal("the file cannot be opened or holds no number", 10)),
         operations=(Operation(("battery", "temperature"), "read the battery temperature",
@@ -120,7 +120,7 @@ REQUESTS: tuple[Request, ...] = (
         operations=(Operation(("imei", "read"), "read the IMEI", brings=("imei",)),)),
     Request(
         9, "battery-voltage", "battery voltage",
-        answer_fields=(Field(5, INT, "voltage", "battery voltage; the kernel gives microvolt",
+        answer_fields=(Field(5, INT, "voltage", "battery voltage",
                              unit="V", scale=1000000), RESULT),
         app=on_app("reads /sys/class/power_supply/battery/voltage_now", DEVICE_FILE),
         operations=(Operation(("battery", "voltage"), "read the battery voltage",
