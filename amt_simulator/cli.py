@@ -13,7 +13,7 @@ from amt_simulator.errors import PROGRAM, HandsetError
 from amt_simulator.handset import Handset
 from amt_simulator.kinds import KINDS
 from amt_simulator.inside.modem_table import MODES
-from amt_simulator.parse import CardSize, Pair, Screen, file_contents, pairs, unescaped
+from amt_simulator.parse import CardSize, Escaped, Pair, Screen, file_contents, pairs
 from amt_simulator.tree import ROOT
 from amt_simulator.running import Announcement, NoHandset, find
 
@@ -83,8 +83,7 @@ def _options(given: dict[str, Any]) -> dict[str, Any]:
         "args": given["args"], "config": pairs(given["config"]),
         "files": file_contents(given["files"]), "properties": pairs(given["properties"]),
         "answers": answers, "modem": given["modem"],
-        "modem_answers": {command: unescaped(text).decode("latin-1")
-                          for command, text in given["modem_answers"]},
+        "modem_answers": dict(given["modem_answers"]),
         "restart": given["restart"], "start": given["start"], "screen": given["screen"],
         "card": given["card"] or None, "usb_state": given["usb_state"],
         "env": dict(given["env"]), "keep": given["keep"], "ports": True,
@@ -107,7 +106,8 @@ def _options(given: dict[str, Any]) -> dict[str, Any]:
               help="Scripted answer of a stand-in; repeat for the next calls.")
 @click.option("--modem", type=click.Choice(MODES), default="table", show_default=True,
               help="What the modem does.")
-@click.option("--modem-answer", "modem_answers", multiple=True, nargs=2, metavar="COMMAND TEXT",
+@click.option("--modem-answer", "modem_answers", multiple=True, type=(str, Escaped()),
+              metavar="COMMAND TEXT",
               help=r"The modem's answer to a command line; \r and \n are understood.")
 @click.option("--restart/--no-restart", default=None,
               help="Whether init starts the daemon again (default: as the init file says).")

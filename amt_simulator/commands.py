@@ -12,7 +12,7 @@ from amt_simulator import tree
 from amt_simulator.control import HandsetControl
 from amt_simulator.errors import HandsetError
 from amt_simulator.inside.modem_table import MODES
-from amt_simulator.parse import CardSize, unescaped
+from amt_simulator.parse import CardSize, Escaped
 from amt_simulator.running import Announcement
 
 SHOWN = ("/amt", "/data", "/sys", "/tmp", "/system/etc", "/proc/driver", "/handset/properties")
@@ -194,21 +194,21 @@ def modem_back(handset: HandsetControl) -> None:
 
 
 @modem.command("say")
-@click.argument("text")
+@click.argument("text", type=Escaped())
 @click.option("--line", type=click.Choice(["modem", "mux"]), default="modem", show_default=True)
 @pass_handset
 def modem_say(handset: HandsetControl, text: str, line: str) -> None:
     r"""Let the modem say TEXT unasked; \r, \n and \xHH are understood."""
-    handset.client.ask("say", line=line, text=unescaped(text).decode("latin-1"))
+    handset.client.ask("say", line=line, text=text)
 
 
 @modem.command("answer")
 @click.argument("command")
-@click.argument("text", required=False)
+@click.argument("text", required=False, type=Escaped())
 @pass_handset
 def modem_answer(handset: HandsetControl, command: str, text: str | None) -> None:
     r"""Answer the command line COMMAND with TEXT (\r, \n, \xHH); without: as the table says."""
-    handset.answer_modem(command, None if text is None else unescaped(text).decode("latin-1"))
+    handset.answer_modem(command, text)
 
 
 @modem.command("mode")

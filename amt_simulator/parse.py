@@ -6,6 +6,8 @@ from typing import Any
 
 import click
 
+from amt_simulator.escapes import unescape
+
 SIZE = re.compile(r"^(\d+)([kKmMgG]?)$")
 FACTORS = {"": 1, "k": 1 << 10, "m": 1 << 20, "g": 1 << 30}
 
@@ -69,11 +71,15 @@ def file_contents(given: tuple[tuple[str, str | None], ...]) -> dict[str, Path |
     return {inside: None if outside is None else Path(outside) for inside, outside in given}
 
 
-def unescaped(text: str) -> bytes:
-    r"""TEXT with \r, \n, \\ and \xHH as a shell passes them on."""
-    plain = {"r": "\r", "n": "\n", "\\": "\\"}
+class Escaped(click.ParamType):
+    r"""A text for the wire, in which \r, \n and \xHH stand for bytes."""
 
-    def byte(match: "re.Match[str]") -> str:
-        return plain.get(match[1]) or chr(int(match[1][1:], 16))
+    name = "TEXT"
 
-    return re.sub(r"\\(x[0-9a-fA-F]{2}|[rn\\])", byte, text).encode("latin-1", "replace")
+    def convert(self, value: Any, param: click.Parameter | None,
+                ctx: click.Context | None) -> str:
+        """The text as init takes it: bytes that are no text are surrogates."""
+        try:
+            return unescape(str(value)).decode("utf-8", "surrogateescape")
+        except ValueError as error:
+            self.fail(str(error), param, ctx)

@@ -1,12 +1,15 @@
 """Fixtures of the system tests: handsets, made as a test wants them and gone after it."""
 
+import subprocess
 from pathlib import Path
 from typing import Any, Callable, Iterator
 
 import pytest
 
 from amt_simulator import Handset
+from amt_simulator.rundir import BASE_VARIABLE
 from support.channels import AppChannel, PcChannel
+from support.command import COMMAND, PATIENCE, PROJECT
 
 HandsetFactory = Callable[..., Handset]
 FAKE_DAEMON = Path(__file__).with_name("support") / "fake_daemon.py"
@@ -158,3 +161,33 @@ def make_fake(make_handset: HandsetFactory) -> HandsetFactory:
 def fake(make_fake: HandsetFactory) -> Handset:
     """A handset with a fake daemon on the PC path."""
     return make_fake()
+
+
+@pytest.fixture
+def base(tmp_path: Path, monkeypatch: pytest.MonkeyPatch) -> Path:
+    """A base directory of this test's own: other handsets are not found."""
+    monkeypatch.setenv(BASE_VARIABLE, str(tmp_path / "base"))
+    return tmp_path / "base"
+
+
+@pytest.fixture
+def up(base: Path, handset_build: "str | Path") -> Iterator[Callable[..., "subprocess.Popen[str]"]]:
+    """Bring handsets up by the command, until the test ends."""
+    started = []
+
+    def bring_up(*options: str) -> "subprocess.Popen[str]":
+        process = subprocess.Popen(
+            [*COMMAND, "up", "--build", str(handset_build), *options], cwd=PROJECT, text=True,
+            stdin=subprocess.DEVNULL, stdout=subprocess.PIPE, stderr=subprocess.PIPE)
+        started.append(process)
+        assert process.stdout is not None
+        lines = [process.stdout.readline()]
+        while lines[-1] and not lines[-1].startswith("  stand-ins"):
+            lines.append(process.stdout.readline())
+        process.introduction = "".join(lines)  # type: ignore[attr-defined]
+        return process
+
+    yield bring_up
+    for process in started:
+        process.terminate()
+        process.communicate(timeout=PATIENCE)

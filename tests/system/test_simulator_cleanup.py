@@ -13,8 +13,8 @@ import pytest
 
 from amt_simulator import Handset, HandsetError
 from amt_simulator.rundir import BASE_VARIABLE, RunDirectory, base_directory, remove_tree, sweep
+from support.command import PATIENCE, PROJECT
 
-PROJECT = Path(__file__).resolve().parents[2]
 FAKE_DAEMON = Path(__file__).with_name("support") / "fake_daemon.py"
 LAUNCHER = """
 import json, sys, time
@@ -27,13 +27,6 @@ with Handset("pc", build=None, daemon=Path(sys.argv[1])) as handset:
         raise RuntimeError("as a test that fails")
     time.sleep(60)
 """
-
-
-@pytest.fixture
-def base(tmp_path: Path, monkeypatch: pytest.MonkeyPatch) -> Path:
-    """A base directory of this test's own."""
-    monkeypatch.setenv(BASE_VARIABLE, str(tmp_path / "base"))
-    return tmp_path / "base"
 
 
 @pytest.fixture
@@ -71,7 +64,7 @@ def processes_of(directory: str) -> list[int]:
 
 def wait_gone(directory: str) -> None:
     """Wait until no process and no file of the handset is left."""
-    end = time.monotonic() + 10
+    end = time.monotonic() + PATIENCE
     while processes_of(directory) or os.path.exists(directory):
         assert time.monotonic() < end, (processes_of(directory), os.path.exists(directory))
         time.sleep(0.01)
@@ -85,7 +78,7 @@ def test_a_launcher_that_is_ended(launcher, number: int) -> None:
     directory, pid = json.loads(process.stdout.readline())
     assert pid and len(processes_of(directory)) >= 3
     process.send_signal(number)
-    process.wait(10)
+    process.wait(PATIENCE)
     wait_gone(directory)
 
 
@@ -93,7 +86,7 @@ def test_a_launcher_that_fails(launcher) -> None:
     """An exception in the test takes the handset down too."""
     process = launcher("raise")
     directory = json.loads(process.stdout.readline())[0]
-    assert process.wait(10) == 1
+    assert process.wait(PATIENCE) == 1
     assert not os.path.exists(directory)
     assert processes_of(directory) == []
 

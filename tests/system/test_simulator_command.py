@@ -2,72 +2,21 @@
 
 import json
 import os
-import pty
 import select
 import signal
 import stat
 import subprocess
-import sys
 import time
 from pathlib import Path
-from typing import Callable, Iterator
+from typing import Callable
 
 import pytest
 
-from amt_simulator.rundir import BASE_VARIABLE
-from amt_simulator.running import find
 from amt_station import wire
+from support.command import COMMAND, PATIENCE, PROJECT, handset, output
 from support.modem_desk import OK
 
-PROJECT = Path(__file__).resolve().parents[2]
-COMMAND = [sys.executable, "-m", "amt_simulator"]
-PROMPT = b"handset> "
-# The seconds that a stuck machine does not need.
-PATIENCE = 60
-STATE = "/sys/class/android_usb/android0/state"
-
-
-@pytest.fixture(autouse=True)
-def base(tmp_path: Path, monkeypatch: pytest.MonkeyPatch) -> Path:
-    """A base directory of this test's own: other handsets are not found."""
-    monkeypatch.setenv(BASE_VARIABLE, str(tmp_path / "base"))
-    return tmp_path / "base"
-
-
-def handset(*words: str, timeout: float = 30) -> "subprocess.CompletedProcess[str]":
-    """Run the command to its end."""
-    return subprocess.run([*COMMAND, *words], cwd=PROJECT, text=True, timeout=timeout,
-                          capture_output=True, check=False)
-
-
-def output(*words: str) -> str:
-    """What the command prints; it must succeed."""
-    done = handset(*words)
-    assert done.returncode == 0, done.stderr
-    return done.stdout
-
-
-@pytest.fixture
-def up(handset_build) -> Iterator[Callable[..., "subprocess.Popen[str]"]]:
-    """Bring handsets up by the command, until the test ends."""
-    started = []
-
-    def bring_up(*options: str) -> "subprocess.Popen[str]":
-        process = subprocess.Popen(
-            [*COMMAND, "up", "--build", str(handset_build), *options], cwd=PROJECT, text=True,
-            stdin=subprocess.DEVNULL, stdout=subprocess.PIPE, stderr=subprocess.PIPE)
-        started.append(process)
-        assert process.stdout is not None
-        lines = [process.stdout.readline()]
-        while lines[-1] and not lines[-1].startswith("  stand-ins"):
-            lines.append(process.stdout.readline())
-        process.introduction = "".join(lines)  # type: ignore[attr-defined]
-        return process
-
-    yield bring_up
-    for process in started:
-        process.terminate()
-        process.communicate(timeout=20)
+pytestmark = pytest.mark.usefixtures("base")
 
 
 def talk(port: str, data: bytes, until: bytes) -> bytes:
@@ -77,7 +26,7 @@ def talk(port: str, data: bytes, until: bytes) -> bytes:
         os.write(fd, data)
         said = b""
         while until not in said:
-            assert select.select([fd], [], [], 10)[0], said
+            assert select.select([fd], [], [], PATIENCE)[0], said
             said += os.read(fd, 4096)
         return said
     finally:
@@ -86,7 +35,7 @@ def talk(port: str, data: bytes, until: bytes) -> bytes:
 
 def wait_for(condition: Callable[[], bool]) -> None:
     """Wait until something is so."""
-    end = time.monotonic() + 20
+    end = time.monotonic() + PATIENCE
     while not condition():
         assert time.monotonic() < end
         time.sleep(0.05)
@@ -122,7 +71,7 @@ def test_a_whole_visit(up, tmp_path: Path) -> None:
     assert talk(status["pc"], b"ATI\r", OK).startswith(b"\r\n^RING!\r\n")
     output("card", "none")
     output("down")
-    assert process.wait(10) == 0
+    assert process.wait(PATIENCE) == 0
     assert not Path(status["directory"]).exists()
 
 
@@ -150,7 +99,7 @@ def test_the_port_goes_with_the_cable(up) -> None:
         assert not os.path.lexists(status["pc"])
         poller = select.poll()
         poller.register(held, 0)
-        assert poller.poll(10000)[0][1] & select.POLLHUP
+        assert poller.poll(PATIENCE * 1000)[0][1] & select.POLLHUP
         with pytest.raises(OSError):
             os.write(held, b"AT\r")
         os.close(held)
@@ -220,7 +169,7 @@ def test_a_person_speaks_as_the_modem(up) -> None:
     pc = os.open(status["pc"], os.O_RDWR | os.O_NOCTTY)
     os.write(pc, b"ATX\r")
     assert talk(status["modem"], b"hello", b"ATX\r") == b"ATX\r"
-    assert select.select([pc], [], [], 10)[0] and os.read(pc, 100) == b"hello"
+    assert select.select([pc], [], [], PATIENCE)[0] and os.read(pc, 100) == b"hello"
     os.close(pc)
 
 
@@ -229,7 +178,7 @@ def test_signals_take_it_down(up, base: Path, number: int) -> None:
     """Ctrl-C and its relatives clean up everything; that is no failure."""
     process = up()
     process.send_signal(number)
-    assert process.wait(10) == 0
+    assert process.wait(PATIENCE) == 0
     assert list(base.iterdir()) == []
 
 
@@ -238,7 +187,7 @@ def test_power_off_is_told(up, base: Path) -> None:
     process = up()
     status = json.loads(output("status", "--json"))
     assert talk(status["pc"], b"AT^DAMTOFF\r", OK) == OK
-    assert process.wait(20) == 0
+    assert process.wait(PATIENCE) == 0
     assert "the handset has been powered off" in process.stderr.read()
     assert list(base.iterdir()) == []
 
@@ -256,7 +205,7 @@ def test_following_the_log(up) -> None:
     assert last == output("log").splitlines()[-2:] and len(last) == 2
     assert output("log", "-n", "0") == ""
     output("down")
-    assert follower.wait(10) == 0
+    assert follower.wait(PATIENCE) == 0
     follower.stdout.close()
 
 
@@ -311,124 +260,11 @@ def test_several_handsets(up) -> None:
     assert json.loads(output("--dir", directory, "status", "--json"))["path"] == "pc"
 
 
-class Terminal:
-    """The command at a terminal of its own."""
-
-    def __init__(self, *words: str) -> None:
-        self.pid, self._fd = pty.fork()
-        if self.pid == 0:
-            os.chdir(PROJECT)
-            os.execv(sys.executable, [*COMMAND, *words])
-        self._said = b""
-
-    def until(self, text: bytes) -> bytes:
-        """Read up to TEXT; returns what came before."""
-        while text not in self._said:
-            assert select.select([self._fd], [], [], PATIENCE)[0], self._said
-            self._said += os.read(self._fd, 4096)
-        before, _, self._said = self._said.partition(text)
-        return before
-
-    def type(self, data: bytes) -> None:
-        """Press keys."""
-        os.write(self._fd, data)
-
-    def end(self) -> int:
-        """The exit status, once it has ended."""
-        status = os.waitstatus_to_exitcode(os.waitpid(self.pid, 0)[1])
-        os.close(self._fd)
-        return status
-
-
-@pytest.fixture
-def terminal(handset_build, tmp_path: Path, monkeypatch: pytest.MonkeyPatch) -> Terminal:
-    """A handset that is brought up at a terminal, at its prompt."""
-    monkeypatch.setenv("XDG_STATE_HOME", str(tmp_path / "state"))
-    monkeypatch.setenv("TERM", "xterm")
-    made = Terminal("up", "--build", str(handset_build))
-    made.until(PROMPT)
-    return made
-
-
-def test_the_prompt(terminal: Terminal) -> None:
-    """At a terminal the same commands are typed; Ctrl-C ends the handset."""
-    for typed, shown in ((b"help", b"Pull the USB cable out"), (b"show usb", b"CONFIGURED"),
-                         (b"frob", b"no such command: frob"), (b"show 'x", b"No closing quotation"),
-                         (b"show", b"Missing argument"), (b"", b"\n"), (b"get x", b"is not set"),
-                         (b"show --help", b"Usage: show"), (b"up", b"no such command: up")):
-        terminal.type(typed + b"\n")
-        terminal.until(shown)
-        terminal.until(PROMPT)
-    terminal.type(b"\x03")
-    terminal.until(b"handset is down")
-    assert terminal.end() == 0
-
-
-@pytest.mark.parametrize("typed", [b"exit\n", b"quit\n", b"\x04"])
-def test_leaving_the_prompt(terminal: Terminal, base: Path, typed: bytes) -> None:
-    """By a word, or by the end of the typing."""
-    terminal.type(typed)
-    terminal.until(b"handset is down")
-    assert terminal.end() == 0
-    assert list(base.iterdir()) == []
-
-
-def test_lines_are_edited_and_kept(terminal: Terminal, tmp_path: Path, handset_build) -> None:
-    """Arrow keys move, names are completed, and the next handset knows the last lines."""
-    terminal.type(b"show sb\x1b[D\x1b[Du\x1b[C\x1b[C\x08\n")
-    terminal.until(b"no file is called us; give")
-    terminal.until(PROMPT)
-    terminal.type(b"conf\t\n")
-    terminal.until(PROMPT)
-    terminal.type(b"show usb\n")
-    terminal.until(b"CONFIGURED")
-    terminal.until(PROMPT)
-    terminal.type(b"exit\n")
-    assert terminal.end() == 0
-    again = Terminal("up", "--build", str(handset_build))
-    again.until(PROMPT)
-    again.type(b"\x1b[A\x1b[A\n")
-    again.until(b"CONFIGURED")
-    again.type(b"\x04")
-    assert again.end() == 0
-    kept = (tmp_path / "state" / "amt-handset" / "history").read_text().splitlines()
-    assert kept[-3:] == ["show usb", "exit", "show usb"]
-
-
-def test_deaths_are_told_at_the_prompt(terminal: Terminal) -> None:
-    """The daemon's with its status, though nothing was typed; the sandbox's ends the program."""
-    terminal.type(b"status --json\n")
-    pid = json.loads(b"{" + terminal.until(b"}").partition(b"{")[2] + b"}")["daemon_pid"]
-    terminal.until(PROMPT)
-    with_control = find(None)
-    with_control.signal(signal.SIGKILL, pid=pid)
-    terminal.until(b"amt-handset: the daemon has ended with signal 9 (SIGKILL)")
-    terminal.type(b"get no.such\n")
-    terminal.until(b"amt-handset: the property no.such is not set")
-    terminal.until(PROMPT)
-    kill_init(with_control.directory)
-    terminal.until(b"amt-handset: the sandbox has ended with signal 9 (SIGKILL)")
-    assert terminal.end() == 1
-
-
-def kill_init(directory: Path) -> None:
-    """Kill process 1 of the handset in DIRECTORY, seen from the PC."""
-    for entry in (entry for entry in Path("/proc").iterdir() if entry.name.isdigit()):
-        try:
-            is_init = f"NSpid:\t{entry.name}\t1\n" in (entry / "status").read_text()
-            if is_init and f" {directory}/root" in (entry / "mountinfo").read_text():
-                os.kill(int(entry.name), signal.SIGKILL)
-                return
-        except OSError:
-            continue
-    raise AssertionError("there is no init")
-
-
 def test_what_is_kept(up) -> None:
     """On request the directory stays, and is told."""
     process = up("--keep", "--no-start")
     process.send_signal(signal.SIGINT)
-    assert process.wait(10) == 0
+    assert process.wait(PATIENCE) == 0
     told = process.stderr.read()
     directory = Path(told.partition("kept: ")[2].splitlines()[0])
     assert (directory / "state" / "init.json").exists()
@@ -444,85 +280,3 @@ def test_every_path_serves(up, path: str) -> None:
         assert talk(status["app"], wire.Packet(29).encode(), b"\x1e")
     else:
         assert talk(status["pc"], b"ATI\r", OK).endswith(OK)
-
-
-def restricted(*words: str) -> "subprocess.CompletedProcess[str]":
-    """Run the command in a system that bubblewrap makes up of this one."""
-    return subprocess.run(["bwrap", "--dev-bind", "/", "/", *words], cwd=PROJECT, text=True,
-                          capture_output=True, check=False, timeout=PATIENCE)
-
-
-@pytest.mark.parametrize("size", [40_000, 100_000, 400_000])
-def test_a_full_disk_is_told(handset_build, base: Path, size: int) -> None:
-    """In one line, wherever the room ends; nothing is left."""
-    base.mkdir(mode=0o700)
-    done = restricted(
-        "--perms", "0700", "--size", str(size), "--tmpfs", str(base), "sh", "-c",
-        '"$@"; status=$?; ls -A "$0"; exit $status', str(base),
-        *COMMAND, "up", "--build", str(handset_build))
-    assert (done.returncode, done.stdout) == (1, "")
-    assert done.stderr.startswith("amt-handset: cannot make the handset: No space left on device")
-    assert done.stderr.count("\n") == 1
-
-
-def test_a_disk_that_gets_full_is_told(up, tmp_path: Path) -> None:
-    """The handset goes on, what does not fit is refused in one line."""
-    up("--path", "packet")
-    huge = tmp_path / "huge"
-    huge.touch()
-    done = subprocess.run(
-        ["sh", "-c", 'ulimit -f 0; exec "$@"', "sh", *COMMAND, "set", "a.b", "c"],
-        cwd=PROJECT, text=True, capture_output=True, check=False, timeout=PATIENCE)
-    assert (done.returncode, done.stdout) == (1, "")
-    assert done.stderr == "amt-handset: File too large\n"
-    assert output("get", "ro.build.factory.id") == "F01\n"
-    assert handset("get", "a.b").returncode == 1
-
-
-def test_a_system_without_pseudo_terminals_is_told(handset_build, base: Path) -> None:
-    """In one line; nothing is left."""
-    done = restricted("--dev-bind", "/dev/null", "/dev/ptmx", *COMMAND, "up", "--build",
-                      str(handset_build))
-    assert (done.returncode, done.stdout) == (1, "")
-    assert done.stderr.startswith("amt-handset: this system gives no pseudo-terminal for the port")
-    assert done.stderr.count("\n") == 1
-    assert list(base.iterdir()) == []
-
-
-def test_a_file_that_is_missing_is_told(handset_build, base: Path) -> None:
-    """With its name and its place; nothing is left."""
-    done = handset("up", "--build", str(handset_build), "--file", "/amt/x=/no/such/file")
-    assert (done.returncode, done.stdout) == (1, "")
-    assert done.stderr == ("amt-handset: cannot place /no/such/file as /amt/x: "
-                           "No such file or directory\n")
-    assert list(base.iterdir()) == []
-
-
-def test_many_handsets_at_once(base: Path) -> None:
-    """Started at the same moment, they come up, are told apart, and leave nothing."""
-    script = """
-import sys, threading
-from pathlib import Path
-from amt_simulator import Handset
-handsets = [Handset("pc", build=None, daemon=Path(sys.argv[1]), ports=True) for _ in range(32)]
-threads = [threading.Thread(target=handset.up) for handset in handsets]
-for thread in threads: thread.start()
-for thread in threads: thread.join()
-for number, handset in enumerate(handsets):
-    handset.wait_ready()
-    handset.pc.write(b"handset %d" % number)
-    handset.modem.open()
-for number, handset in enumerate(handsets):
-    handset.pc.write(b"number %d." % number)
-    assert b"number %d." % number in handset.modem.read_until(b".")
-threads = [threading.Thread(target=handset.down) for handset in handsets]
-for thread in threads: thread.start()
-for thread in threads: thread.join()
-print("all")
-"""
-    daemon = PROJECT / "tests" / "system" / "support" / "fake_daemon.py"
-    done = subprocess.run([sys.executable, "-c", script, str(daemon)], cwd=PROJECT, text=True,
-                          capture_output=True, check=False, timeout=PATIENCE * 2,
-                          env={**os.environ, "HANDSET_TIME_SCALE": "6"})
-    assert (done.returncode, done.stdout, done.stderr) == (0, "all\n", "")
-    assert list(base.iterdir()) == []

@@ -3,6 +3,7 @@
 import pytest
 
 from amt_simulator import Handset
+from amt_simulator.escapes import unescape
 from amt_simulator.inside import modem_table
 from amt_simulator.inside.modem import Modem, Conversation
 from amt_station import wire
@@ -178,6 +179,22 @@ def test_an_answer_can_be_replaced() -> None:
     assert tty.feed(b"AT^DMSN\r") == b"\r\n+CME ERROR: 3\r\n"
     modem.set_answer("AT^DMSN", None)
     assert tty.feed(b"AT^DMSN\r") == info("^DMSN: KEL0000000000001")
+
+
+@pytest.mark.parametrize("text, data", [
+    (r"\r\nOK\r\n", OK), (r"\x00\xff\0\t\\\"", b"\0\xff\0\t\\\""), ("é", "é".encode()),
+    ("", b""),
+])
+def test_escapes(text: str, data: bytes) -> None:
+    """What a shell passes on stands for every byte."""
+    assert unescape(text) == data
+
+
+@pytest.mark.parametrize("text", [r"\q", r"\x4", "end\\"])
+def test_escapes_that_there_are_not(text: str) -> None:
+    """They are named, not passed on."""
+    with pytest.raises(ValueError, match="unknown escape"):
+        unescape(text)
 
 
 def test_in_the_handset(make_fake) -> None:

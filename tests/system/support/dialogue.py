@@ -5,15 +5,14 @@ from dataclasses import dataclass, field
 from pathlib import Path
 from typing import Callable
 
+from amt_simulator.escapes import unescape
 from amt_station import wire
+from amt_station.requests.atom_text import TYPES
 from amt_station.requests.catalogue import command_ids
 
 TOKEN = re.compile(r'(?:[^\s"#]|"(?:[^"\\]|\\.)*")+')
 QUOTED = re.compile(r'"((?:[^"\\]|\\.)*)"')
 TIMES = re.compile(r'("(?:[^"\\]|\\.)*")\*(\d+)')
-ESCAPE = re.compile(r"\\(x[0-9A-Fa-f]{2}|.)", re.DOTALL)
-ESCAPES = {"r": "\r", "n": "\n", "t": "\t", "0": "\0", "\\": "\\", '"': '"'}
-ATOM_TYPES = {kind.label: kind for kind in wire.AtomType}
 CHANNELS = {"app": "packet", "pc": "pc"}
 
 
@@ -45,18 +44,6 @@ class Dialogue:
     steps: list[Step] = field(default_factory=list)
 
 
-def _unescape(text: str) -> str:
-    def replace(match: "re.Match[str]") -> str:
-        code = match[1]
-        if code[0] == "x" and len(code) == 3:
-            return chr(int(code[1:], 16))
-        if code not in ESCAPES:
-            raise _Problem(f"unknown escape \\{code}")
-        return ESCAPES[code]
-
-    return ESCAPE.sub(replace, text)
-
-
 def _tokens(text: str) -> list[str]:
     """The words of a line; what is quoted is one word, and a # begins a comment."""
     words: list[str] = []
@@ -80,9 +67,11 @@ def _literal(word: str) -> bytes:
     quoted = QUOTED.fullmatch(text)
     if quoted:
         try:
-            return _unescape(quoted[1]).encode("latin-1") * count
+            return unescape(quoted[1], "latin-1") * count
         except UnicodeEncodeError:
             raise _Problem(f"{text}: write bytes above 0x7F as \\xNN") from None
+        except ValueError as error:
+            raise _Problem(str(error)) from None
     try:
         return bytes.fromhex(word)
     except ValueError:
@@ -118,9 +107,9 @@ def _command(word: str) -> int:
 def _atom(word: str) -> wire.Atom:
     key, equals, rest = word.partition("=")
     label, colon, content = rest.partition(":")
-    if not equals or not colon or label not in ATOM_TYPES:
-        raise _Problem(f"{word} is not ATOM={'|'.join(ATOM_TYPES)}:VALUE")
-    kind = ATOM_TYPES[label]
+    if not equals or not colon or label not in TYPES:
+        raise _Problem(f"{word} is not ATOM={'|'.join(TYPES)}:VALUE")
+    kind = TYPES[label]
     try:
         if kind is wire.AtomType.INT:
             return wire.Atom.integer(_number(key), _number(content))
