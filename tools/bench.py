@@ -135,7 +135,7 @@ def main() -> int:
     parser.add_argument("--all-cores", action="store_true",
                         help="let the system place the processes, and measure that too")
     options = parser.parse_args()
-    build("release")
+    build("release", ("--target", "handset", "link-bench", "micro-bench"))
     print("Both sides take turns. A wake-up costs 5 or 50 microseconds, as the system places\n"
           'processes; "paired" compares turn by turn and takes the median of that.')
     if not options.all_cores:

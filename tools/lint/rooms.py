@@ -24,7 +24,7 @@ CPP_FLOORS: Floors = (
     ("amt/amt-handle/reader",),
     ("amt/amt-handle",),
     ("amt/signal-treatment",),
-    ("amt/main.cpp",),
+    ("amt/main.cpp", "amt/signal-treatment"),
     # What the daemon never includes.
     ("platform/host", "cmake"),
     ("tests",),
@@ -41,6 +41,8 @@ PYTHON_FLOORS: Floors = (
     ("amt_line/run",),
     ("amt_line/report", "amt_line/view"),
     ("amt_line", "amt_line/cli"),
+    # A handset for other people's tests, simulated when none is named.
+    ("amt_station/pytest_plugin",),
     # What starts everything.
     ("amt_station/__main__", "tools", "amt", "platform"),
     ("tests",),
