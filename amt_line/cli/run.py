@@ -180,7 +180,7 @@ def _finish(settings: Settings, runner: Runner, document: Mapping[str, Any],
         console.data_json(document)
     if runner.record_problem is not None:
         # Rather here than nowhere.
-        print(runner.record.text(), file=sys.stderr, flush=True)
+        print(runner.record.text(), end="", file=sys.stderr, flush=True)
         console.complain(printable(str(runner.record_problem)))
     elif files:
         console.talk(f"record: {printable(str(files[0].path))}")

@@ -17,6 +17,7 @@ from amt_line.run.operator import GivenAnswers, Nobody
 from amt_line.run.record import Record, Where
 from amt_line.run.record_file import Keeper, NoRecord, RecordFile, file_name
 from amt_line.run.runner import Runner, Setting
+from amt_line.run.stop import Abort
 from amt_station.port import FdPort, Port
 from amt_station.requests.model import Channel
 from amt_station.wire import ACKNOWLEDGEMENT, Atom, Frame
@@ -107,6 +108,11 @@ class Bench:
         if self.runner.defect is not None:
             raise self.runner.defect
         return document
+
+    def abort(self, how: Abort) -> None:
+        """End the run from outside."""
+        assert self.runner is not None
+        self.runner.abort(how)
 
     def _keep(self, record: Record) -> Keeper:
         if self.records is None:

@@ -2,6 +2,7 @@
 
 from __future__ import annotations
 
+import threading
 import time
 from pathlib import Path
 from typing import Any
@@ -242,7 +243,7 @@ def test_the_first_request_ends_the_step_and_does_what_is_always_done(
 
     def stop(event: dict[str, Any]) -> None:
         if event["event"] == "step-began" and event["number"] == 1:
-            in_thread(lambda: bench.runner and bench.runner.abort(how))
+            bench.abort(how)
 
     bench = Bench(load(tmp_path, step + ADC + WRITE_VERDICT), peer, records=records, on_event=stop)
     start = time.monotonic()
@@ -258,7 +259,7 @@ def test_the_second_request_leaves_at_once(tmp_path: Path, peer: Peer, records: 
 
     def stop(event: dict[str, Any]) -> None:
         if event["event"] == "step-began":
-            in_thread(lambda: bench.runner and bench.runner.abort(INTERRUPTED))
+            bench.abort(INTERRUPTED)
 
     bench = Bench(load(tmp_path, "[[step]]\nwait = 60\n[[always]]\nat = 'AT+SILENT'\n"
                        + WRITE_VERDICT), peer, records=records, on_event=stop)
@@ -272,7 +273,7 @@ def test_always_steps_have_seconds_only_once_a_run_was_ended(tmp_path: Path, pee
 
     def stop(event: dict[str, Any]) -> None:
         if event["event"] == "step-began" and event["number"] == 1:
-            in_thread(lambda: bench.runner and bench.runner.abort(INTERRUPTED))
+            bench.abort(INTERRUPTED)
 
     bench = Bench(load(tmp_path, "[[step]]\nwait = 60\n[[always]]\nwait = 60\n"), peer,
                   on_event=stop)
@@ -337,7 +338,7 @@ def test_a_port_that_goes_and_comes_back(tmp_path: Path, peer: Peer) -> None:
 
     def pull(event: dict[str, Any]) -> None:
         if event["event"] == "step-began" and event["number"] == 1:
-            in_thread(lambda: (time.sleep(0.3), peer.hang_up()))
+            threading.Timer(0.3, peer.hang_up).start()
 
     plan = load(tmp_path, "[[step]]\nwait = 0.1\nreconnect = 20\n" + ADC)
     document = Bench(plan, peer, open_port=open_port, on_event=pull).run()

@@ -13,6 +13,9 @@ CACHES = PROJECT / "build" / "mypy"
 RELAXED_TYPES = ("--allow-untyped-defs", "--allow-incomplete-defs", "--allow-untyped-calls",
                  "--allow-untyped-decorators", "--allow-any-generics", "--no-warn-return-any")
 
+# Whose support files a folder of tests uses beside its own.
+BORROWED = {"tests/line": ("tests/station",)}
+
 
 def check_shell(files: list[str]) -> Verdict:
     """Do the shell scripts do what they look like?"""
@@ -38,7 +41,8 @@ def look_at_types(folder: str, names: list[str]) -> Verdict:
     cache = CACHES / (folder.replace("/", "-") or "packages")
     command = [sys.executable, "-m", "mypy", "--no-error-summary", "--explicit-package-bases",
                f"--cache-dir={cache}", *(RELAXED_TYPES if folder else ())]
-    roots = f"{PROJECT}:{PROJECT / folder}" if folder else str(PROJECT)
+    places = (".", folder, *BORROWED.get(folder, ())) if folder else (".",)
+    roots = ":".join(str(PROJECT / place) for place in places)
     verdict = plain(names, command, MYPYPATH=roots)
     if any("Traceback" in text or "INTERNAL ERROR" in text for text in verdict.findings):
         # It stumbles over what its cache says of modules that have gone.
