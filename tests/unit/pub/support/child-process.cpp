@@ -61,6 +61,15 @@ std::string read_all(int fd)
     return content;
 }
 
+bool has_command_line(pid_t pid)
+{
+    const std::string path = "/proc/" + std::to_string(pid) + "/cmdline";
+    const int fd = open(path.c_str(), O_RDONLY | O_CLOEXEC);
+    const std::string line = read_all(fd);
+    close(fd);
+    return !line.empty();
+}
+
 } // namespace
 
 child_run_st run_in_child(const std::function<int()> &body, const failing_call_st &failing_call)
@@ -108,6 +117,11 @@ other_program_c::other_program_c(const std::string &program, bool is_exited)
     if (is_exited) {
         siginfo_t info = {};
         EXPECT_EQ(waitid(P_PID, static_cast<id_t>(m_pid), &info, WEXITED | WNOWAIT), 0);
+        return;
+    }
+    /* The kernel closes descriptors before it lays out the command line. */
+    while (!has_command_line(m_pid)) {
+        usleep(1000);
     }
 }
 
