@@ -28,8 +28,8 @@ int amt_convert_req_amt_data_2_at_data(const uint8_t *packet, uint8_t *out, uint
 
 /*
  * A modem's block of len bytes becomes a response packet in packet, whose capacity must be AMT_PACKET_SIZE. A
- * block that ends with its result code gives a packet with AMT_ATOM_RESULT only. Fields behind the end of the block
- * read as zero bytes. The buffers stay the caller's and must not overlap.
+ * block that ends with its result code gives a packet with AMT_ATOM_RESULT only. Fields behind the end of the
+ * block read as zero bytes. The buffers stay the caller's and must not overlap.
  *
  * Returns 0; PUB_ERR_FAIL when a value does not fit the packet; PUB_ERR_PARAM for an absent argument, len 0,
  * another capacity, or a value of length 0.

@@ -1,11 +1,11 @@
 #include "pub/util/mount.h"
 
-#include <stdio.h>
 #include <string.h>
 #include <sys/statfs.h>
 
 #include "pub/cfg/cfg.h"
 #include "pub/error.h"
+#include "pub/file/file.h"
 #include "pub/pub-log.h"
 
 namespace {
@@ -13,13 +13,13 @@ namespace {
 constexpr uint32_t LINE_SIZE = 200;
 
 /* Whether a line of the list of mounts contains the text. */
-bool is_listed(FILE *mounts, const char *text)
+bool is_listed(const pub_file_st &mounts, const char *text)
 {
     char line_a[LINE_SIZE + 1] = {}; /* one more zero byte behind a line that fills the rest */
     uint32_t length = 0;
     int is_eof = 0;
     while (is_eof == 0) {
-        pub_cfg_get_line(mounts, line_a, LINE_SIZE, &length, &is_eof);
+        pub_cfg_get_line(mounts.m_stream_ptr, line_a, LINE_SIZE, &length, &is_eof);
         if (strstr(line_a, text) != nullptr) {
             return true;
         }
@@ -49,13 +49,12 @@ int pub_util_get_mount_fs_info(const char *mount_point, uint32_t *total_ptr, uin
     }
 
     bool is_mounted = false;
-    FILE *mounts = fopen("/proc/mounts", "re");
-    if (mounts == nullptr) {
+    const pub_file_st mounts("/proc/mounts", pub_file_mode_en::READ);
+    if (mounts.is_open()) {
+        is_mounted = is_listed(mounts, mount_point);
+    } else {
         pub_log_sys_call(g_pub_util_log, "fopen");
         pub_log_error(g_pub_util_log, PUB_ERR_SYS_CALL);
-    } else {
-        is_mounted = is_listed(mounts, mount_point);
-        fclose(mounts);
     }
     if (!is_mounted) {
         pub_log_error(g_pub_util_log, PUB_ERR_NOT_FOUND);

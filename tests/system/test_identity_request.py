@@ -210,7 +210,7 @@ def test_adb_read_of_no_word(pc: PcChannel, content: str) -> None:
     pc.handset.place(ADB_FILE, content)
     trace = Trace(pc.handset)
     refused(pc, ADB, integer(160, 0))
-    trace.expect(error_line(ADB_HANDLER, -100), "fscanf error")
+    trace.expect(error_line(ADB_HANDLER, -100, 0), "fscanf error")
 
 
 def test_adb_write_that_cannot_be_opened(pc: PcChannel) -> None:

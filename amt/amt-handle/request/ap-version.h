@@ -12,8 +12,9 @@ constexpr uint32_t AMT_AP_LINE_SIZE = 50;
 /*
  * Builds the software version text of the application side from the system properties and factory files: buf
  * (AMT_AP_VERSION_SIZE bytes) gets at most 254 characters without a terminator, *length_ptr their number.
- * Returns 0; PUB_ERR_PARAM (absent argument); PUB_ERR_FAIL (a property the text starts with cannot be read: buf untouched,
- * length 0); or the status of reading the board information, the text being complete all the same.
+ * Returns 0; PUB_ERR_PARAM (absent argument); PUB_ERR_FAIL (a property the text starts with cannot be read:
+ * buf untouched, length 0); or the status of reading the board information, the text being complete all the
+ * same.
  */
 int get_ap_sw_version(char *buf, uint32_t *length_ptr);
 

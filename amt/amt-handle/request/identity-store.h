@@ -25,13 +25,15 @@ constexpr const char *AMT_BT_ADDRESS_FILE = "/amt/BT/BT_Address.txt";
 
 /*
  * Writes a text without a line end to the file: the common writer of the PCBA number, the IMEI and the serial
- * number. Returns 0, PUB_ERR_PARAM (absent or empty text) or PUB_ERR_FILE (open or write failed; a failed write
- * leaves the file truncated).
+ * number. Returns 0, PUB_ERR_PARAM (absent or empty text) or PUB_ERR_FILE (open or write failed; a failed
+ * write leaves the file truncated).
  */
 int amt_write_pcba_sn(const char *text, const char *path);
 
-/* Reads the PCBA number, terminated, into buf (AMT_PCBA_SN_SIZE bytes). Returns 0 or PUB_ERR_FILE; buf is empty
- * then. */
+/*
+ * Reads the PCBA number, terminated, into buf (AMT_PCBA_SN_SIZE bytes). Returns 0 or PUB_ERR_FILE; buf is
+ * empty then.
+ */
 int amt_read_pcba_sn(char *buf);
 
 /*
@@ -52,7 +54,8 @@ const char *get_bt_addr_file();
 
 /*
  * Makes the folder if nothing of that name exists, and gives it to the group "radio" with mode 766: written
- * by all, searched by its owner only. Returns 0, PUB_ERR_PARAM (absent path) or PUB_ERR_FILE (it cannot be made).
+ * by all, searched by its owner only. Returns 0, PUB_ERR_PARAM (absent path) or PUB_ERR_FILE (it cannot be
+ * made).
  */
 int amt_make_folder(const char *path);
 

@@ -1,6 +1,5 @@
 #include "amt/amt-handle/request/modem-tunnel.h"
 
-#include <string.h>
 #include <string_view>
 
 #include "amt/amt-convert.h"

@@ -172,10 +172,12 @@ int amt_query_amt_support(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp
     if (ask(g_support_question, &value) != PUB_ERR_NONE) {
         return amt_reply_fail(channel, rsp_ptr, AMT_NORMAL_TO_AMT_SUPPORT_RSPCMD);
     }
+    char *text = value.m_text_a;
     char *rest = nullptr;
-    const char *field = nullptr;
+    const char *field = "";
     for (const char *const name : {"sim_num", "standby_num", "rf_set_num", "standby0_rat"}) {
-        field = strtok_r(field == nullptr ? value.m_text_a : nullptr, ",", &rest);
+        field = strtok_r(text, ",", &rest);
+        text = nullptr;
         if (field == nullptr) {
             pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
             PUB_LOG(g_amt_handle_log, "%s is null!!!", name);

@@ -1,6 +1,5 @@
 #include "amt/amt-handle/request/test-result.h"
 
-#include <string.h>
 #include <string_view>
 
 #include "amt/amt-atom.h"

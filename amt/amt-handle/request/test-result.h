@@ -18,8 +18,8 @@ int amt_modem_write_test_result(uint32_t channel, amt_buf_st *req_ptr, amt_buf_s
 int amt_modem_read_test_result(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr);
 
 /*
- * Id 91 from the PC: mirrors the verdict and returns PUB_ERR_NOT_FOUND always, so that the request goes on to the modem.
- * Requires req_ptr to be present.
+ * Id 91 from the PC: mirrors the verdict and returns PUB_ERR_NOT_FOUND always, so that the request goes on to
+ * the modem. Requires req_ptr to be present.
  */
 int amt_modem_write_pc_test_result(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr);
 

@@ -124,7 +124,7 @@ TEST_F(temperature, without_a_number_is_a_failure)
     for (const char *const content : {"", "\n", "cold\n"}) {
         const log_capture_c capture;
         EXPECT_EQ(ask_with(content), std::vector<std::string>{failure_packet(56)});
-        EXPECT_EQ(capture.count_containing("fscanf error: errno="), 1);
+        EXPECT_TRUE(capture.has("fscanf error: errno=0"));
     }
 }
 
