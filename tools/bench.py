@@ -15,6 +15,7 @@ from amt_simulator.inside.modem import Modem
 from amt_simulator.inside.modem_table import IDENTITIES
 from amt_station import wire
 from tools.bare_modem import bare_modem
+from tools.bench_line import bench_station
 from tools.build import build
 from tools.project import PROJECT
 
@@ -151,6 +152,7 @@ def main() -> int:
         bench_pass_through(handset)
         show_size(handset)
     bench_exchange()
+    bench_station()
     print("\nLeft out, because a pause is part of them: every write of a factory file"
           "\n(two pauses of 50 ms), power-off (2 s), the battery ADC (20 ms).")
     return 0

@@ -111,7 +111,8 @@ class Runner:
         self._note_abort()
 
     def _last_steps(self) -> None:
-        self._make_safe()
+        if self.plan.always:
+            self._make_safe()
         self._stop.begin_last_steps(hurry=self._tally.abort is not None or self._time_is_over())
         for step in self.plan.always:
             self._do(step)
