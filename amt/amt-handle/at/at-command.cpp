@@ -1,6 +1,6 @@
 #include "amt/amt-handle/at/at-command.h"
 
-#include <string.h>
+#include <string_view>
 
 #include "amt/amt-handle/at/at-factory.h"
 #include "amt/amt-handle/at/at-handset.h"
@@ -40,11 +40,13 @@ int handle_amt_pc_req_at()
         pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
         return PUB_ERR_PARAM;
     }
-    const auto *const request = reinterpret_cast<const char *>(g_handle_context.m_req.m_buf_a);
+    const std::string_view request = amt_handle_get_text(g_handle_context.m_req);
     for (const at_command_st &command : g_at_command_a) {
-        const char *const found = strstr(request, command.m_text_ptr);
-        const int status =
-            found != nullptr ? command.m_handler(found + strlen(command.m_text_ptr)) : PUB_ERR_NOT_FOUND;
+        const std::string_view text = command.m_text_ptr;
+        const size_t found = request.find(text);
+        const int status = found != std::string_view::npos
+                               ? command.m_handler(request.data() + found + text.size())
+                               : PUB_ERR_NOT_FOUND;
         if (status != PUB_ERR_NOT_FOUND) {
             return status;
         }

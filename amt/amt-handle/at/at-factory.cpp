@@ -166,7 +166,9 @@ int amt_at_control_permission(const char *operands)
     if (handle_amt_damt1_operation(type, &flag) != PUB_ERR_NONE) {
         return amt_at_reply_error();
     }
-    return type == static_cast<int>(amt_permission_en::READ) ? amt_at_reply("\r\n^DAMT1: %d\r\n\r\nOK\r\n", flag) : amt_at_reply_ok();
+    return type == static_cast<int>(amt_permission_en::READ)
+               ? amt_at_reply("\r\n^DAMT1: %d\r\n\r\nOK\r\n", flag)
+               : amt_at_reply_ok();
 }
 
 int amt_at_test_only(const char *)

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <stdio.h>
 #include <string.h>
+#include <string_view>
 
 #include "amt/amt-handle/channel/context.h"
 #include "amt/amt-log.h"
@@ -11,6 +12,7 @@
 namespace {
 
 constexpr char LINE_END[] = "\r\n";
+constexpr std::string_view LINE_OR_TEXT_END{"\r\n\0", 3};
 
 } // namespace
 
@@ -22,22 +24,21 @@ int handle_amt_get_at_para(const char *prefix, char *out, uint32_t *length_ptr)
         return PUB_ERR_PARAM;
     }
     *length_ptr = 0;
-    const auto *const text = reinterpret_cast<const char *>(g_handle_context.m_req.m_buf_a);
-    const char *start = strstr(text, prefix);
-    if (start == nullptr) {
+    const std::string_view text = amt_handle_get_text(g_handle_context.m_req);
+    const size_t found = text.find(prefix);
+    if (found == std::string_view::npos) {
         pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
-        PUB_LOG(g_amt_handle_log, "at cmd[%s] do not include (%s).", text, prefix);
+        PUB_LOG(g_amt_handle_log, "at cmd[%s] do not include (%s).", text.data(), prefix);
         return PUB_ERR_FAIL;
     }
-    start += strlen(prefix);
-    start += strspn(start, " ");
-    const char *const end = text + strcspn(text, "\r");
+    const size_t start = std::min(text.find_first_not_of(' ', found + strlen(prefix)), text.size());
+    const size_t end = std::min(text.find('\r'), text.size());
     if (end <= start) {
         return PUB_ERR_NONE;
     }
-    const size_t line_length = std::min(static_cast<size_t>(end - start), strcspn(start, LINE_END));
-    *length_ptr = static_cast<uint32_t>(std::min<size_t>(line_length, AMT_AT_PARA_SIZE));
-    memcpy(out, start, *length_ptr);
+    const std::string_view line = text.substr(start, end - start);
+    const std::string_view parameter = line.substr(0, line.find_first_of(LINE_OR_TEXT_END));
+    *length_ptr = static_cast<uint32_t>(parameter.copy(out, AMT_AT_PARA_SIZE));
     return PUB_ERR_NONE;
 }
 

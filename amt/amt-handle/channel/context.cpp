@@ -18,6 +18,11 @@ void amt_handle_clear_buf(amt_buf_st *buf_ptr)
     memset(buf_ptr, 0, sizeof(*buf_ptr));
 }
 
+std::string_view amt_handle_get_text(const amt_buf_st &buf)
+{
+    return {reinterpret_cast<const char *>(buf.m_buf_a), buf.m_buf_len};
+}
+
 void amt_handle_close_fd(std::atomic<int> *fd_ptr)
 {
     const int fd = fd_ptr->exchange(-1);

@@ -2,6 +2,7 @@
 
 #include <atomic>
 #include <stdint.h>
+#include <string_view>
 
 #include "amt/amt-buf.h"
 #include "amt/amt-handle/channel/worker.h"
@@ -67,6 +68,9 @@ void amt_handle_clear_context();
 
 /* Zeroes a whole buffer. */
 void amt_handle_clear_buf(amt_buf_st *buf_ptr);
+
+/* All that the buffer holds as text, zero bytes included. */
+std::string_view amt_handle_get_text(const amt_buf_st &buf);
 
 /* Closes the descriptor if it is open (above 0) and marks it closed. Safe against two threads doing it at
  * once. */

@@ -8,7 +8,7 @@
 #include "amt/amt-handle/channel/service-process.h"
 #include "amt/amt-handle/channel/wait.h"
 #include "amt/amt-handle/handshake.h"
-#include "amt/amt-handle/reader/identity-completion.h"
+#include "amt/amt-handle/reader/identity-write.h"
 #include "amt/amt-log.h"
 #include "pub/util/thread-end.h"
 

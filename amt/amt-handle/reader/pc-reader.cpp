@@ -11,7 +11,7 @@
 #include "amt/amt-handle/channel/wait.h"
 #include "amt/amt-handle/handshake.h"
 #include "amt/amt-handle/reader/dispatch.h"
-#include "amt/amt-handle/reader/identity-capture.h"
+#include "amt/amt-handle/reader/identity-write.h"
 #include "amt/amt-log.h"
 #include "pub/error.h"
 #include "pub/util/thread-end.h"

@@ -7,7 +7,6 @@
 #include <unistd.h>
 
 #include "amt/amt-handle/channel/factory-file.h"
-#include "amt/amt-handle/channel/identity-slots.h"
 #include "amt/amt-log.h"
 #include "pub/error.h"
 #include "pub/file/file.h"
@@ -23,23 +22,6 @@ constexpr uint32_t LINE_SIZE = 99;
 
 constexpr mode_t FOLDER_MODE = 0777;
 constexpr uint32_t FOLDER_COMMAND_SIZE = 100;
-
-/* The modem channel whose texts have files of their own. */
-constexpr uint8_t SECOND_CHANNEL = 1;
-
-/* One kind of identity text: where it is saved, and what the log calls it. */
-struct identity_file_st
-{
-    int m_kind;
-    const char *m_name_ptr;
-    const char *m_path_ptr;
-    const char *m_second_path_ptr;
-};
-
-constexpr identity_file_st g_identity_file_a[] = {
-    {AMT_IDENTITY_IMEI, "imei", "/amt/imei.txt", "/amt/imei-2.txt"},
-    {AMT_IDENTITY_SN, "sn", "/amt/sn.txt", AMT_PCBA_SN_FILE},
-};
 
 /* The open line is one text for readers and writers, under the name of the operation that failed. */
 int fail_open(const char *path, const char *func = __builtin_FUNCTION(), int line = __builtin_LINE())
@@ -68,16 +50,6 @@ int read_first_line(const char *path, char *buf, uint32_t size, const char *func
     pub_log_error(g_amt_handle_log, PUB_ERR_FILE, func, line);
     PUB_LOG(g_amt_handle_log, "read fail: %d - %s", errno, strerror(errno));
     return PUB_ERR_FILE;
-}
-
-const identity_file_st *find_identity_file(int kind)
-{
-    for (const identity_file_st &file : g_identity_file_a) {
-        if (file.m_kind == kind) {
-            return &file;
-        }
-    }
-    return nullptr;
 }
 
 /* verb is a constant of this file; only the path is cut when both do not fit. */
@@ -136,34 +108,6 @@ int amt_read_data_from_file(char *buf, uint32_t size, const char *path)
         return status;
     }
     PUB_LOG(g_amt_handle_log, "read content: %s", buf);
-    return PUB_ERR_NONE;
-}
-
-int handle_amt_imei_and_sn_save_file(int kind)
-{
-    pub_log_entry(g_amt_handle_log);
-    const identity_file_st *const file_ptr = find_identity_file(kind);
-    if (file_ptr == nullptr) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
-        pub_log_flags(g_amt_handle_log, {true});
-        return PUB_ERR_PARAM;
-    }
-    char text_a[AMT_IDENTITY_TEXT_SIZE];
-    amt_identity_get_text(kind, text_a);
-    if (text_a[0] == '\0') {
-        return PUB_ERR_NONE;
-    }
-    const uint8_t channel = amt_identity_get_channel();
-    const int status = amt_write_pcba_sn(text_a, channel == SECOND_CHANNEL ? file_ptr->m_second_path_ptr
-                                                                           : file_ptr->m_path_ptr);
-    PUB_LOG(g_amt_handle_log, "save %s to file. channel:%d; content:%s;", file_ptr->m_name_ptr, channel,
-            text_a);
-    if (status != PUB_ERR_NONE) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
-        PUB_LOG(g_amt_handle_log, "write %s error.", file_ptr->m_name_ptr);
-        return PUB_ERR_FAIL;
-    }
-    PUB_LOG(g_amt_handle_log, "Writed %s to file success.", file_ptr->m_name_ptr);
     return PUB_ERR_NONE;
 }
 

@@ -37,12 +37,6 @@ int amt_write_pcba_sn(const char *text, const char *path);
 int amt_read_pcba_sn(char *buf);
 
 /*
- * Saves the captured IMEI (kind 1) or serial number (kind 2) to the file of the captured channel. An empty
- * text writes nothing. Returns 0, PUB_ERR_FAIL (not written) or PUB_ERR_PARAM (any other kind).
- */
-int handle_amt_imei_and_sn_save_file(int kind);
-
-/*
  * Reads the first line of a file, at most 98 characters with its line feed kept, into buf (size bytes),
  * terminated and cut to size - 1. Returns 0, PUB_ERR_PARAM (absent buffer, size 0 or absent path) or
  * PUB_ERR_FILE (not opened, not read or empty; buf is empty then).

@@ -6,7 +6,6 @@
 #include <string.h>
 #include <sys/stat.h>
 
-#include "amt/amt-handle/channel/identity-slots.h"
 #include "pub/error.h"
 #include "tests/unit/support/log-capture.h"
 #include "tests/unit/support/temp-folder.h"
@@ -193,27 +192,6 @@ TEST(make_folder, refuses_an_absent_path)
     EXPECT_EQ(amt_make_folder(nullptr), PUB_ERR_PARAM);
     EXPECT_THAT(capture.texts(),
                 ElementsAre("amt_make_folder()", is_error_line("amt_make_folder", -101), "1"));
-}
-
-TEST(save_file, refuses_any_other_kind)
-{
-    for (const int kind : {0, 3, -1}) {
-        const log_capture_c capture;
-        EXPECT_EQ(handle_amt_imei_and_sn_save_file(kind), PUB_ERR_PARAM);
-        EXPECT_THAT(capture.texts(),
-                    ElementsAre("handle_amt_imei_and_sn_save_file()",
-                                is_error_line("handle_amt_imei_and_sn_save_file", -101), "1"));
-    }
-}
-
-TEST(save_file, an_empty_text_writes_nothing)
-{
-    amt_identity_reset();
-    for (const int kind : {AMT_IDENTITY_IMEI, AMT_IDENTITY_SN}) {
-        const log_capture_c capture;
-        EXPECT_EQ(handle_amt_imei_and_sn_save_file(kind), PUB_ERR_NONE);
-        EXPECT_THAT(capture.texts(), ElementsAre("handle_amt_imei_and_sn_save_file()"));
-    }
 }
 
 TEST(write_wifi_address, refuses_no_text)
