@@ -20,7 +20,7 @@ constexpr uint32_t AMT_CHANNEL_NONE = 255; /* always refused */
 
 /*
  * A request handler. Requires: req holds a packet (no envelope) of m_buf_len bytes; rsp is the channel's
- * response buffer, which the handler builds its answer in. Both stay the caller's. Returns 0 when it has
+ * response buffer, cleared as a whole, which the handler builds its answer in. Both stay the caller's. Returns 0 when it has
  * answered, else a negative code, and the dispatcher decides what the station sees.
  */
 using amt_handle_func = int (*)(uint32_t channel, amt_buf_st *req, amt_buf_st *rsp);

@@ -285,11 +285,11 @@ bool amt_handshake_pc_data()
 void amt_handshake_show_success()
 {
     start_picture();
-    const int mode = g_handle_state.m_amt_mode;
-    const int charge_mode = mode == AMT_MODE_4 ? 1 : 0;
+    const amt_mode_en mode = g_handle_state.m_amt_mode;
+    const int charge_mode = mode == amt_mode_en::PC_TEXT ? 1 : 0;
     const int status = amt_usb_charge_ctrl(charge_mode);
     PUB_LOG(g_amt_handle_log, "call amt_usb_charge_ctrl. return:%d, current amt mode:%d, usb_charge_mode:%d.",
-            status, mode, charge_mode);
+            status, static_cast<int>(mode), charge_mode);
 }
 
 void amt_handle_exit_by_handshake()

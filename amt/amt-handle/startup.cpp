@@ -12,12 +12,9 @@
 #include "amt/amt-handle/channel/service-process.h"
 #include "amt/amt-handle/channel/tty.h"
 #include "amt/amt-handle/handshake.h"
-#include "amt/amt-handle/reader/app-reader.h"
 #include "amt/amt-handle/reader/identity-write.h"
-#include "amt/amt-handle/reader/modem-reader.h"
-#include "amt/amt-handle/reader/pc-reader.h"
+#include "amt/amt-handle/reader/reader.h"
 #include "amt/amt-handle/reader/registry.h"
-#include "amt/amt-handle/reader/usb-monitor.h"
 #include "amt/amt-handle/request/identity-store.h"
 #include "amt/amt-log.h"
 #include "platform/include/cutils/properties.h"
@@ -101,45 +98,30 @@ int open_pc_tty()
     return set_serial_dev_attr(g_handle_context.m_fd_pc);
 }
 
-int start_pc_worker(amt_worker_st *worker_ptr, void (*loop)())
+/* Starts a worker of the PC path, unless the path has failed already. */
+int start_pc_worker(int status, amt_worker_st *worker_ptr, void (*loop)(),
+                    const char *func = __builtin_FUNCTION(), int line = __builtin_LINE())
 {
-    const int error = amt_worker_start(worker_ptr, loop);
+    const int error = status == PUB_ERR_NONE ? amt_worker_start(worker_ptr, loop) : 0;
     if (error == 0) {
-        return PUB_ERR_NONE;
+        return status;
     }
     errno = error;
-    pub_log_error(g_amt_handle_log, PUB_ERR_FILE);
+    pub_log_error(g_amt_handle_log, PUB_ERR_FILE, func, line);
     PUB_LOG(g_amt_handle_log, "pthread_create(): %d - %s", error, strerror(error));
     return PUB_ERR_FILE;
-}
-
-int open_pc_path()
-{
-    int status = open_pc_tty();
-    if (status != PUB_ERR_NONE) {
-        return status;
-    }
-    status = amt_tty_open_modem();
-    if (status != PUB_ERR_NONE) {
-        return status;
-    }
-    status = start_pc_worker(&g_handle_context.m_pc_reader, amt_handle_read_pc_loop);
-    if (status != PUB_ERR_NONE) {
-        return status;
-    }
-    status = start_pc_worker(&g_handle_context.m_modem_reader, amt_handle_read_modem_loop);
-    if (status != PUB_ERR_NONE) {
-        return status;
-    }
-    g_handle_state.m_usb_state = AMT_USB_UNKNOWN;
-    return start_pc_worker(&g_handle_context.m_usb_monitor, amt_handle_monitor_usb_loop);
 }
 
 int init_for_amt_1_4()
 {
     pub_log_entry(g_amt_handle_log);
     amt_handshake_begin();
-    const int status = open_pc_path();
+    int status = open_pc_tty();
+    status = status == PUB_ERR_NONE ? amt_tty_open_modem() : status;
+    status = start_pc_worker(status, &g_handle_context.m_pc_reader, amt_handle_read_pc_loop);
+    status = start_pc_worker(status, &g_handle_context.m_modem_reader, amt_handle_read_modem_loop);
+    g_handle_state.m_usb_state = amt_usb_en::UNKNOWN;
+    status = start_pc_worker(status, &g_handle_context.m_usb_monitor, amt_handle_monitor_usb_loop);
     if (status == PUB_ERR_NONE) {
         return PUB_ERR_NONE;
     }
@@ -161,23 +143,6 @@ void open_at_mux()
     PUB_LOG(g_amt_handle_log, "The AT device is not opened with modem.");
 }
 
-int open_packet_path()
-{
-    const int status = pub_pty_open(&g_handle_context.m_pty);
-    if (status != PUB_ERR_NONE) {
-        return status;
-    }
-    open_at_mux();
-    const int error = amt_worker_start(&g_handle_context.m_app_reader, amt_handle_read_app_loop);
-    if (error != 0) {
-        errno = error;
-        pub_log_error(g_amt_handle_log, PUB_ERR_FILE);
-        PUB_LOG(g_amt_handle_log, "pthread_create() fail: %d", error);
-        return PUB_ERR_FILE;
-    }
-    return PUB_ERR_NONE;
-}
-
 void close_pty()
 {
     if (g_handle_context.m_pty.m_ptm_fd > 0) {
@@ -185,16 +150,32 @@ void close_pty()
     }
 }
 
+int start_app_reader(const char *func = __builtin_FUNCTION(), int line = __builtin_LINE())
+{
+    const int error = amt_worker_start(&g_handle_context.m_app_reader, amt_handle_read_app_loop);
+    if (error == 0) {
+        return PUB_ERR_NONE;
+    }
+    errno = error;
+    pub_log_error(g_amt_handle_log, PUB_ERR_FILE, func, line);
+    PUB_LOG(g_amt_handle_log, "pthread_create() fail: %d", error);
+    return PUB_ERR_FILE;
+}
+
 int init_for_amt_2_3()
 {
     pub_log_entry(g_amt_handle_log);
-    const int status = open_packet_path();
+    int status = pub_pty_open(&g_handle_context.m_pty);
+    if (status == PUB_ERR_NONE) {
+        open_at_mux();
+        status = start_app_reader();
+    }
     if (status != PUB_ERR_NONE) {
         amt_worker_stop(&g_handle_context.m_app_reader);
         amt_handle_close_fd(&g_handle_context.m_fd_at);
         close_pty();
     }
-    g_handle_state.m_amt_mode = AMT_MODE_3;
+    g_handle_state.m_amt_mode = amt_mode_en::APP;
     return status;
 }
 
@@ -204,7 +185,7 @@ int amt_handle_init(int normal_mode)
 {
     pub_log_entry(g_amt_handle_log);
     amt_service_process_mark();
-    g_handle_state.m_amt_mode = AMT_MODE_1;
+    g_handle_state.m_amt_mode = amt_mode_en::PC_PACKETS;
     if (amt_handshake_ask_permission() != PUB_ERR_NONE) {
         return PUB_ERR_FAIL;
     }

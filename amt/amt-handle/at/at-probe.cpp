@@ -1,4 +1,4 @@
-#include "amt/amt-handle/at/at-probe.h"
+#include "amt/amt-handle/at/at-command.h"
 
 #include <string.h>
 #include <strings.h>
@@ -37,13 +37,13 @@ void replace_request(amt_buf_st *req_ptr)
 
 void enter_mode_4()
 {
-    if (g_handle_state.m_amt_mode.exchange(AMT_MODE_4) == AMT_MODE_4) {
+    if (g_handle_state.m_amt_mode.exchange(amt_mode_en::PC_TEXT) == amt_mode_en::PC_TEXT) {
         return;
     }
     PUB_LOG(g_amt_handle_log, "mark to enter amt4");
     const int status = amt_usb_charge_ctrl(1);
     PUB_LOG(g_amt_handle_log, "call amt_usb_charge_ctrl for amt4. return:%d, current amt mode:%d.", status,
-            g_handle_state.m_amt_mode.load());
+            static_cast<int>(g_handle_state.m_amt_mode.load()));
 }
 
 } // namespace

@@ -11,6 +11,13 @@
 /* Command ids 0 to 254 have a handler slot. */
 constexpr uint32_t AMT_HANDLE_FUNC_COUNT = 255;
 
+/* Who tells the PC that its request has arrived. */
+enum class amt_ack_en : uint8_t
+{
+    DISPATCHER, /* before it calls the handler */
+    HANDLER     /* once it knows that the request is served here, if it is */
+};
+
 /*
  * The one hub record: threads, descriptors, buffers and handler tables. Zeroed at start-up before any thread
  * exists. A descriptor of 0 or less is closed. Each buffer belongs to the one reader thread that fills it.
@@ -32,6 +39,7 @@ struct handle_context_st
     amt_buf_st m_pc;             /* the PC request without its envelope */
     amt_handle_func m_handle_pc_func_a[AMT_HANDLE_FUNC_COUNT];
     amt_handle_func m_handle_app_func_a[AMT_HANDLE_FUNC_COUNT];
+    amt_ack_en m_pc_ack_a[AMT_HANDLE_FUNC_COUNT]; /* of the handlers in m_handle_pc_func_a */
 };
 extern handle_context_st g_handle_context;
 
@@ -42,24 +50,30 @@ constexpr uint32_t AMT_HELD_SIZE = AMT_PACKET_SIZE - 1;
  * afterwards. */
 extern int32_t g_usb_activate;
 
-/* The manufacturing-test modes the hub can be in. */
-constexpr int AMT_MODE_1 = 1; /* PC path, packets seen */
-constexpr int AMT_MODE_3 = 3; /* packet path running */
-constexpr int AMT_MODE_4 = 4; /* PC path, AT text seen */
+/* The manufacturing-test modes the hub can be in. The log shows the numbers. */
+enum class amt_mode_en : int
+{
+    PC_PACKETS = 1, /* PC path, packets seen */
+    APP = 3,        /* packet path running */
+    PC_TEXT = 4     /* PC path, AT text seen */
+};
 
 /* States of the USB link. */
-constexpr uint8_t AMT_USB_DISCONNECTED = 0;
-constexpr uint8_t AMT_USB_CONFIGURED = 1;
-constexpr uint8_t AMT_USB_OTHER = 2;
-constexpr uint8_t AMT_USB_UNKNOWN = 255;
+enum class amt_usb_en : uint8_t
+{
+    DISCONNECTED = 0,
+    CONFIGURED = 1,
+    OTHER = 2,
+    UNKNOWN = 255
+};
 
 /* Process-wide state beside the context: small numbers that several threads touch. */
 struct handle_state_st
 {
-    std::atomic<int> m_amt_mode;
+    std::atomic<amt_mode_en> m_amt_mode;
     std::atomic<int> m_is_normal_mode; /* the argument of amt_handle_init, stored when init succeeded */
     std::atomic<int> m_is_no_modem;    /* 1 when the AT device could not be opened */
-    std::atomic<uint8_t> m_usb_state;
+    std::atomic<amt_usb_en> m_usb_state;
 };
 extern handle_state_st g_handle_state;
 

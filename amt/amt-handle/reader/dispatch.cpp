@@ -4,8 +4,6 @@
 #include "amt/amt-convert.h"
 #include "amt/amt-handle/channel/context.h"
 #include "amt/amt-handle/channel/reply.h"
-#include "amt/amt-handle/request/test-result.h"
-#include "amt/amt-handle/request/version.h"
 #include "amt/amt-packet.h"
 #include "pub/error.h"
 
@@ -16,6 +14,13 @@ uint32_t read_command_id(const amt_buf_st *req_ptr)
     const uint8_t id = amt_packet_get_cmd(req_ptr->m_buf_a);
     PUB_LOG(g_amt_handle_log, "receive command id: %d(0x%02X) - %s", id, id, amt_cmd_name_table[id]);
     return id;
+}
+
+/* Calls the handler with a clear response, whatever an answer that could not be sent has left in it. */
+int call_handler(amt_handle_func handler, uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
+{
+    amt_handle_clear_buf(rsp_ptr);
+    return handler(channel, req_ptr, rsp_ptr);
 }
 
 int call_app_handler(uint32_t id)
@@ -31,18 +36,12 @@ int call_app_handler(uint32_t id)
         PUB_LOG(g_amt_handle_log, "unregistered AMT request id: %u", id);
         return PUB_ERR_FAIL;
     }
-    return handler(AMT_CHANNEL_APP, &g_handle_context.m_req, &g_handle_context.m_rsp_app);
-}
-
-/* Two handlers acknowledge by themselves, if at all: once they know that the request is served here. */
-bool is_acknowledged_by_handler(amt_handle_func handler)
-{
-    return handler == handle_amt_pc_req_version || handler == amt_modem_write_pc_test_result;
+    return call_handler(handler, AMT_CHANNEL_APP, &g_handle_context.m_req, &g_handle_context.m_rsp_app);
 }
 
 void enter_mode_1()
 {
-    if (g_handle_state.m_amt_mode.exchange(AMT_MODE_1) != AMT_MODE_1) {
+    if (g_handle_state.m_amt_mode.exchange(amt_mode_en::PC_PACKETS) != amt_mode_en::PC_PACKETS) {
         PUB_LOG(g_amt_handle_log, "mark to enter amt1");
     }
 }
@@ -88,8 +87,8 @@ int handle_amt_pc_req(uint32_t *id_ptr)
         PUB_LOG(g_amt_handle_log, "handle_context_st.m_handle_pc_func_a[%u] =%p", id, nullptr);
         return PUB_ERR_NOT_FOUND;
     }
-    if (!is_acknowledged_by_handler(handler)) {
+    if (g_handle_context.m_pc_ack_a[id] == amt_ack_en::DISPATCHER) {
         amt_handle_send_pre_rsp_for_pc(AMT_CHANNEL_PC, &g_handle_context.m_rsp_pc);
     }
-    return handler(AMT_CHANNEL_PC, &g_handle_context.m_pc, &g_handle_context.m_rsp_pc);
+    return call_handler(handler, AMT_CHANNEL_PC, &g_handle_context.m_pc, &g_handle_context.m_rsp_pc);
 }

@@ -21,11 +21,12 @@ struct registration_st
 {
     uint32_t m_id;
     amt_handle_func m_handler;
+    amt_ack_en m_ack = amt_ack_en::DISPATCHER;
 };
 
 /* What the PC may ask. Any other id goes on as text, in the end to the modem. Ids in numbers have no name. */
 constexpr registration_st g_pc_registration_a[] = {
-    {AMT_VERSION_CMD, handle_amt_pc_req_version},
+    {AMT_VERSION_CMD, handle_amt_pc_req_version, amt_ack_en::HANDLER},
     {AMT_BLUETOOTH_CMD, amt_device_bt},
     {AMT_BLUETOOTH_ADDRESS_CMD, amt_device_bt_address},
     {AMT_WIFI_TEST_CMD, amt_device_wifi_address},
@@ -40,7 +41,7 @@ constexpr registration_st g_pc_registration_a[] = {
     {AMT_BOARD_PCBA_CTRL_CMD, amt_handle_board_pcba_ctrl},
     {AMT_DAMT1_CMD, amt_handle_not_permit_handshake},
     {AMT_ENTER_IDLE_CMD, amt_enter_idle},
-    {AMT_WRITE_TEST_RESULT_CMD, amt_modem_write_pc_test_result},
+    {AMT_WRITE_TEST_RESULT_CMD, amt_modem_write_pc_test_result, amt_ack_en::HANDLER},
     {244, amt_modem_boot_dl_fin_read},
     {246, amt_device_emmc_info},
 };
@@ -157,13 +158,13 @@ constexpr registration_st g_app_registration_a[] = {
 void register_table(int table, const registration_st *row_ptr, const registration_st *end_ptr)
 {
     for (; row_ptr != end_ptr; row_ptr++) {
-        amt_handle_reg_handle_func(table, row_ptr->m_id, row_ptr->m_handler);
+        amt_handle_reg_handle_func(table, row_ptr->m_id, row_ptr->m_handler, row_ptr->m_ack);
     }
 }
 
 } // namespace
 
-int amt_handle_reg_handle_func(int table, uint32_t id, amt_handle_func handler)
+int amt_handle_reg_handle_func(int table, uint32_t id, amt_handle_func handler, amt_ack_en ack)
 {
     if (id >= AMT_HANDLE_FUNC_COUNT) {
         pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
@@ -181,6 +182,9 @@ int amt_handle_reg_handle_func(int table, uint32_t id, amt_handle_func handler)
         PUB_LOG(g_amt_handle_log, "re-register the handle function of request id: %u", id);
     }
     *slot_ptr = handler;
+    if (is_pc) {
+        g_handle_context.m_pc_ack_a[id] = ack;
+    }
     PUB_LOG(g_amt_handle_log, "%s register command id: %u(0x%02x) - %s", is_pc ? "PC" : "APP", id, id,
             amt_cmd_name_table[id]);
     return PUB_ERR_NONE;

@@ -1,4 +1,4 @@
-#include "amt/amt-handle/reader/usb-monitor.h"
+#include "amt/amt-handle/reader/reader.h"
 
 #include <linux/netlink.h>
 #include <stdint.h>
@@ -78,24 +78,24 @@ void note_usb_state(const char *status)
 {
     PUB_LOG(g_amt_handle_log, "amt_handle_monitor_usb_loop usb_status:[%s]", status);
     if (strstr(status, "DISCONNECTED") != nullptr) {
-        g_handle_state.m_usb_state = AMT_USB_DISCONNECTED;
+        g_handle_state.m_usb_state = amt_usb_en::DISCONNECTED;
         PUB_LOG(g_amt_handle_log, "amt_handle_monitor_usb_loop get usb disconnect event");
         amt_handshake_link_down();
         return;
     }
     if (strstr(status, "CONFIGURED") != nullptr) {
-        g_handle_state.m_usb_state = AMT_USB_CONFIGURED;
+        g_handle_state.m_usb_state = amt_usb_en::CONFIGURED;
         PUB_LOG(g_amt_handle_log, "amt_handle_monitor_usb_loop get usb CONFIGURED event");
         amt_handshake_link_up();
         return;
     }
-    g_handle_state.m_usb_state = AMT_USB_OTHER;
+    g_handle_state.m_usb_state = amt_usb_en::OTHER;
     PUB_LOG(g_amt_handle_log, "amt_handle_monitor_usb_loop get usb other status event");
 }
 
 bool is_to_end()
 {
-    return g_usb_activate == 0 && g_handle_state.m_usb_state == AMT_USB_DISCONNECTED;
+    return g_usb_activate == 0 && g_handle_state.m_usb_state == amt_usb_en::DISCONNECTED;
 }
 
 } // namespace

@@ -1,4 +1,4 @@
-#include "amt/amt-handle/at/at-probe.h"
+#include "amt/amt-handle/at/at-command.h"
 
 #include <string>
 
@@ -16,13 +16,14 @@ class at_probe : public testing::Test {
 protected:
     void SetUp() override
     {
-        g_handle_state.m_amt_mode = AMT_MODE_4; /* no need to enter it, which would ask the charger */
+        g_handle_state.m_amt_mode =
+            amt_mode_en::PC_TEXT; /* no need to enter it, which would ask the charger */
         g_amt_cfg = {};
     }
     void TearDown() override
     {
         amt_handle_clear_buf(&g_handle_context.m_req);
-        g_handle_state.m_amt_mode = 0;
+        g_handle_state.m_amt_mode = amt_mode_en{};
         g_amt_cfg = {};
     }
 
@@ -89,19 +90,19 @@ TEST_F(at_probe, sets_the_speed_of_a_serial_port_when_short)
 
 TEST_F(at_probe, enters_mode_4)
 {
-    for (const int mode : {AMT_MODE_1, AMT_MODE_3}) {
+    for (const amt_mode_en mode : {amt_mode_en::PC_PACKETS, amt_mode_en::APP}) {
         g_handle_state.m_amt_mode = mode;
         const log_capture_c capture;
         rewrite("AT\r");
-        EXPECT_EQ(g_handle_state.m_amt_mode, AMT_MODE_4);
+        EXPECT_EQ(g_handle_state.m_amt_mode, amt_mode_en::PC_TEXT);
         EXPECT_EQ(capture.count_containing("mark to enter amt4"), 1);
         EXPECT_EQ(capture.count_containing("call amt_usb_charge_ctrl for amt4. return:"), 1);
         rewrite("AT\r");
         EXPECT_EQ(capture.count_containing("mark to enter amt4"), 1);
     }
-    g_handle_state.m_amt_mode = AMT_MODE_1;
+    g_handle_state.m_amt_mode = amt_mode_en::PC_PACKETS;
     rewrite("ATI\r");
-    EXPECT_EQ(g_handle_state.m_amt_mode, AMT_MODE_1);
+    EXPECT_EQ(g_handle_state.m_amt_mode, amt_mode_en::PC_PACKETS);
 }
 
 } // namespace

@@ -1,6 +1,7 @@
 #include "amt/amt-handle/reader/dispatch.h"
 
 #include <errno.h>
+#include <string.h>
 #include <string>
 #include <vector>
 
@@ -31,6 +32,7 @@ struct call_st
     uint32_t m_channel;
     amt_buf_st *m_req_ptr;
     amt_buf_st *m_rsp_ptr;
+    bool m_is_rsp_clear;
     std::string m_request;
 };
 call_st g_call;
@@ -41,6 +43,8 @@ int serve(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
     g_call.m_channel = channel;
     g_call.m_req_ptr = req_ptr;
     g_call.m_rsp_ptr = rsp_ptr;
+    static const amt_buf_st clear = {};
+    g_call.m_is_rsp_clear = memcmp(rsp_ptr, &clear, sizeof(clear)) == 0;
     g_call.m_request.assign(reinterpret_cast<const char *>(req_ptr->m_buf_a), req_ptr->m_buf_len);
     return g_call.m_status;
 }
@@ -77,7 +81,7 @@ protected:
     {
         amt_handle_clear_context();
         g_call = {};
-        g_handle_state.m_amt_mode = AMT_MODE_1;
+        g_handle_state.m_amt_mode = amt_mode_en::PC_PACKETS;
     }
     void TearDown() override
     {
@@ -93,7 +97,7 @@ TEST_F(dispatch, app_request_goes_to_its_handler)
     const std::string packet = wire_packet(9, int_atom(5, 1));
     amt_handle_reg_handle_func(AMT_TABLE_APP, 9, serve);
     hold(packet);
-    g_handle_state.m_amt_mode = AMT_MODE_3;
+    g_handle_state.m_amt_mode = amt_mode_en::APP;
     const log_capture_c capture;
     handle_amt_app_req();
     EXPECT_EQ(g_call.m_count, 1);
@@ -103,7 +107,7 @@ TEST_F(dispatch, app_request_goes_to_its_handler)
     EXPECT_EQ(g_call.m_request, packet);
     EXPECT_EQ(held(), "");
     EXPECT_EQ(line.app_packets(), texts_t{});
-    EXPECT_EQ(g_handle_state.m_amt_mode, AMT_MODE_3);
+    EXPECT_EQ(g_handle_state.m_amt_mode, amt_mode_en::APP);
     EXPECT_EQ(capture.texts(),
               (texts_t{"handle_amt_app_req()", "receive command id: 9(0x09) - AMT_READ_BATTERY_CMD"}));
 }
@@ -171,7 +175,46 @@ TEST_F(dispatch, app_request_without_content_is_an_error)
     EXPECT_EQ(line.app_packets(), texts_t{});
 }
 
+TEST_F(dispatch, app_handler_finds_a_clear_response)
+{
+    const modem_line_c line;
+    amt_handle_reg_handle_func(AMT_TABLE_APP, 9, serve);
+    memset(&g_handle_context.m_rsp_app, 0x5A, sizeof(g_handle_context.m_rsp_app));
+    hold(wire_packet(9, ""));
+    handle_amt_app_req();
+    EXPECT_TRUE(g_call.m_is_rsp_clear);
+}
+
 // the PC
+
+TEST_F(dispatch, pc_handler_finds_a_clear_response_though_the_acknowledgement_is_stuck)
+{
+    const modem_line_c line;
+    amt_handle_reg_handle_func(AMT_TABLE_PC, 193, serve);
+    g_handle_context.m_fd_pc = 0;
+    hold(envelope(wire_packet(193, "")));
+    uint32_t id = 0;
+    EXPECT_EQ(handle_amt_pc_req(&id), PUB_ERR_NONE);
+    EXPECT_EQ(g_call.m_count, 1);
+    EXPECT_TRUE(g_call.m_is_rsp_clear);
+}
+
+TEST_F(dispatch, pc_request_is_acknowledged_by_whom_its_row_names)
+{
+    const modem_line_c line;
+    hold(envelope(wire_packet(170, "")));
+    uint32_t id = 0;
+    amt_handle_reg_handle_func(AMT_TABLE_PC, 170, serve, amt_ack_en::HANDLER);
+    EXPECT_EQ(handle_amt_pc_req(&id), PUB_ERR_NONE);
+    EXPECT_EQ(line.pc_frames(), texts_t{});
+    /* The app's row of the same id changes nothing for the PC. */
+    amt_handle_reg_handle_func(AMT_TABLE_APP, 170, serve, amt_ack_en::DISPATCHER);
+    EXPECT_EQ(handle_amt_pc_req(&id), PUB_ERR_NONE);
+    EXPECT_EQ(line.pc_frames(), texts_t{});
+    amt_handle_reg_handle_func(AMT_TABLE_PC, 170, serve);
+    EXPECT_EQ(handle_amt_pc_req(&id), PUB_ERR_NONE);
+    EXPECT_EQ(line.pc_frames(), texts_t{ACK});
+}
 
 TEST_F(dispatch, pc_request_is_acknowledged_and_goes_to_its_handler)
 {
@@ -199,30 +242,31 @@ TEST_F(dispatch, pc_requests_lead_to_mode_1)
 {
     const modem_line_c line;
     amt_handle_reg_handle_func(AMT_TABLE_PC, 170, serve);
-    for (const int mode : {AMT_MODE_1, AMT_MODE_3, AMT_MODE_4}) {
+    for (const amt_mode_en mode : {amt_mode_en::PC_PACKETS, amt_mode_en::APP, amt_mode_en::PC_TEXT}) {
         for (const uint8_t id : {uint8_t{170}, uint8_t{9}}) {
             g_handle_state.m_amt_mode = mode;
             hold(envelope(wire_packet(id, "")));
             const log_capture_c capture;
             uint32_t ignored = 0;
             handle_amt_pc_req(&ignored);
-            EXPECT_EQ(g_handle_state.m_amt_mode, AMT_MODE_1);
-            EXPECT_EQ(capture.count_containing("mark to enter amt1"), mode == AMT_MODE_1 ? 0 : 1);
+            EXPECT_EQ(g_handle_state.m_amt_mode, amt_mode_en::PC_PACKETS);
+            EXPECT_EQ(capture.count_containing("mark to enter amt1"),
+                      mode == amt_mode_en::PC_PACKETS ? 0 : 1);
         }
     }
     /* Text does not. */
-    g_handle_state.m_amt_mode = AMT_MODE_4;
+    g_handle_state.m_amt_mode = amt_mode_en::PC_TEXT;
     hold("AT^DSVER\r");
     uint32_t id = 0;
     EXPECT_EQ(handle_amt_pc_req(&id), PUB_ERR_NOT_FOUND);
-    EXPECT_EQ(g_handle_state.m_amt_mode, AMT_MODE_4);
+    EXPECT_EQ(g_handle_state.m_amt_mode, amt_mode_en::PC_TEXT);
 }
 
 TEST_F(dispatch, version_request_is_acknowledged_by_its_handler)
 {
     /* Under whatever id: it asks for no module that there is, which the handler finds out first. */
     const modem_line_c line;
-    amt_handle_reg_handle_func(AMT_TABLE_PC, 200, handle_amt_pc_req_version);
+    amt_handle_reg_handle_func(AMT_TABLE_PC, 200, handle_amt_pc_req_version, amt_ack_en::HANDLER);
     hold(envelope(wire_packet(200, "")));
     uint32_t id = 0;
     EXPECT_EQ(handle_amt_pc_req(&id), PUB_ERR_FAIL);

@@ -1,4 +1,4 @@
-#include "amt/amt-handle/reader/usb-monitor.h"
+#include "amt/amt-handle/reader/reader.h"
 
 #include <sys/resource.h>
 #include <time.h>
@@ -23,7 +23,7 @@ constexpr int SEEN = 64;
 {
     const rlimit none = {0, 0};
     setrlimit(RLIMIT_NOFILE, &none);
-    g_handle_state.m_usb_state = AMT_USB_UNKNOWN;
+    g_handle_state.m_usb_state = amt_usb_en::UNKNOWN;
     const log_capture_c capture;
     const clock_t begin = clock();
     amt_worker_start(&g_handle_context.m_usb_monitor, amt_handle_monitor_usb_loop);
@@ -38,7 +38,7 @@ constexpr int SEEN = 64;
 /* Runs the monitor until it finds the link disconnected, which ends the process. */
 [[noreturn]] void monitor_a_disconnected_link()
 {
-    g_handle_state.m_usb_state = AMT_USB_DISCONNECTED;
+    g_handle_state.m_usb_state = amt_usb_en::DISCONNECTED;
     g_usb_activate = 0;
     amt_worker_start(&g_handle_context.m_usb_monitor, amt_handle_monitor_usb_loop);
     for (;;) {
