@@ -2,11 +2,8 @@
 
 #include <string_view>
 
-#include "amt/amt-handle/at/at-factory.h"
-#include "amt/amt-handle/at/at-handset.h"
-#include "amt/amt-handle/at/at-radio.h"
+#include "amt/amt-handle/at/at-handler.h"
 #include "amt/amt-handle/channel/context.h"
-#include "amt/amt-handle/reader/modem-write.h"
 #include "amt/amt-log.h"
 #include "pub/error.h"
 

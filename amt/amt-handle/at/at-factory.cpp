@@ -1,4 +1,4 @@
-#include "amt/amt-handle/at/at-factory.h"
+#include "amt/amt-handle/at/at-handler.h"
 
 #include <errno.h>
 #include <stdint.h>

@@ -1,4 +1,4 @@
-#include "amt/amt-handle/at/at-handset.h"
+#include "amt/amt-handle/at/at-handler.h"
 
 #include <stdint.h>
 

@@ -1,4 +1,4 @@
-#include "amt/amt-handle/at/at-radio.h"
+#include "amt/amt-handle/at/at-handler.h"
 
 #include <stdint.h>
 #include <stdlib.h>

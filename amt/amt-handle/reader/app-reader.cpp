@@ -1,4 +1,4 @@
-#include "amt/amt-handle/reader/app-reader.h"
+#include "amt/amt-handle/reader/reader.h"
 
 #include <errno.h>
 #include <pthread.h>
@@ -6,11 +6,10 @@
 
 #include "amt/amt-handle/channel/context.h"
 #include "amt/amt-handle/channel/service-process.h"
-#include "amt/amt-handle/channel/wait.h"
 #include "amt/amt-handle/reader/dispatch.h"
+#include "amt/amt-handle/reader/line-reader.h"
 #include "amt/amt-log.h"
 #include "pub/error.h"
-#include "pub/util/thread-end.h"
 
 namespace {
 
@@ -45,9 +44,7 @@ void give_up_pty()
 bool handle_empty_read(ssize_t count)
 {
     if (count == 0) {
-        PUB_LOG(g_amt_handle_log, "WARNING !");
-        PUB_LOG(g_amt_handle_log, "app read empty data");
-        pub_util_sleep_ms(EMPTY_READ_PAUSE_MS);
+        amt_reader_rest("app read empty data", EMPTY_READ_PAUSE_MS);
         return true;
     }
     if (errno == EIO) {
@@ -59,15 +56,11 @@ bool handle_empty_read(ssize_t count)
 
 bool read_and_serve()
 {
-    amt_buf_st *const req_ptr = &g_handle_context.m_req;
     const ssize_t count =
-        amt_wait_read(g_handle_context.m_pty.m_ptm_fd, req_ptr->m_buf_a + req_ptr->m_buf_len,
-                      AMT_HELD_SIZE - req_ptr->m_buf_len);
+        amt_reader_read(g_handle_context.m_pty.m_ptm_fd, &g_handle_context.m_req, "handle APP req data: ");
     if (count <= 0) {
         return handle_empty_read(count);
     }
-    req_ptr->m_buf_len += static_cast<uint32_t>(count);
-    pub_log_dump(g_amt_handle_log, "handle APP req data: ", req_ptr->m_buf_a, req_ptr->m_buf_len);
     handle_amt_app_req();
     return true;
 }

@@ -1,16 +1,13 @@
-#include "amt/amt-handle/reader/modem-reader.h"
+#include "amt/amt-handle/reader/reader.h"
 
 #include <errno.h>
 #include <unistd.h>
 
 #include "amt/amt-handle/channel/context.h"
-#include "amt/amt-handle/channel/process-end.h"
-#include "amt/amt-handle/channel/service-process.h"
-#include "amt/amt-handle/channel/wait.h"
 #include "amt/amt-handle/handshake.h"
 #include "amt/amt-handle/reader/identity-write.h"
+#include "amt/amt-handle/reader/line-reader.h"
 #include "amt/amt-log.h"
-#include "pub/util/thread-end.h"
 
 namespace {
 
@@ -22,16 +19,10 @@ bool read_chunk()
     amt_buf_st *const buf_ptr = &g_handle_context.m_modem;
     const int fd = g_handle_context.m_fd_modem;
     PUB_LOG(g_amt_handle_log, "read_modem_loop, read ready, m_fd_modem=%d", fd);
-    const ssize_t count =
-        amt_wait_read(fd, buf_ptr->m_buf_a + buf_ptr->m_buf_len, AMT_HELD_SIZE - buf_ptr->m_buf_len);
-    if (count < 1) {
-        PUB_LOG(g_amt_handle_log, "WARNING !");
-        PUB_LOG(g_amt_handle_log, "modem read empty data");
-        pub_util_sleep_ms(EMPTY_READ_PAUSE_MS);
+    if (amt_reader_read(fd, buf_ptr, "receive Modem data: ") < 1) {
+        amt_reader_rest("modem read empty data", EMPTY_READ_PAUSE_MS);
         return false;
     }
-    buf_ptr->m_buf_len += static_cast<uint32_t>(count);
-    pub_log_dump(g_amt_handle_log, "receive Modem data: ", buf_ptr->m_buf_a, buf_ptr->m_buf_len);
     return true;
 }
 
@@ -49,11 +40,6 @@ bool pass_to_pc()
     }
     amt_handle_clear_buf(buf_ptr);
     return true;
-}
-
-bool is_line_open()
-{
-    return g_handle_context.m_fd_pc >= 1 && g_handle_context.m_fd_modem >= 1;
 }
 
 /* Whether the loop goes on. */
@@ -76,12 +62,7 @@ void amt_handle_read_modem_loop()
 {
     amt_handle_clear_buf(&g_handle_context.m_modem);
     pub_log_entry(g_amt_handle_log);
-    while (is_line_open() && read_and_pass()) {
-        if (!amt_service_process_is_own()) {
-            _exit(0);
-        }
+    while (amt_reader_is_pc_path_open() && read_and_pass()) {
     }
-    amt_handle_close_fd(&g_handle_context.m_fd_modem);
-    amt_worker_leave(&g_handle_context.m_modem_reader);
-    amt_process_end();
+    amt_reader_end(&g_handle_context.m_fd_modem, &g_handle_context.m_modem_reader);
 }

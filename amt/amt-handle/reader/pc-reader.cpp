@@ -1,20 +1,17 @@
-#include "amt/amt-handle/reader/pc-reader.h"
+#include "amt/amt-handle/reader/reader.h"
 
 #include <unistd.h>
 
 #include "amt/amt-handle/at/at-command.h"
-#include "amt/amt-handle/at/at-probe.h"
 #include "amt/amt-handle/channel/context.h"
-#include "amt/amt-handle/channel/process-end.h"
 #include "amt/amt-handle/channel/reply.h"
 #include "amt/amt-handle/channel/service-process.h"
-#include "amt/amt-handle/channel/wait.h"
 #include "amt/amt-handle/handshake.h"
 #include "amt/amt-handle/reader/dispatch.h"
 #include "amt/amt-handle/reader/identity-write.h"
+#include "amt/amt-handle/reader/line-reader.h"
 #include "amt/amt-log.h"
 #include "pub/error.h"
-#include "pub/util/thread-end.h"
 
 namespace {
 
@@ -49,30 +46,20 @@ bool read_and_serve()
     amt_buf_st *const req_ptr = &g_handle_context.m_req;
     const int fd = g_handle_context.m_fd_pc;
     PUB_LOG(g_amt_handle_log, "read_pc_loop, read ready, m_fd_pc=%d", fd);
-    const ssize_t count =
-        amt_wait_read(fd, req_ptr->m_buf_a + req_ptr->m_buf_len, AMT_HELD_SIZE - req_ptr->m_buf_len);
+    const ssize_t count = amt_reader_read(fd, req_ptr, "handle PC req data: ");
     if (count < 0) {
         pub_log_sys_call(g_amt_handle_log, "read");
         return false;
     }
     if (count == 0) {
-        PUB_LOG(g_amt_handle_log, "WARNING !");
-        PUB_LOG(g_amt_handle_log, "pc read empty data");
-        pub_util_sleep_ms(EMPTY_READ_PAUSE_MS);
+        amt_reader_rest("pc read empty data", EMPTY_READ_PAUSE_MS);
         return true;
     }
-    req_ptr->m_buf_len += static_cast<uint32_t>(count);
-    pub_log_dump(g_amt_handle_log, "handle PC req data: ", req_ptr->m_buf_a, req_ptr->m_buf_len);
     if (amt_handshake_pc_data()) {
         amt_handshake_show_success();
     }
     amt_at_probe_rewrite();
     return serve_request();
-}
-
-bool is_line_open()
-{
-    return g_handle_context.m_fd_pc > 0 && g_handle_context.m_fd_modem > 0;
 }
 
 } // namespace
@@ -82,12 +69,10 @@ void amt_handle_read_pc_loop()
     amt_handle_clear_buf(&g_handle_context.m_req);
     amt_handle_clear_buf(&g_handle_context.m_rsp_pc);
     pub_log_entry(g_amt_handle_log);
-    while (is_line_open() && read_and_serve()) {
+    while (amt_reader_is_pc_path_open() && read_and_serve()) {
         if (!amt_service_process_is_own()) {
             _exit(0);
         }
     }
-    amt_handle_close_fd(&g_handle_context.m_fd_pc);
-    amt_worker_leave(&g_handle_context.m_pc_reader);
-    amt_process_end();
+    amt_reader_end(&g_handle_context.m_fd_pc, &g_handle_context.m_pc_reader);
 }

@@ -1,4 +1,4 @@
-#include "amt/amt-handle/reader/modem-write.h"
+#include "amt/amt-handle/at/at-command.h"
 
 #include <errno.h>
 #include <stdint.h>
