@@ -200,12 +200,18 @@ def test_texts_that_are_not_quite_commands(pc: PcChannel) -> None:
     trace = Trace(pc.handset)
     for text in (b"AT^DSVER?\r", b"AT^DSVER", b"AT^DSVER\n", b"at^dsver\r", b"AT^DEMMCINFO?\n",
                  b"AT^DBTADDR?", b"AT^DBTADDR=12\r", b"AT^DBTCTRL\r", b"AT^DAMTOFF",
-                 b"AT^DAMTOFF?\r", b"AT ^DSVER\r", b"AT^dENTERIDLE\r", b"ATI\r", b"\r\nOK\r\n",
-                 b"\0AT^DENTERIDLE\r"):
+                 b"AT^DAMTOFF?\r", b"AT ^DSVER\r", b"AT^dENTERIDLE\r", b"ATI\r", b"\r\nOK\r\n"):
         pc.send(text)
         assert pc.handset.modem.read_exactly(len(text)) == text
     pc.expect_silence(0.1)
     assert trace.calls() == []
+
+
+def test_command_behind_zero_bytes_is_found(pc: PcChannel) -> None:
+    trace = Trace(pc.handset)
+    pc.send(b"\0\0AT^DENTERIDLE\r")
+    assert pc.line.read_exactly(len(OK)) == OK.encode()
+    assert len(trace.calls()) == 1
 
 
 def test_replies_are_logged(pc_handset: Handset) -> None:

@@ -253,3 +253,10 @@ def test_a_full_file_system(desk: Desk) -> None:
                  "save imei to file. channel:0; content:42;",
                  error_line("handle_amt_imei_and_sn_save_file", -100, 28), "write imei error.")
     trace.expect_none("write pcba-sn: 42", "Writed imei to file success.")
+
+
+def test_ok_behind_an_envelope_is_an_acceptance(desk: Desk) -> None:
+    # The zero bytes of the modem's packet do not hide what it says behind it, in the same breath.
+    desk.pass_on(f"AT^DCGSNW={IMEI}\r".encode())
+    desk.answer(answer_packet(90, 0) + OK)
+    assert desk.files() == {"/amt/imei.txt": IMEI}
