@@ -12,7 +12,7 @@ from typing import Any, Protocol
 
 import serial
 
-from amt_station.errors import NoAnswer, NoPort, PortBusy
+from amt_station.errors import NoAnswer, NoPort, PortBusy, UsageProblem
 
 _CHUNK = 4096
 _BUSY = (errno.EBUSY, errno.EAGAIN, errno.EWOULDBLOCK)
@@ -106,7 +106,7 @@ class FdPort:
         """As in ``Port``."""
         if self._owned:
             os.close(self._fd)
-            self._owned = False
+            self._fd, self._owned = -1, False
 
 
 class SerialPort:
@@ -117,13 +117,16 @@ class SerialPort:
         try:
             self._serial: Any = serial.serial_for_url(
                 url, baudrate=baud, exclusive=True, timeout=_POLL_SECONDS)
-        except ValueError as error:
-            raise NoPort(f"no port {url}: {error}") from error
         except (OSError, serial.SerialException) as error:
             if getattr(error, "errno", None) in _BUSY:
-                raise PortBusy(f"port {url} is busy: somebody else has it open") from error
+                raise PortBusy(f"port {url} is busy: {_who_holds(url)}") from error
             raise NoPort(f"no port {url}: {_reason(error)}") from error
-        self._fd = self._descriptor()
+        except Exception as error:
+            # A URL goes to one of many handlers of pySerial, which raise what they like.
+            if "baud" in str(error).lower():
+                raise UsageProblem(f"{url} does not take {baud} baud") from error
+            raise NoPort(f"no port {url}: {_reason(error)}") from error
+        self._fd: int | None = self._descriptor()
 
     def _descriptor(self) -> int | None:
         try:
@@ -133,6 +136,7 @@ class SerialPort:
 
     def read(self, timeout: float) -> bytes:
         """As in ``Port``."""
+        self._check_open()
         try:
             if self._fd is not None:
                 if not _ready(self._fd, select.POLLIN, timeout):
@@ -141,6 +145,10 @@ class SerialPort:
             return self._poll(timeout)
         except (OSError, serial.SerialException) as error:
             raise NoPort(f"port {self.name} went away: {_reason(error)}") from error
+
+    def _check_open(self) -> None:
+        if not self._serial.is_open:
+            raise NoPort(f"port {self.name} is closed")
 
     def _poll(self, timeout: float) -> bytes:
         """Ports without a descriptor can only be asked again and again."""
@@ -152,6 +160,7 @@ class SerialPort:
 
     def write(self, data: bytes, timeout: float) -> None:
         """As in ``Port``."""
+        self._check_open()
         try:
             if self._fd is not None:
                 _write_all(self._fd, data, timeout, f"port {self.name}")
@@ -165,9 +174,21 @@ class SerialPort:
 
     def close(self) -> None:
         """As in ``Port``."""
+        # The number may become another file's.
+        self._fd = None
         self._serial.close()
 
 
 def _reason(error: Exception) -> str:
     number = getattr(error, "errno", None)
-    return os.strerror(number) if number else str(error).splitlines()[0]
+    if isinstance(number, int) and number:
+        return os.strerror(number)
+    return next(iter(str(error).splitlines()), type(error).__name__)
+
+
+def _who_holds(url: str) -> str:
+    """Who has the port open, as far as this user may know."""
+    from amt_station.found_ports import holders
+
+    names = ", ".join(f"{holder.command} ({holder.pid})" for holder in holders(url))
+    return f"{names} has it open" if names else "somebody else has it open"

@@ -25,12 +25,14 @@ COMMANDS: Mapping[str, Place] = {
     "at": Place("amt_station.cli.at:at", "Send an AT text and show its reply"),
     "commands": Place("amt_station.cli.commands:commands", "List requests and typed commands"),
     "check": Place("amt_line.cli.check:check", "Check a test plan; nothing is sent"),
+    "ports": Place("amt_station.cli.ports:ports", "List the serial ports and who holds one"),
     "recover": Place("amt_station.cli.recover:recover", "Clear what the handset has refused"),
     "report": Place("amt_line.cli.report:report", "Make JUnit, CSV and HTML of records"),
     "run": Place("amt_line.cli.run:run", "Carry out a test plan and keep a record"),
     "schema": Place("amt_line.cli.schema:schema", "Print the schema of plans or records"),
     "send": Place("amt_station.cli.send:send", "Send any request and show its answer"),
     "show": Place("amt_line.cli.show:show", "Print the record of a run"),
+    "wait": Place("amt_station.cli.ports:wait", "Wait for a port to appear"),
 }
 
 

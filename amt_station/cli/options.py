@@ -13,7 +13,9 @@ from amt_station.errors import NoPort, UsageProblem
 from amt_station.requests.model import Channel
 
 if TYPE_CHECKING:
+    from amt_station.found_ports import Wanted
     from amt_station.link import Link
+    from amt_station.port import Port
 
 _Command = TypeVar("_Command", bound=Callable[..., Any])
 
@@ -22,6 +24,7 @@ CHANNEL_VARIABLE = "AMT_STATION_CHANNEL"
 TIMEOUT_VARIABLE = "AMT_STATION_TIMEOUT"
 
 DEFAULT_BAUD = 115200
+AUTO = "auto"
 _FASTEST = 4_000_000
 
 
@@ -34,6 +37,8 @@ class Settings:
     timeout: float | None = None
     baud: int | None = None
     json: bool = False
+    serial: str | None = None
+    vid_pid: str | None = None
 
     def say(self, name: str, value: Any) -> None:
         """Take what an option says; two that contradict each other are refused."""
@@ -63,19 +68,45 @@ class Settings:
             raise UsageProblem(f"{TIMEOUT_VARIABLE}: {error}") from None
 
     @property
+    def wanted(self) -> Wanted | None:
+        """The port that --serial and --vid-pid choose; None without them."""
+        if not self.serial and not self.vid_pid:
+            return None
+        if self.port not in (None, AUTO):
+            raise UsageProblem(f"--port {self.port} and --serial or --vid-pid contradict each "
+                               "other")
+        return self.wanted_port
+
+    @property
+    def wanted_port(self) -> Wanted:
+        """As ``wanted``; without choice any port on USB."""
+        from amt_station.found_ports import Wanted
+
+        return Wanted(self.serial or "", self.vid_pid or "")
+
+    @property
     def chosen_port(self) -> str:
-        """Flag before environment; without either there is no port."""
+        """Flag before environment; the port that is meant where its name is not given."""
+        wanted = self.wanted
+        if wanted is not None:
+            return wanted.find().device
         port = self.port or os.environ.get(PORT_VARIABLE)
         if not port:
             raise NoPort(f"no port named; give --port or set {PORT_VARIABLE}")
-        return port
+        return self.wanted_port.find().device if port == AUTO else port
+
+    def open_port(self) -> Port:
+        """Open the port; one that came back under another name is found again."""
+        from amt_station.port import SerialPort
+
+        return SerialPort(self.chosen_port, self.baud or DEFAULT_BAUD)
 
     def open_link(self) -> Link:
-        """Open the port."""
+        """Open the port with a link on it."""
         from amt_station.link import Link
 
         channel, timeout = self.chosen_channel, self.chosen_timeout
-        return Link.open(self.chosen_port, channel, timeout, self.baud or DEFAULT_BAUD)
+        return Link(self.open_port(), channel, timeout, self.open_port)
 
 
 def seconds_of(text: str) -> float:
@@ -116,7 +147,12 @@ def _remember(context: click.Context, parameter: click.Parameter, value: Any) ->
 _OPTIONS = (
     click.option("-p", "--port", metavar="URL", multiple=True, expose_value=False,
                  callback=_remember,
-                 help=f"Port to the handset, any pySerial URL  [${PORT_VARIABLE}]"),
+                 help="Port to the handset, any pySerial URL, or auto for the only one on USB  "
+                 f"[${PORT_VARIABLE}]"),
+    click.option("--serial", metavar="NUMBER", multiple=True, expose_value=False,
+                 callback=_remember, help="The USB port with this serial number"),
+    click.option("--vid-pid", metavar="VID:PID", multiple=True, expose_value=False,
+                 callback=_remember, help="The USB port with these ids"),
     click.option("--pc", is_flag=True, expose_value=False, callback=_remember,
                  help=f"The port is the PC line (default)  [${CHANNEL_VARIABLE}]"),
     click.option("--app", is_flag=True, expose_value=False, callback=_remember,
