@@ -26,9 +26,8 @@ from amt_line.view.lines import LineView
 from amt_line.view.prompt import Terminal, there_is_a_terminal
 from amt_station import __version__
 from amt_station.cli import console
-from amt_station.cli.options import DEFAULT_BAUD, Settings, common_options
+from amt_station.cli.options import Settings, common_options
 from amt_station.errors import StationError, UsageProblem
-from amt_station.port import SerialPort
 from amt_station.text import printable
 
 _FILE = click.Path(path_type=Path, dir_okay=False)
@@ -152,7 +151,7 @@ def _run(settings: Settings, plan: Plan, wishes: _Wishes, outputs: Outputs) -> i
     where = Where(wishes.station or places.station_name(),
                   wishes.operator or places.operator_name(), url, __version__)
     runner = Runner(plan, values, dut, Setting(
-        lambda: SerialPort(url, settings.baud or DEFAULT_BAUD), where, settings.chosen_timeout,
+        settings.open_port, where, settings.chosen_timeout,
         GivenAnswers(wishes.answers, others), [view], keep))
     try:
         with ending_in_order(runner.abort):
