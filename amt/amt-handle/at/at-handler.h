@@ -23,8 +23,8 @@ int amt_at_read_boot_dl_fin(const char *operands);
 int amt_at_read_emmc_info(const char *operands);
 
 /* at-radio: the platform's radio test library. */
-int amt_at_check_device(const char *operands); /* connectivity of 0: Wi-Fi; 1: GPS; 3: Bluetooth */
-int amt_at_control_bt(const char *operands);   /* 0: stop; 1: start */
-int amt_at_control_gps(const char *operands);  /* 0: stop; 2,index: start and read one satellite */
+int amt_at_check_device(const char *operands);            /* connectivity of 0: Wi-Fi; 1: GPS; 3: Bluetooth */
+int amt_at_control_bt(const char *operands);              /* 0: stop; 1: start */
+int amt_at_control_gps(const char *operands);             /* 0: stop; 2,index: start and read one satellite */
 int handle_amt_device_wifi_tx_ctrl(const char *operands); /* 0: stop; 1,channel,rate,power: start */
 int handle_amt_device_wifi_rx_ctrl(const char *operands); /* 0: stop; 1,channel,rate: start */

@@ -112,7 +112,9 @@ void amt_worker_leave(amt_worker_st *worker_ptr)
     pthread_mutex_lock(&g_record_lock);
     const bool is_being_stopped = worker_ptr->m_id.exchange(0) == 0 && worker_ptr->m_is_alive != 0;
     pthread_mutex_unlock(&g_record_lock);
-    while (is_being_stopped) {
-        pub_util_sleep_ms(LEAVE_PAUSE_MS);
+    if (is_being_stopped) {
+        for (;;) {
+            pub_util_sleep_ms(LEAVE_PAUSE_MS);
+        }
     }
 }

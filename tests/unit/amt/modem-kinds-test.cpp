@@ -3,8 +3,8 @@
 #include <gtest/gtest.h>
 
 #include "amt/amt-handle/channel/context.h"
-#include "amt/amt-handle/request/modem-value.h"
 #include "amt/amt-handle/request/modem-tunnel.h"
+#include "amt/amt-handle/request/modem-value.h"
 #include "amt/amt-handle/request/test-result.h"
 #include "amt/amt-handle/request/version.h"
 #include "pub/error.h"
