@@ -19,7 +19,7 @@ constexpr int32_t LEVEL_DEFAULT = 200;
 constexpr int32_t VIBRATION_MS = 3000;
 
 /* The LCD level found before the first request. Only the reader thread that serves requests uses it. */
-int32_t src_lcd_brightness = LEVEL_UNKNOWN;
+int32_t g_first_lcd_brightness = LEVEL_UNKNOWN;
 
 /* Compared as unsigned on purpose: every negative level is out of range, the unknown one included. */
 bool is_level(int32_t level)
@@ -32,7 +32,7 @@ int32_t level_to_write(int32_t requested)
     if (is_level(requested)) {
         return requested;
     }
-    return is_level(src_lcd_brightness) ? src_lcd_brightness : LEVEL_DEFAULT;
+    return is_level(g_first_lcd_brightness) ? g_first_lcd_brightness : LEVEL_DEFAULT;
 }
 
 } // namespace
@@ -50,12 +50,12 @@ int amt_device_lcd_brightness(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st 
     if (amt_reply_enter(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
-    if (src_lcd_brightness < 0) {
-        amt_device_file_read_int(LCD_FILE, &src_lcd_brightness);
+    if (g_first_lcd_brightness < 0) {
+        amt_device_file_read_int(LCD_FILE, &g_first_lcd_brightness);
     }
     const int32_t requested = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_LCD_LEVEL);
     PUB_LOG(g_amt_device_log, "amt_device_lcd_brightness lcd_brightness: %d", requested);
-    PUB_LOG(g_amt_device_log, "amt_device_lcd_brightness src_lcd_brightness: %d", src_lcd_brightness);
+    PUB_LOG(g_amt_device_log, "amt_device_lcd_brightness src_lcd_brightness: %d", g_first_lcd_brightness);
     if (amt_device_file_write_int(LCD_FILE, level_to_write(requested)) == PUB_ERR_NONE) {
         amt_handle_send_rsp_ok(channel, rsp_ptr, AMT_LCDLIGHT_RSPCMD);
     }

@@ -30,8 +30,8 @@ constexpr amt_radio_step_st RX_STOP_STEP = {&g_amt_device_log, HANDLER, "WIFI-RX
 [[gnu::used]] const char *const g_script_ptr = g_wifi_radio_test_script_a;
 
 /* What outlasts a request; only the reader thread that serves requests uses it. */
-bool wifi_running = false;
-uint8_t wifi_rx_channel = 0;
+bool g_wifi_is_running = false;
+uint8_t g_wifi_rx_channel = 0;
 
 /* A number of the request, little-endian, of 1 or 2 bytes. Returns whether it is there. */
 bool get_number(const amt_buf_st *req_ptr, uint8_t atom_id, uint32_t size, uint16_t *value_ptr)
@@ -61,23 +61,23 @@ int fail(const char *text, const amt_device_place_st &place = {HANDLER})
 
 int start_wifi(const amt_buf_st *, amt_buf_st *)
 {
-    if (wifi_running) {
+    if (g_wifi_is_running) {
         return PUB_ERR_NONE;
     }
     amt_radio_step_start(START_STEP);
     const int status = amt_radio_step_end(START_STEP, ldt_wifiCtrl(1));
-    wifi_running = status == PUB_ERR_NONE;
+    g_wifi_is_running = status == PUB_ERR_NONE;
     return status;
 }
 
 int stop_wifi(const amt_buf_st *, amt_buf_st *)
 {
-    if (!wifi_running) {
+    if (!g_wifi_is_running) {
         return PUB_ERR_NONE;
     }
     amt_radio_step_start(STOP_STEP);
     const int status = amt_radio_step_end(STOP_STEP, ldt_wifiCtrl(0));
-    wifi_running = status != PUB_ERR_NONE;
+    g_wifi_is_running = status != PUB_ERR_NONE;
     return status;
 }
 
@@ -118,7 +118,7 @@ int start_rx(const amt_buf_st *req_ptr, amt_buf_st *)
     PUB_LOG(g_amt_device_log, "WIFI-RX-start start. channel:%d; rate:%d", channel, rate);
     const int status = amt_radio_step_end(RX_START_STEP, ldt_RxTest(1, channel, rate, nullptr));
     if (status == PUB_ERR_NONE) {
-        wifi_rx_channel = static_cast<uint8_t>(channel);
+        g_wifi_rx_channel = static_cast<uint8_t>(channel);
     }
     return status;
 }
@@ -127,8 +127,8 @@ int start_rx(const amt_buf_st *req_ptr, amt_buf_st *)
 int stop_rx(const amt_buf_st *, amt_buf_st *rsp_ptr)
 {
     int32_t count = 0;
-    PUB_LOG(g_amt_device_log, "WIFI-RX-stop start. channel:%d", wifi_rx_channel);
-    const int32_t stopped = ldt_RxTest(0, wifi_rx_channel, 0, &count);
+    PUB_LOG(g_amt_device_log, "WIFI-RX-stop start. channel:%d", g_wifi_rx_channel);
+    const int32_t stopped = ldt_RxTest(0, g_wifi_rx_channel, 0, &count);
     PUB_LOG(g_amt_device_log, "WIFI-RX-stop end. return:%d; cnt:%d.", stopped, count);
     const int status = amt_radio_step_check(RX_STOP_STEP, stopped);
     if (status == PUB_ERR_NONE) {
@@ -158,7 +158,7 @@ int operate(uint8_t sub_command, const amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
         return PUB_ERR_PARAM;
     }
     const sub_command_st &row = SUB_COMMAND_A[sub_command - 1];
-    if (row.m_needs_wifi && !wifi_running) {
+    if (row.m_needs_wifi && !g_wifi_is_running) {
         return fail("WIFI is not running");
     }
     return row.m_func(req_ptr, rsp_ptr);

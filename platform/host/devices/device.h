@@ -5,7 +5,7 @@
 #include "platform/host/devices/device-state.h"
 
 /* How the argument of a request is to be understood, and shown in the record. */
-enum device_argument
+enum device_argument_en
 {
     DEVICE_ARGUMENT_OUT,    /* points to what the request fills in */
     DEVICE_ARGUMENT_SCREEN, /* points to the framebuffer's variable information */
@@ -26,7 +26,7 @@ struct device_request_st
 {
     unsigned long m_number;
     const char *m_name_ptr;
-    device_argument m_argument;
+    device_argument_en m_argument;
     uint32_t m_value_index;
     uint32_t m_limit;
     device_serve_func m_serve_ptr; /* null for a request of one value */
