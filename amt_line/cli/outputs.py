@@ -41,6 +41,7 @@ class Outputs:
         self._paths = {name: path for name, path in paths.items() if path is not None}
         if len({path.resolve() for path in self._paths.values()}) != len(self._paths):
             raise UsageProblem("two reports would go into one file")
+        self._new = {name for name, path in self._paths.items() if not path.exists()}
         for name, path in self._paths.items():
             try:
                 # Appending opens without emptying.
@@ -55,6 +56,7 @@ class Outputs:
         for name, file in self._files.items():
             try:
                 text = MAKERS[name](records)
+                self._new.discard(name)
                 if file.seekable():
                     file.seek(0)
                     file.truncate()
@@ -66,9 +68,11 @@ class Outputs:
             raise failure
 
     def close(self) -> None:
-        """Give the files back."""
-        for file in self._files.values():
+        """Give the files back; what was made only by opening goes away again."""
+        for name, file in self._files.items():
             try:
                 file.close()
+                if name in self._new:
+                    self._paths[name].unlink(missing_ok=True)
             except OSError:
                 pass  # told by the writing

@@ -6,7 +6,7 @@ from dataclasses import dataclass
 from decimal import Decimal
 from typing import Any, Mapping
 
-from amt_line.plan.measure import Measure
+from amt_line.plan.measure import Measure, digits
 from amt_line.plan.pattern import BadPattern, compiled, is_found
 from amt_line.plan.references import Scalar, fill, names, only_reference
 
@@ -158,7 +158,8 @@ class Bounds:
         return ""
 
     def _unmatched(self, exact: Decimal | str) -> str:
-        if not self.pattern or is_found(self.pattern, str(exact)):
+        text = exact if isinstance(exact, str) else digits(exact)
+        if not self.pattern or is_found(self.pattern, text):
             return ""
         return f"{self._shown(exact)} does not match {self.pattern!r}"
 

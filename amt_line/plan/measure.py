@@ -82,6 +82,10 @@ class Measure:
         """A value for people."""
         if isinstance(exact, str):
             return repr(exact)
-        word = self.word(exact)
-        number = format(exact.normalize(), "f") if exact else "0"
+        word, number = self.word(exact), digits(exact)
         return word or (f"{number} {self.unit}" if self.unit else number)
+
+
+def digits(number: Decimal) -> str:
+    """An exact number without an exponent and without zeros that say nothing."""
+    return format(number.normalize(), "f") if number else "0"

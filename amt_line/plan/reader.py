@@ -36,7 +36,7 @@ def load_plan(path: Path, channel: Channel) -> Plan:
 def _load(path: Path, channel: Channel) -> Plan:
     data = _read(path)
     try:
-        content = tomllib.loads(data.decode("utf-8"))
+        content = tomllib.loads(data.decode("utf-8-sig"))
     except ValueError as error:
         raise PlanProblem(str(path), [Problem("", "", str(error))]) from error
     problems = [*_odd_numbers(content, ""), *schema_problems(content)]

@@ -2,6 +2,7 @@
 
 from __future__ import annotations
 
+import time
 from dataclasses import dataclass, field
 from typing import Any, Callable, Mapping
 
@@ -143,8 +144,15 @@ def _enter(filled: Filled, tools: Tools) -> list[Value]:
 
 
 def _answer(question: Question, step: Step, tools: Tools) -> Answer:
+    end = time.monotonic() + step.timeout if step.timeout is not None else None
+
+    def check() -> None:
+        tools.check()
+        if end is not None and time.monotonic() > end:
+            raise StationTrouble(f"the operator did not answer within {step.timeout:g} s")
+
     tools.asked(question)
-    answer = tools.operator.answer(question, tools.check)
+    answer = tools.operator.answer(question, check)
     if answer is None:
         raise StationTrouble("there is nobody to ask: no terminal, and no --answer")
     if not is_answer(question, answer.text):

@@ -113,6 +113,7 @@ def test_usage_is_told_and_nothing_is_sent(tmp_path: Path, peer: Peer, arguments
         stdin=subprocess.DEVNULL, capture_output=True, text=True, timeout=120, check=False)
     assert result.returncode == 2, result.stderr
     assert words in result.stderr and peer.raw == b""
+    assert {path.name for path in tmp_path.iterdir()} == {"inputs.csv", "line.toml"}
     assert len(result.stderr.splitlines()) == 1
 
 

@@ -38,6 +38,7 @@ PLAIN = Measure("x", True)
     (VOLT, {"min": "3.6 V", "max": "4.4 V"}, 3600000, ""),
     (VOLT, {"min": "3.6 V", "max": "4.4 V"}, 3599999, "voltage 3.599999 V is below 3.6 V"),
     (VOLT, {"max": "4400 mV"}, 4400001, "voltage 4.400001 V is above 4.4 V"),
+    (VOLT, {"matches": r"^3\.6$"}, 3600000, ""),
     (VOLT, {"max": 4.4}, 4400000, ""), (VOLT, {"equals": "3.6V"}, 3600000, ""),
     (VOLT, {"min": "3.6 V"}, 3, "below"), (VOLT, {"max": "4200000 µV"}, 4200000, ""),
 ])

@@ -5,18 +5,19 @@ from __future__ import annotations
 import threading
 import time
 from pathlib import Path
-from typing import Any
+from typing import Any, Callable
 
 import pytest
 from line_bench import ADC, OK, Bench, Script, adc, in_thread, load, verdicts
 from station_peer import Peer, error_packet, ok
 
+from amt_line.run.operator import Answer, Question
 from amt_line.run.stop import INTERRUPTED, TERMINATED
 from amt_station.errors import NoPort
-from amt_station.port import Port
+from amt_station.port import FdPort, Port
 from amt_station.requests.model import Channel
 from amt_station.wire import ACKNOWLEDGEMENT, Atom, Frame, Packet
-from amt_station.wire.decoder import Item
+from amt_station.wire.decoder import EnvelopeDecoder, Item
 
 FLUSH = "AT^DBTADDR=?"
 WRITE_VERDICT = ("[[always]]\ncommand = 'test-result write'\n"
@@ -185,6 +186,54 @@ def test_a_held_packet_ends_the_run_with_the_advice(tmp_path: Path, peer: Peer) 
     assert "unplug" in document["steps"][1]["reason"] and "unplug" in document["advice"]
 
 
+class Hand:
+    """An operator who pulls the cable when asked to."""
+
+    def answer(self, question: Question, check: Callable[[], None]) -> Answer | None:
+        """As in ``Operator``: never an answer."""
+        while question:
+            check()
+            time.sleep(0.02)
+        return None
+
+    def can_act(self) -> bool:
+        """As in ``Operator``."""
+        return True
+
+
+def test_an_operator_is_asked_to_unplug_and_the_run_goes_on(tmp_path: Path, peer: Peer) -> None:
+    flushes: list[Item] = []
+
+    def held(item: Item) -> list[bytes]:
+        if isinstance(item, Frame):
+            return [ACKNOWLEDGEMENT, error_packet(225)]
+        flushes.append(item)
+        return [OK] if len(flushes) == 1 else [error_packet(225)]
+
+    second = Peer(EnvelopeDecoder())
+    second.script = script(15)
+    peer.script = held
+    left = [peer, second]
+
+    def pull(event: dict[str, Any]) -> None:
+        if event["event"] == "notice":
+            peer.hang_up()
+
+    bench = Bench(load(tmp_path, ADC + ADC), peer, operator=Hand(), on_event=pull,
+                  open_port=lambda: FdPort(left.pop(0).slave))
+    document = bench.run()
+    second.close()
+    assert verdicts(document) == ["fail", "pass"]
+    notice = next(event for event in bench.events if event["event"] == "notice")
+    assert "unplug the USB cable" in notice["text"]
+
+
+def test_an_operator_who_does_not_answer(tmp_path: Path, peer: Peer) -> None:
+    peer.script = Script()
+    document = Bench(load(tmp_path, ASK + "timeout = 0.2\n"), peer, operator=Hand()).run()
+    assert verdicts(document) == ["error"] and "within 0.2 s" in document["reason"]
+
+
 def test_a_lost_port_skips_the_rest(tmp_path: Path, peer: Peer) -> None:
     def gone() -> Port:
         raise NoPort("no port /dev/x")
@@ -301,8 +350,6 @@ def test_a_view_that_fails_harms_nobody(tmp_path: Path, peer: Peer) -> None:
 
 
 def test_runs_side_by_side(tmp_path: Path) -> None:
-    from amt_station.wire.decoder import EnvelopeDecoder
-
     peers = [Peer(EnvelopeDecoder()) for _ in range(4)]
     plan = load(tmp_path, ADC * 10)
     documents: dict[int, Any] = {}
@@ -323,9 +370,6 @@ def test_runs_side_by_side(tmp_path: Path) -> None:
 
 
 def test_a_port_that_goes_and_comes_back(tmp_path: Path, peer: Peer) -> None:
-    from amt_station.port import FdPort
-    from amt_station.wire.decoder import EnvelopeDecoder
-
     second = Peer(EnvelopeDecoder())
     second.script = script(15)
     first_script = Script()
