@@ -7,6 +7,8 @@
 #include "amt/amt-command.def"
 #undef AMT_COMMAND
 
-/* The name of every command id, indexed by the id; "(undefined)" for an id that the catalogue does not have.
+/*
+ * The name of every command id, indexed by the id; "(undefined)" for an id that the catalogue does not have.
+ * Every value of a byte is an index.
  */
 extern const char *const amt_cmd_name_table[256];
