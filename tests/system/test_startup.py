@@ -1,6 +1,8 @@
 """What a start does before and while it opens its lines: folders, tables, the two paths."""
 
 import re
+import subprocess
+from pathlib import Path
 
 import pytest
 
@@ -171,3 +173,30 @@ def test_start_against_a_dead_folder_fails_as_described(make_handset: HandsetFac
                            config={"vx.tty.app": "/nowhere/ttyAPP0"})
     assert handset.wait_exit() == -118 & 0xFF
     assert handset.log.find(error_line("main", -118, source="amt/main"))
+
+
+# a system with one thread to give, by a library in the place of the usual one
+
+ONE_THREAD = Path(__file__).with_name("support") / "one_thread.c"
+CUTILS, OTHER = "/system/lib/libcutils.so", "/system/lib/libcutils-other.so"
+
+
+@pytest.mark.parametrize("mode, path, line", [
+    ("pc", "init_for_amt_1_4", "pthread_create(): 11 - Resource temporarily unavailable"),
+    ("packet", "init_for_amt_2_3", "pthread_create() fail: 11")])
+def test_start_without_a_thread_names_its_path(make_handset: HandsetFactory, tmp_path: Path,
+                                               mode: str, path: str, line: str) -> None:
+    library = tmp_path / "libcutils.so"
+    subprocess.run(["cc", "-shared", "-fPIC", "-O1", "-o", library, ONE_THREAD], check=True)
+    handset = make_handset(mode, ready=False, start=False, restart=False)
+    if handset.program.sanitizer:
+        pytest.skip("the sanitizer makes the threads itself")
+    handset.place(OTHER, handset.read(CUTILS))
+    handset.place(CUTILS, library)
+    handset.start()
+    assert handset.wait_exit() == -118 & 0xFF
+    texts = handset.log.texts(TAG)
+    place = texts.index(line)
+    assert re.fullmatch(rf"FILE-amt/amt-handle, LINE-\d+, FUNC-{path}\(\), error_code=-118, "
+                        "errno=11", texts[place - 1])
+    assert "FATAL ERROR!!!" in texts[place:]

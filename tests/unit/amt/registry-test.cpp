@@ -143,6 +143,17 @@ TEST_F(registry, fills_both_tables)
     EXPECT_EQ(make_table(g_pc_served).size(), 18U);
 }
 
+TEST_F(registry, leaves_two_acknowledgements_to_their_handlers)
+{
+    amt_handle_register_all();
+    for (uint32_t id = 0; id < AMT_HANDLE_FUNC_COUNT; id++) {
+        const bool is_handlers = id == AMT_VERSION_CMD || id == AMT_WRITE_TEST_RESULT_CMD;
+        EXPECT_EQ(g_handle_context.m_pc_ack_a[id],
+                  is_handlers ? amt_ack_en::HANDLER : amt_ack_en::DISPATCHER)
+            << id;
+    }
+}
+
 TEST_F(registry, logs_each_row_and_the_one_replaced)
 {
     const log_capture_c capture;
