@@ -19,11 +19,6 @@ constexpr char READ_HANDLER[] = "amt_gps_read_result";
 constexpr int32_t OPERATION_STOP = 0;
 constexpr int32_t OPERATION_CHECK = 2;
 
-/* Operations of ldt_gpsCtrl. */
-constexpr int32_t GPS_STOP = 0;
-constexpr int32_t GPS_START = 1;
-constexpr int32_t GPS_READ_SIGNAL = 2;
-
 constexpr amt_radio_step_st CHECK_STEP = {&g_amt_gps_log, CONTROL_HANDLER, "GPS connectivity check",
                                           "ldt_gpsCheck"};
 constexpr amt_radio_step_st STOP_STEP = {&g_amt_gps_log, CONTROL_HANDLER, "GPS stop", "ldt_gpsCtrl"};
@@ -49,9 +44,9 @@ int operate(int32_t operation)
     case OPERATION_CHECK:
         return check_connectivity();
     case OPERATION_STOP:
-        return switch_gps(STOP_STEP, GPS_STOP);
+        return switch_gps(STOP_STEP, LDT_STOP);
     default:
-        return switch_gps(START_STEP, GPS_START);
+        return switch_gps(START_STEP, LDT_START);
     }
 }
 
@@ -87,7 +82,7 @@ int amt_gps_read_result(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_p
     PUB_LOG(g_amt_gps_log, "GPS-READ-SIGNAL start. index:%d", index);
     int32_t svid = 0;
     int32_t cnr = 0;
-    const int32_t answered = ldt_gpsCtrl(GPS_READ_SIGNAL, index, &svid, &cnr);
+    const int32_t answered = ldt_gpsCtrl(LDT_GPS_READ_SIGNAL, index, &svid, &cnr);
     PUB_LOG(g_amt_gps_log, "GPS-READ-SIGNAL end. return:%d; svid:%d; cnr:%d.", answered, svid, cnr);
     if (amt_radio_step_check(READ_STEP, answered) != PUB_ERR_NONE) {
         return PUB_ERR_FAIL;

@@ -7,6 +7,11 @@
 
 #include <stdint.h>
 
+/* What the operations below are told to do. */
+constexpr int32_t LDT_STOP = 0;
+constexpr int32_t LDT_START = 1;
+constexpr int32_t LDT_GPS_READ_SIGNAL = 2;
+
 extern "C" {
 /* Bluetooth chip: on = 1 switches it on for testing, 0 off. */
 int32_t ldt_btCtrl(int32_t on);

@@ -22,7 +22,7 @@ constexpr uint32_t LINE_SIZE = 100;
 constexpr int PCBA_READ = 1;
 constexpr int PCBA_WRITE = 2;
 
-int fail_param(const char *func, int line, const char *text)
+int fail_param(const char *text, const char *func = __builtin_FUNCTION(), int line = __builtin_LINE())
 {
     pub_log_error(g_amt_handle_log, PUB_ERR_PARAM, func, line);
     PUB_LOG(g_amt_handle_log, "%s", text);
@@ -82,9 +82,6 @@ int reply_pcba_sn()
 
 int write_pcba_sn(const char *sn)
 {
-    if (sn == nullptr) {
-        return fail_param("amt_at_control_pcba", __LINE__, "pcba-sn is null!!!");
-    }
     char sn_a[AMT_PCBA_SN_SIZE];
     snprintf(sn_a, sizeof(sn_a), "%s", sn);
     if (amt_write_pcba_sn(sn_a, AMT_PCBA_SN_FILE) != PUB_ERR_NONE) {
@@ -139,14 +136,15 @@ int amt_at_control_pcba(const char *operands)
     amt_at_operands_init(&list, operands);
     const char *const type_ptr = amt_at_operands_next(&list);
     if (type_ptr == nullptr) {
-        return fail_param(__func__, __LINE__, "type is null!!!");
+        return fail_param("type is null!!!");
     }
     const int type = atoi(type_ptr);
     if (type == PCBA_READ) {
         return reply_pcba_sn();
     }
     if (type == PCBA_WRITE) {
-        return write_pcba_sn(amt_at_operands_next(&list));
+        const char *const sn = amt_at_operands_next(&list);
+        return sn != nullptr ? write_pcba_sn(sn) : fail_param("pcba-sn is null!!!");
     }
     pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
     PUB_LOG(g_amt_handle_log, "unknown operation type: %u", static_cast<unsigned>(type));
@@ -159,7 +157,7 @@ int amt_at_control_permission(const char *operands)
     amt_at_operands_init(&list, operands);
     const char *const type_ptr = amt_at_operands_next(&list);
     if (type_ptr == nullptr) {
-        return fail_param(__func__, __LINE__, "type is null!!!");
+        return fail_param("type is null!!!");
     }
     const int type = atoi(type_ptr);
     int flag = 0;

@@ -13,8 +13,8 @@ constexpr uint32_t AMT_AT_PARA_SIZE = 20;
 /*
  * The parameter behind prefix in the held request: leading blanks skipped, up to the first carriage return of
  * the whole request (so it is empty when a line precedes the command), at most AMT_AT_PARA_SIZE bytes, no
- * terminator added. Returns 0, -100 when the request does not hold the prefix, or -101 for an absent
- * argument.
+ * terminator added. Returns 0, PUB_ERR_FAIL when the request does not hold the prefix, or PUB_ERR_PARAM for
+ * an absent argument.
  */
 int handle_amt_get_at_para(const char *prefix, char *out, uint32_t *length_ptr);
 

@@ -11,12 +11,9 @@
 
 namespace {
 
-constexpr int GPS_STOP = 0;
-constexpr int GPS_START = 1;
-constexpr int GPS_READ = 2;
+/* The first operand of the GPS command: other numbers than the library's. */
+constexpr int GPS_FLAG_STOP = 0;
 constexpr int GPS_FLAG_READ = 2;
-constexpr int RADIO_STOP = 0;
-constexpr int RADIO_START = 1;
 
 /* The channel of the last reception that was started here: its stop names it. */
 uint8_t g_rx_channel = 0;
@@ -54,26 +51,37 @@ bool take_number(amt_at_operands_st *list_ptr, const char *name, const char *fun
 int read_gps_signal(amt_at_operands_st *list_ptr)
 {
     int index = 0;
-    if (ldt_gpsCtrl(GPS_START, 0, nullptr, nullptr) != 0 ||
+    if (ldt_gpsCtrl(LDT_START, 0, nullptr, nullptr) != 0 ||
         !take_number(list_ptr, "index", "amt_at_control_gps", &index))
     {
         return amt_at_reply_error();
     }
     int32_t svid = 0;
     int32_t cnr = 0;
-    if (ldt_gpsCtrl(GPS_READ, index, &svid, &cnr) != 0) {
+    if (ldt_gpsCtrl(LDT_GPS_READ_SIGNAL, index, &svid, &cnr) != 0) {
         return amt_at_reply_error();
     }
     return amt_at_reply("\r\n^DGPSCTRL: %d,%d\r\n\r\nOK\r\n", svid, cnr);
 }
 
+/* The library's answer, once it is logged. */
+int32_t log_end(const char *title, int32_t answer)
+{
+    PUB_LOG(g_amt_handle_log, "%s end. return:%d.", title, answer);
+    return answer;
+}
+
+/* The test first, then the radio: both must have stopped. */
+int32_t stop_radio(int32_t test_answer)
+{
+    const int32_t radio_answer = ldt_wifiCtrl(LDT_STOP);
+    return test_answer != 0 ? test_answer : radio_answer;
+}
+
 int32_t stop_tx()
 {
     PUB_LOG(g_amt_handle_log, "WIFI-TX-stop start. ");
-    const int32_t test_result = ldt_TxTest(0, 0, 0, 0);
-    PUB_LOG(g_amt_handle_log, "WIFI-TX-stop end. return:%d.", test_result);
-    const int32_t switch_result = ldt_wifiCtrl(RADIO_STOP);
-    return test_result != 0 ? test_result : switch_result;
+    return stop_radio(log_end("WIFI-TX-stop", ldt_TxTest(LDT_STOP, 0, 0, 0)));
 }
 
 int32_t start_tx(amt_at_operands_st *list_ptr)
@@ -82,7 +90,7 @@ int32_t start_tx(amt_at_operands_st *list_ptr)
     int channel = 0;
     int rate = 0;
     int power = 0;
-    if (ldt_wifiCtrl(RADIO_START) != 0 || !take_number(list_ptr, "channel", func, &channel) ||
+    if (ldt_wifiCtrl(LDT_START) != 0 || !take_number(list_ptr, "channel", func, &channel) ||
         !take_number(list_ptr, "rate", func, &rate) || !take_number(list_ptr, "power", func, &power))
     {
         return PUB_ERR_FAIL;
@@ -92,19 +100,16 @@ int32_t start_tx(amt_at_operands_st *list_ptr)
     const auto channel_8 = static_cast<uint8_t>(channel);
     PUB_LOG(g_amt_handle_log, "WIFI-TX-start start. channel:%d; power:%d; rate:%d(will multi 100)", channel_8,
             power_16, rate_16);
-    const int32_t result = ldt_TxTest(1, power_16, rate_16, channel_8);
-    PUB_LOG(g_amt_handle_log, "WIFI-TX-start end. return:%d.", result);
-    return result;
+    return log_end("WIFI-TX-start", ldt_TxTest(LDT_START, power_16, rate_16, channel_8));
 }
 
 int32_t stop_rx()
 {
     int32_t count = 0;
     PUB_LOG(g_amt_handle_log, "WIFI-RX-stop start. channel:%d", g_rx_channel);
-    const int32_t test_result = ldt_RxTest(0, g_rx_channel, 0, &count);
-    PUB_LOG(g_amt_handle_log, "WIFI-RX-stop end. return:%d; cnt:%d.", test_result, count);
-    const int32_t switch_result = ldt_wifiCtrl(RADIO_STOP);
-    return test_result != 0 ? test_result : switch_result;
+    const int32_t answer = ldt_RxTest(LDT_STOP, g_rx_channel, 0, &count);
+    PUB_LOG(g_amt_handle_log, "WIFI-RX-stop end. return:%d; cnt:%d.", answer, count);
+    return stop_radio(answer);
 }
 
 int32_t start_rx(amt_at_operands_st *list_ptr)
@@ -112,7 +117,7 @@ int32_t start_rx(amt_at_operands_st *list_ptr)
     static constexpr char func[] = "handle_amt_device_wifi_rx_ctrl";
     int channel = 0;
     int rate = 0;
-    if (ldt_wifiCtrl(RADIO_START) != 0 || !take_number(list_ptr, "channel", func, &channel) ||
+    if (ldt_wifiCtrl(LDT_START) != 0 || !take_number(list_ptr, "channel", func, &channel) ||
         !take_number(list_ptr, "rate", func, &rate))
     {
         return PUB_ERR_FAIL;
@@ -120,12 +125,11 @@ int32_t start_rx(amt_at_operands_st *list_ptr)
     const auto channel_8 = static_cast<uint8_t>(channel);
     const auto rate_16 = static_cast<uint16_t>(rate);
     PUB_LOG(g_amt_handle_log, "WIFI-RX-start start. channel:%d; rate:%d(will multi 100)", channel_8, rate_16);
-    const int32_t result = ldt_RxTest(1, channel_8, rate_16, nullptr);
-    PUB_LOG(g_amt_handle_log, "WIFI-RX-start end. return:%d.", result);
-    if (result == 0) {
+    const int32_t answer = log_end("WIFI-RX-start", ldt_RxTest(LDT_START, channel_8, rate_16, nullptr));
+    if (answer == 0) {
         g_rx_channel = channel_8;
     }
-    return result;
+    return answer;
 }
 
 /* Both Wi-Fi tests: the first operand stops or starts, the rest is the start's. */
@@ -138,10 +142,10 @@ int control_wifi_test(const char *operands, const char *func, int32_t (*stop)(),
     if (!take_number(&list, "control", func, &control)) {
         return PUB_ERR_PARAM;
     }
-    if (control == RADIO_STOP) {
+    if (control == LDT_STOP) {
         return reply_result(stop());
     }
-    return reply_result(control == RADIO_START ? start(&list) : PUB_ERR_FAIL);
+    return reply_result(control == LDT_START ? start(&list) : PUB_ERR_FAIL);
 }
 
 } // namespace
@@ -166,7 +170,7 @@ int amt_at_control_bt(const char *)
 {
     int on = -1;
     get_number("AT^DBTCTRL=", &on);
-    const bool is_known = on == RADIO_STOP || on == RADIO_START;
+    const bool is_known = on == LDT_STOP || on == LDT_START;
     return is_known ? reply_result(ldt_btCtrl(on)) : amt_at_reply_error();
 }
 
@@ -178,8 +182,8 @@ int amt_at_control_gps(const char *operands)
     if (!take_number(&list, "flag", __func__, &flag)) {
         return PUB_ERR_PARAM;
     }
-    if (flag == GPS_STOP) {
-        return reply_result(ldt_gpsCtrl(GPS_STOP, 0, nullptr, nullptr));
+    if (flag == GPS_FLAG_STOP) {
+        return reply_result(ldt_gpsCtrl(LDT_STOP, 0, nullptr, nullptr));
     }
     return flag == GPS_FLAG_READ ? read_gps_signal(&list) : amt_at_reply_error();
 }

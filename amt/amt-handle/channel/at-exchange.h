@@ -54,8 +54,8 @@ void amt_at_set_command(const char *format, ...) __attribute__((format(printf, 1
 
 /*
  * Sends the transmit area and collects the answer in the receive area until a final result: "\r\n+CME ERROR",
- * "\r\n+CMS ERROR" and "\r\nERROR\r\n" are the bad ones. Waits without limit. Returns 0, -100 for a bad final
- * result, -101 when the receive area is full without one, the status of m_step_ptr, or the failing status of
+ * "\r\n+CMS ERROR" and "\r\nERROR\r\n" are the bad ones. Waits without limit. Returns 0, PUB_ERR_FAIL for a bad final
+ * result, PUB_ERR_PARAM when the receive area is full without one, the status of m_step_ptr, or the failing status of
  * the AT channel; the error line of a failure names m_name_ptr and the caller's line.
  */
 int amt_at_exchange(const amt_at_exchange_st &exchange, void *context, int line = __builtin_LINE());
@@ -75,7 +75,7 @@ const char *amt_at_find(const char *text);
 /*
  * The value of an answer line: what stands between the prefix, blanks behind it stepped over, and the next
  * good final result, less line ends. dst (limit + 1 bytes) gets its first limit bytes, terminated;
- * *length_ptr their number. Returns 0, or -100 for a missing prefix (dst is empty then) or a value longer
+ * *length_ptr their number. Returns 0, or PUB_ERR_FAIL for a missing prefix (dst is empty then) or a value longer
  * than limit.
  */
 int amt_at_get_value(const char *prefix, uint32_t limit, char *dst, uint32_t *length_ptr);
