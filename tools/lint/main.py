@@ -13,17 +13,17 @@ from tools.lint.verdict import Check
 from tools.project import die, note
 
 CHECKS: dict[str, Check] = {
+    "structure": check_structure,
+    "tested": check_tested,
     "clang-format": check_format,
     "shellcheck": check_shell,
     "flake8": check_style,
     "mypy": check_types,
     "clang-tidy": check_tidy,
-    "structure": check_structure,
-    "tested": check_tested,
 }
 
-# Not yet green.
-UNASKED = ("structure", "tested")
+# These look at the whole house, whichever files the caller means.
+WHOLE = ("structure", "tested")
 
 
 def choose_files(paths: list[str], since: str | None) -> list[str]:
@@ -48,14 +48,14 @@ def main() -> int:
     parser.add_argument("--check", action="append", choices=CHECKS,
                         help="only this check, or these (given more than once)")
     options = parser.parse_args()
-    chosen = options.check or [name for name in CHECKS if name not in UNASKED]
+    chosen = options.check or list(CHECKS)
     files = choose_files(options.path, options.since)
     failed, checked = [], 0
     for name in chosen:
         print(f"== {name}", file=sys.stderr, end="", flush=True)
         started = time.monotonic()
         verdict = CHECKS[name](files)
-        checked += verdict.checked
+        checked += 0 if name in WHOLE else verdict.checked
         print(f": {verdict.checked} files in {time.monotonic() - started:.0f} s", file=sys.stderr)
         if verdict.findings:
             failed.append(name)
@@ -63,7 +63,7 @@ def main() -> int:
     if failed:
         print(f"FAIL: {', '.join(failed)}")
         return 1
-    if not checked and not options.since:
+    if not checked and not options.since and not set(WHOLE).issuperset(chosen):
         die(f"no check looks at files of this kind: {', '.join(files[:5])}"
             f"{' ...' if len(files) > 5 else ''}")
     print(f"PASS: {len(files)} files, {len(chosen)} checks")
