@@ -7,7 +7,7 @@ from typing import Callable
 
 from amt_line.run.port import StoppablePort
 from amt_line.run.stop import Stop
-from amt_station.errors import BadFrame, NoAnswer, NoPort, PortBusy, StationError
+from amt_station.errors import BadFrame, NoAnswer, NoPort, PortBusy, Refused, StationError
 from amt_station.exchange import Transcript
 from amt_station.link import Link
 from amt_station.port import Port
@@ -36,13 +36,19 @@ class Connection:
         self._why = "the port was never open"
 
     def open(self) -> None:
-        """Open the port and find the link's place."""
+        """Open the port and find the link's place.
+
+        When the handset holds a request that it refuses, ``Refused`` says so and the port stays
+        open: somebody may pull the cable.
+        """
         self._port = StoppablePort(self._open_port(), self._stop)
         link = Link(self._port, self._channel, self._timeout)
         link.observers.append(self._transcripts.append)
         self._link = link
         try:
             link.find_place()
+        except Refused:
+            raise
         except BaseException as error:
             self.lose(str(error))
             raise

@@ -23,10 +23,11 @@ from amt_line.run.exchanges import exchange_document, late_remarks
 from amt_line.run.operator import Nobody, Operator
 from amt_line.run.record import Document, Record, Where
 from amt_line.run.record_file import Keeper, NoRecord, RecordLost
-from amt_line.run.step_run import StepRun
+from amt_line.run.step_run import REPLUG_SECONDS, StepRun
 from amt_line.run.stop import Abort, Aborted, Ended, Stop
-from amt_line.run.tally import RunVerdict, Tally, Verdict
-from amt_station.errors import StationError
+from amt_line.run.tally import EXIT_FAIL, RunVerdict, Tally, Verdict
+from amt_station.errors import Held, Refused, StationError
+from amt_station.replug import UNPLUG_NOW
 
 _LOG = logging.getLogger("amt_line")
 
@@ -106,16 +107,17 @@ class Runner:
 
     def _first_steps(self) -> None:
         self._begin()
-        for step in (*self.plan.setup, *self.plan.steps):
-            self._do(step)
+        for number, step in enumerate((*self.plan.setup, *self.plan.steps), start=1):
+            self._do(step, number)
         self._note_abort()
 
     def _last_steps(self) -> None:
         if self.plan.always:
             self._make_safe()
         self._stop.begin_last_steps(hurry=self._tally.abort is not None or self._time_is_over())
-        for step in self.plan.always:
-            self._do(step)
+        before = len(self.plan.setup) + len(self.plan.steps)
+        for number, step in enumerate(self.plan.always, start=before + 1):
+            self._do(step, number)
         self._note_abort()
 
     def _tell_begin(self) -> None:
@@ -131,17 +133,27 @@ class Runner:
     def _begin(self) -> None:
         """Open the port and find the link's place: nothing that is left over passes a step."""
         try:
-            self._connection.open()
+            self._open()
         except Ended as error:
             self._block(Verdict.ERROR, 5, str(error), "")
         except StationError as error:
-            self._block(Verdict.ERROR, error.exit_status, str(error),
+            refused = error.exit_status == EXIT_FAIL
+            self._block(Verdict.FAIL if refused else Verdict.ERROR, error.exit_status, str(error),
                         getattr(error, "advice", ""))
         except Exception as error:  # pylint: disable=broad-except
             self.note_defect(error)
             self._block(Verdict.ERROR, 7, f"the station's own error: {error!r}", "")
         self.record.head["begin"] = self.exchanges()
         self.record.head["remarks"] = late_remarks(self.record.head["begin"])
+
+    def _open(self) -> None:
+        try:
+            self._connection.open()
+        except Refused as refusal:
+            if refusal.held is Held.NOTHING or not self._setting.operator.can_act():
+                raise
+            self._stream.send("notice", number=1, text=UNPLUG_NOW)
+            self._connection.reconnect(REPLUG_SECONDS, must_go=True)
 
     def _block(self, verdict: Verdict, status: int, reason: str, advice: str) -> None:
         """What follows is pointless."""
@@ -173,11 +185,10 @@ class Runner:
             return True
         return False
 
-    def _do(self, step: Step) -> None:
+    def _do(self, step: Step, number: int) -> None:
         self._note_abort()
         if step.section is Section.ALWAYS:
             self._stop.hurry()
-        number = self.plan.every_step.index(step) + 1
         work = StepRun(step, number, self._setting.operator, self._connection, self._stop,
                        self._stream, self)
         why_not = self._why_not(step)

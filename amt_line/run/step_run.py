@@ -18,6 +18,7 @@ from amt_line.run.stop import Aborted, Ended, Stop
 from amt_line.run.tally import EXIT_FAIL, EXIT_OWN_ERROR, EXIT_PASS, Verdict
 from amt_line.run.work import Outcome, StationTrouble, Tools, attempt
 from amt_station.errors import Held, NoPort, Refused, StationError
+from amt_station.replug import UNPLUG_NOW
 
 Document = dict[str, Any]
 EXIT_NO_ANSWER = 5
@@ -188,7 +189,7 @@ class StepRun:
             advice = getattr(failure, "advice", "") or refusal.advice
             if not self._operator.can_act():
                 raise StationTrouble(advice or str(failure)) from failure
-            self._tell("notice", text="unplug the USB cable and plug it in again now")
+            self._tell("notice", text=UNPLUG_NOW)
             self._connection.reconnect(REPLUG_SECONDS, must_go=True)
 
     def _keep_exchanges(self, number: int) -> None:

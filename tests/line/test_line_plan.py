@@ -116,6 +116,11 @@ def test_a_wrong_plan_is_refused_with_step_and_key(tmp_path: Path, text: str, wo
     assert any(words in line for line in found), found
 
 
+def test_at_steps_need_the_pc_line(tmp_path: Path) -> None:
+    assert problems(tmp_path, "[[step]]\nat = 'AT'", Channel.APP) == [
+        "step 1 'AT': at: AT text is understood on the PC line only"]
+
+
 def test_every_problem_is_told_at_once(tmp_path: Path) -> None:
     found = problems(tmp_path, ADC + "[[step]]\ncommand = 'x'\n[[always]]\nat = 3\n")
     assert found == ["step 2: command: no 'x'; `amt-station commands` lists them",

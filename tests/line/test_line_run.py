@@ -228,6 +228,30 @@ def test_an_operator_is_asked_to_unplug_and_the_run_goes_on(tmp_path: Path, peer
     assert "unplug the USB cable" in notice["text"]
 
 
+def test_what_an_earlier_program_left_is_unplugged_before_the_first_step(tmp_path: Path,
+                                                                         peer: Peer) -> None:
+    peer.script = lambda item: [error_packet(225)]
+    second = Peer(EnvelopeDecoder())
+    second.script = script(15)
+    left = [peer, second]
+
+    def pull(event: dict[str, Any]) -> None:
+        if event["event"] == "notice":
+            peer.hang_up()
+
+    document = Bench(load(tmp_path, ADC), peer, operator=Hand(), on_event=pull,
+                     open_port=lambda: FdPort(left.pop(0).slave)).run()
+    second.close()
+    assert document["verdict"] == "PASS" and len(document["begin"]) >= 2
+
+
+def test_what_an_earlier_program_left_passes_nothing(tmp_path: Path, peer: Peer) -> None:
+    peer.script = lambda item: [error_packet(225)]
+    document = Bench(load(tmp_path, ADC + WRITE_VERDICT + "when = 'connected'\n"), peer).run()
+    assert verdicts(document) == ["skipped", "skipped"] and document["exit_status"] == 1
+    assert "unplug" in document["advice"]
+
+
 def test_an_operator_who_does_not_answer(tmp_path: Path, peer: Peer) -> None:
     peer.script = Script()
     document = Bench(load(tmp_path, ASK + "timeout = 0.2\n"), peer, operator=Hand()).run()
