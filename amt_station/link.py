@@ -32,10 +32,8 @@ __all__ = ["DEFAULT_TIMEOUT", "RECOVER_TIMEOUT", "Link", "Observer", "Place", "R
 DEFAULT_TIMEOUT = 10.0
 RECOVER_TIMEOUT = 3.0
 
-# Behind the answer to a search the line has to be silent for so long: a late OK of a lost text may
-# have been taken for it, and then the true one follows.
+# Behind the answer to a search the line has to be silent for so long.
 _QUIET = 0.05
-_QUIET_AFTER_TEXT = 0.5
 _LONGEST_UNREST = 3.0
 
 # After something that speaks against an answer, it comes within this time or not at all.
@@ -56,7 +54,8 @@ class Link(Line):
     Threads that share a link take turns, an exchange being one turn.
     """
 
-    _text_is_lost = False
+    _lost_texts = 0
+    _lost_searches = 0
     _searches = 0
 
     @classmethod
@@ -146,7 +145,7 @@ class Link(Line):
                 try:
                     self._hear(reply, limit)
                 finally:
-                    self._text_is_lost = not self._in_step
+                    self._lost_texts += not self._in_step
         return reply
 
     def _hear(self, reply: AtReply, limit: float) -> None:
@@ -203,7 +202,7 @@ class Link(Line):
                         raise
                     dropped += error.arrived
                     continue
-                self._in_step, self._text_is_lost = True, False
+                self._in_step, self._lost_texts, self._lost_searches = True, 0, 0
                 return Place(attempt, tuple(dropped))
         raise AssertionError("the second attempt returns or raises")
 
@@ -214,12 +213,13 @@ class Link(Line):
         transcript = Transcript(Purpose.PLACE, self.channel, question.what, question.data)
         with self._conversation(transcript):
             if not self._is_answered(question, transcript, limit):
+                self._lost_searches += 1
                 if question.doubt is not None:
                     raise question.doubt
                 raise OutOfStep(diagnosis.no_place(transcript, limit),
                                 [timed.item for timed in transcript.items])
             answered = len(transcript.items)
-            self._settle(transcript)
+            self._settle(question, transcript, limit)
         return [*transcript.late, *(timed.item for timed in transcript.items[:answered])]
 
     def _is_answered(self, question: Search, transcript: Transcript, limit: float) -> bool:
@@ -231,16 +231,26 @@ class Link(Line):
                 deadline.seconds = min(deadline.seconds, timed.seconds + _DOUBT_SECONDS)
         return False
 
-    def _settle(self, transcript: Transcript) -> None:
-        """Wait until the line is silent behind the answer to a search."""
-        quiet = _QUIET_AFTER_TEXT if self._text_is_lost else _QUIET
+    def _settle(self, question: Search, transcript: Transcript, limit: float) -> None:
+        """Wait until the line is silent behind the answer to a search.
+
+        What was taken for the answer may have been a late one: of a lost text, or of an earlier
+        search. Until each of them has come there has to be a long silence.
+        """
+        awaited = 1 + self._lost_texts + self._lost_searches
+        patience = 2 * limit if awaited > 1 else _QUIET
         start = time.monotonic()
-        while (piece := self.port.read(quiet)) or self._decoder.pending:
+        while True:
+            piece = self.port.read(_QUIET if question.finals >= awaited else patience)
             for item in self._decode(piece):
+                question.take(item)
                 transcript.add(transcript.seconds + time.monotonic() - start, item)
-            if time.monotonic() - start > _LONGEST_UNREST:
+            if not piece and not self._decoder.pending:
+                return
+            if time.monotonic() - start > patience + _LONGEST_UNREST:
+                self._lost_searches += 1
                 raise OutOfStep(f"the line is out of step and does not fall silent within "
-                                f"{_LONGEST_UNREST:g} s; nothing else was sent")
+                                f"{patience + _LONGEST_UNREST:g} s; nothing else was sent")
 
     def _get_in_step(self) -> None:
         if not self._in_step:

@@ -41,11 +41,13 @@ class Search(Protocol):
     """One question and the recognition of its answer.
 
     ``doubt`` will be the error unless the answer comes soon: something came that speaks against it.
+    ``finals`` counts what may have been its answer.
     """
 
     what: str
     data: bytes
     doubt: StationError | None
+    finals: int
 
     def take(self, item: Item) -> bool:
         """Look at the next item; whether it completes the answer."""
@@ -62,6 +64,7 @@ class TextSearch:
     what: str = FLUSH_COMMAND
     data: bytes = FLUSH_COMMAND.encode() + b"\r"
     doubt: StationError | None = None
+    finals: int = 0
     reader: ReplyReader = field(default_factory=lambda: ReplyReader(FLUSH_COMMAND))
 
     def take(self, item: Item) -> bool:
@@ -71,12 +74,15 @@ class TextSearch:
         return isinstance(item, Text) and self._take_text(item.text)
 
     def _take_text(self, text: str) -> bool:
+        answered = False
         while final := self.reader.feed(text):
             text, self.reader = self.reader.rest, ReplyReader(FLUSH_COMMAND)
+            self.finals += 1
             if final == "OK":
-                return True
-            self.doubt = Refused(f"{FLUSH_COMMAND} was answered with {final}")
-        return False
+                answered = True
+            else:
+                self.doubt = Refused(f"{FLUSH_COMMAND} was answered with {final}")
+        return answered
 
 
 class PacketSearch:
@@ -90,6 +96,7 @@ class PacketSearch:
         self.what = display_name(self._packet.command)
         self.data = encode_request(self._packet, enveloped=False)
         self.doubt: StationError | None = None
+        self.finals = 1
 
     def take(self, item: Item) -> bool:
         """As in ``Search``."""
