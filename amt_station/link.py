@@ -238,7 +238,7 @@ class Link(Line):
         search. Until each of them has come there has to be a long silence.
         """
         awaited = 1 + self._lost_texts + self._lost_searches
-        patience = 2 * limit if awaited > 1 else _QUIET
+        patience = 2 * limit if self._lost_searches else limit if awaited > 1 else _QUIET
         start = time.monotonic()
         while True:
             piece = self.port.read(_QUIET if question.finals >= awaited else patience)

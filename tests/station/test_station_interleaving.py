@@ -1,6 +1,7 @@
 """Whatever comes late, doubled, damaged or not at all: no step is passed by another's answer.
 
-The handset is a port without any time of its own: what it says becomes readable when the link waits
+What is more than three seconds late, the time that a link gives a search, is beyond it: a text's
+answer says nothing of the text. The handset is a port without any time of its own: what it says becomes readable when the link waits
 long enough, so that hundreds of lines are played in a second.
 """
 
@@ -75,7 +76,7 @@ class ScriptedPort:
 
     def answer(self, how: int, data: bytes) -> None:
         """Answers leave the handset in the order of the requests, however long one takes."""
-        delay = {LATE: LIMIT + 0.3, LATER: 4 * LIMIT}.get(how, 0.01)
+        delay = {LATE: LIMIT + 0.3, LATER: 3 * LIMIT}.get(how, 0.01)
         if how == MISSING:
             return
         if how == DAMAGED:
