@@ -111,25 +111,32 @@ def _command(name: str) -> Schema:
     command = handset.command(name)
     limits = {measure.name: {"$ref": f"#/definitions/{'number' if measure.numeric else 'text'}"}
               for measure in command.measures().values()}
-    values = {"type": "object", "additionalProperties": False,
-              "properties": {field_name: field_schema(field)
-                             for field_name, field in command.fields().items()}}
-    schema: Schema = {"description": command.operation.summary, "properties": {
-        "with": values,
-        "limits": {"type": "object", "additionalProperties": False, "properties": limits},
-        "save": {"type": "object", "propertyNames": {"enum": sorted(limits)}}}}
+    schema: Schema = {
+        "description": command.operation.summary,
+        "properties": {
+            "limits": {"type": "object", "additionalProperties": False, "properties": limits},
+            "save": {"type": "object", "propertyNames": {"enum": sorted(limits)}}},
+        "if": {"properties": {"force": {"const": True}}, "required": ["force"]},
+        "then": {"properties": {"with": _values(command, forced=True)}},
+        "else": {"properties": {"with": _values(command, forced=False)}}}
     if command.needed:
-        values["required"] = list(command.needed)
         schema["required"] = ["with"]
     return schema
 
 
-def field_schema(field: Field) -> Schema:
+def _values(command: handset.Command, forced: bool) -> Schema:
+    """The schema of what a command takes; ``forced`` goes past ranges, never past types."""
+    return {"type": "object", "additionalProperties": False, "required": list(command.needed),
+            "properties": {name: field_schema(field, forced)
+                           for name, field in command.fields().items()}}
+
+
+def field_schema(field: Field, forced: bool = False) -> Schema:
     """The schema of a value that is sent; how it is said in words is its description."""
     meaning = field.meaning + (f" ({field.unit})" if field.unit else "")
     if not field.numeric:
         return {**_TEXT, "description": f"a text: {meaning}"}
-    bounds = {"minimum": field.low, "maximum": field.high}
+    bounds = {} if forced else {"minimum": field.low, "maximum": field.high}
     number: Schema = {"type": "integer", **_WHOLE}
     number.update({key: bound for key, bound in bounds.items() if bound is not None})
     words = [{"enum": list(field.choices)}] if field.choices else []

@@ -44,15 +44,18 @@ class TerminalView:
         name = event["event"]
         if name in ("run-began", "answer"):
             self._show()
-        elif name in ("question", "notice"):
+        elif name == "question":
+            # The table comes back behind the answer.
             self.close()
-            if name == "notice":
-                self._console.print(Text(printable(event["text"]), "bold yellow"))
-                self._show()
+        elif name == "notice":
+            self.close()
+            self._console.print(Text(printable(event["text"]), "bold yellow"))
+            self._show()
         elif name == "step-ended" and self._live is None:
             self._show()
         elif name == "run-ended":
             self.close()
+            self._console.print(self._table(self._rows))
             self._console.print(self._verdict(event))
 
     def _take(self, event: Mapping[str, Any]) -> None:
@@ -71,12 +74,10 @@ class TerminalView:
         self._live.start()
 
     def close(self) -> None:
-        """Take the moving table away and leave the whole one."""
-        if self._live is None:
-            return
-        self._live.stop()
-        self._live = None
-        self._console.print(self._table(self._rows))
+        """Take the moving table away."""
+        if self._live is not None:
+            self._live.stop()
+            self._live = None
 
     def _window(self) -> RenderableType:
         """The rows around the current step, as many as fit."""

@@ -71,6 +71,10 @@ IMEI = "490154203237518"
     ("[[step]]\ncommand = 'imei write'\nwith = { imei = '' }", "with.imei: is empty"),
     ("[[step]]\ncommand = 'imei write'\nwith = { imei = '490154203237519' }", "check digit"),
     ("[[step]]\ncommand = 'imei write'\nforce = true\nwith = { imei = \"a\\u0007\" }", "U+0007"),
+    ("[[step]]\ncommand = 'test-result write'\nwith = { station = 3, verdict = 7 }",
+     "with.verdict: 7 is not a whole number 0 to 2"),
+    ("[[step]]\ncommand = 'test-result write'\nforce = true\n"
+     "with = { station = 3, verdict = 7.5 }", "with.verdict: 7.5 is"),
     # requests
     ("[[step]]\nrequest = 'NONE_SUCH'", "request: no command 'NONE_SUCH'"),
     ("[[step]]\nrequest = '45'\natoms = ['19']", "atoms: '19' is not ATOM=TYPE:VALUE"),
@@ -197,6 +201,8 @@ def test_references_are_followed_when_the_plan_is_read(tmp_path: Path, text: str
     "[input.n]\nformat = 'int'\n[[step]]\ncommand = 'gps read'\nwith = { index = '${n}' }",
     ADC + "[[always]]\ncommand = 'test-result write'\n"
     "with = { station = 3, verdict = '${verdict}' }\n",
+    "[[step]]\ncommand = 'test-result write'\nforce = true\n"
+    "with = { station = 3, verdict = 7 }\n",
     ADC + "save = { adc = 'a' }\nstop = true\n" + ADC.replace("10", "'${a}'"),
 ])
 def test_good_references(tmp_path: Path, text: str) -> None:
