@@ -1,8 +1,8 @@
 """Whatever comes late, doubled, damaged or not at all: no step is passed by another's answer.
 
 What is more than three seconds late, the time that a link gives a search, is beyond it: a text's
-answer says nothing of the text. The handset is a port without any time of its own: what it says becomes readable when the link waits
-long enough, so that hundreds of lines are played in a second.
+answer says nothing of the text. The handset is a port without any time of its own: what it says
+becomes readable when the link waits long enough, so that hundreds of lines are played in a second.
 """
 
 from __future__ import annotations
