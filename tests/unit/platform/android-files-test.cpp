@@ -1,6 +1,8 @@
 #include <fstream>
 #include <gmock/gmock.h>
+#include <iterator>
 #include <map>
+#include <set>
 #include <sstream>
 
 #include "tests/unit/platform/support.h"
@@ -56,6 +58,112 @@ TEST(android_files_test, the_sample_configuration_sets_every_key_within_its_limi
         }
     }
     EXPECT_EQ(settings.size(), g_limit.size());
+}
+
+namespace {
+
+/* What an init of platform level 21 knows, as far as the shipped file could use it. */
+const std::set<std::string> g_commands = {
+    "chmod",   "chown",   "class_reset", "class_start", "class_stop", "load_all_props", "mkdir", "mount",
+    "restart", "setprop", "start",       "stop",        "symlink",    "trigger",        "wait",  "write"};
+const std::set<std::string> g_options = {"class",  "console",  "critical", "disabled",  "group",
+                                         "ioprio", "keycodes", "oneshot",  "onrestart", "seclabel",
+                                         "setenv", "socket",   "user"};
+const std::set<std::string> g_triggers = {"boot", "charger",      "early-boot", "early-init",
+                                          "init", "nonencrypted", "post-fs",    "post-fs-data"};
+const std::set<std::string> g_mount_flags = {"nodev", "nosuid", "noatime", "noexec", "ro", "wait"};
+
+struct init_section_st
+{
+    std::vector<std::string> m_head; /* the words of its first line */
+    std::vector<std::vector<std::string>> m_body;
+};
+
+std::vector<std::string> split_words(const std::string &line)
+{
+    std::istringstream stream(line.substr(0, line.find('#')));
+    return {std::istream_iterator<std::string>(stream), std::istream_iterator<std::string>()};
+}
+
+std::vector<init_section_st> init_sections()
+{
+    std::vector<init_section_st> sections;
+    for (const std::string &line : split_lines(shipped("vx-kel-amt.rc"))) {
+        const std::vector<std::string> words = split_words(line);
+        if (words.empty()) {
+            continue;
+        }
+        if (line[0] != ' ') {
+            sections.push_back({words, {}});
+        } else if (!sections.empty()) {
+            sections.back().m_body.push_back(words);
+        } else {
+            ADD_FAILURE() << line;
+        }
+    }
+    return sections;
+}
+
+bool is_known_trigger(const std::string &trigger)
+{
+    return g_triggers.count(trigger) == 1 || trigger.rfind("property:", 0) == 0;
+}
+
+} // namespace
+
+TEST(android_files_test, init_knows_every_word_of_its_file)
+{
+    for (const init_section_st &section : init_sections()) {
+        const bool is_service = section.m_head[0] == "service";
+        ASSERT_TRUE(is_service || section.m_head[0] == "on") << section.m_head[0];
+        if (!is_service) {
+            ASSERT_EQ(section.m_head.size(), 2u);
+            EXPECT_TRUE(is_known_trigger(section.m_head[1])) << section.m_head[1];
+        }
+        for (const std::vector<std::string> &line : section.m_body) {
+            EXPECT_EQ((is_service ? g_options : g_commands).count(line[0]), 1u) << line[0];
+        }
+    }
+}
+
+/* A mount's last word alone may be something else than a flag: an option of the file system. */
+TEST(android_files_test, init_knows_every_flag_of_a_mount)
+{
+    int count = 0;
+    for (const init_section_st &section : init_sections()) {
+        for (const std::vector<std::string> &line : section.m_body) {
+            if (line[0] != "mount") {
+                continue;
+            }
+            count++;
+            ASSERT_GE(line.size(), 4u);
+            for (size_t i = 4; i + 1 < line.size(); i++) {
+                EXPECT_EQ(g_mount_flags.count(line[i]), 1u) << line[i];
+            }
+        }
+    }
+    EXPECT_EQ(count, 3);
+}
+
+/* The charger's boot mounts nothing by itself, and the start comes last. */
+TEST(android_files_test, the_charger_mounts_what_the_service_needs)
+{
+    std::vector<std::string> mounted;
+    std::string last;
+    for (const init_section_st &section : init_sections()) {
+        const bool is_early = section.m_head == std::vector<std::string>{"on", "init"};
+        const bool is_charger = section.m_head == std::vector<std::string>{"on", "charger"};
+        for (const std::vector<std::string> &line : section.m_body) {
+            if ((is_early || is_charger) && line[0] == "mount") {
+                mounted.push_back(line[3]);
+            }
+            if (is_charger) {
+                last = line[0];
+            }
+        }
+    }
+    EXPECT_THAT(mounted, testing::ElementsAre("/tmp", "/system", "/amt"));
+    EXPECT_EQ(last, "start");
 }
 
 TEST(android_files_test, init_starts_the_service_both_ways)
