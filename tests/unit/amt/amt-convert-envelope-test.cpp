@@ -88,7 +88,7 @@ TEST_F(amt_convert_envelope, envelope_is_stripped)
 TEST_F(amt_convert_envelope, only_the_magic_of_an_envelope_is_looked_at)
 {
     std::vector<uint8_t> frame = EMPTY_PACKET_FRAME;
-    for (const size_t i : {4, 5, 8, 9, 10, 18, 21}) {
+    for (const size_t i : std::initializer_list<size_t>{4, 5, 8, 9, 10, 18, 21}) {
         frame[i] = 0x77;
     }
     hold(frame);
@@ -139,7 +139,7 @@ TEST_F(amt_convert_envelope, packet_without_room_for_the_envelope_is_refused_unt
         EXPECT_EQ(amt_convert_app_2_pc(m_buf_ptr), PUB_ERR_PARAM) << length;
         EXPECT_EQ(m_area.content(), before) << length;
     }
-    for (const uint16_t claimed : {4081, 4096, 65535}) {
+    for (const uint16_t claimed : std::initializer_list<uint16_t>{4081, 4096, 65535}) {
         hold({0x00, 0x00, 0xBB, 0x0A, 0x00, 0x00}, 0);
         amt_put_u16_le(m_buf_ptr->m_buf_a, claimed);
         const std::vector<uint8_t> before = m_area.content();

@@ -258,9 +258,9 @@ TEST_F(amt_convert_req, value_that_passes_the_packet_is_refused)
 {
     const std::vector<uint8_t> data(4085, 0x42);
     amt_packet_add_bytes(packet(), 1, data.data(), 4085);
-    for (const uint16_t length : {4086, 4087, 32768, 65531, 65535}) {
+    for (const uint16_t length : std::initializer_list<uint16_t>{4086, 4087, 32768, 65531, 65535}) {
         amt_put_u16_le(packet() + 9, length);
-        for (const uint16_t claimed : {1, 4090, 65535}) {
+        for (const uint16_t claimed : std::initializer_list<uint16_t>{1, 4090, 65535}) {
             claim_atoms(claimed);
             EXPECT_EQ(convert(), PUB_ERR_FAIL);
             EXPECT_THAT(block(), ElementsAre(0x1A));

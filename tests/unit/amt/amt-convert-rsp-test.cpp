@@ -315,7 +315,7 @@ TEST_F(amt_convert_rsp, counts_up_to_the_packet_fit_and_longer_ones_are_refused)
 TEST_F(amt_convert_rsp, hostile_32_bit_counts_are_refused)
 {
     for (const uint32_t count : {0x10000U, 0x10001U, 0x7FFFFFFFU, 0x80000000U, 0xFFFFFFF0U, 0xFFFFFFFFU}) {
-        for (const uint8_t cmd : {0x18, 0x30, 0x3E, 0x72, 0x4E, 0x6A}) {
+        for (const uint8_t cmd : std::initializer_list<uint8_t>{0x18, 0x30, 0x3E, 0x72, 0x4E, 0x6A}) {
             std::vector<uint8_t> fields = u32_le(count) + counted_bytes(20);
             if (cmd == 0x18) {
                 fields = std::vector<uint8_t>{0, 0, 0, 1} + fields;

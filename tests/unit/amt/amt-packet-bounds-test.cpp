@@ -103,7 +103,7 @@ TEST_F(amt_packet_bounds, adders_fill_the_area_to_its_last_byte_and_no_further)
 TEST_F(amt_packet_bounds, adders_leave_a_packet_alone_that_claims_to_end_outside)
 {
     for (const adder_st &adder : adders()) {
-        for (const uint16_t total : {4097, 5000, 32768, 65526, 65530, 65535}) {
+        for (const uint16_t total : std::initializer_list<uint16_t>{4097, 5000, 32768, 65526, 65530, 65535}) {
             amt_packet_init(packet(), 1);
             set_lengths(total);
             const std::vector<uint8_t> before = m_area.content();
@@ -130,7 +130,7 @@ TEST_F(amt_packet_bounds, longest_value_fills_the_area)
 
 TEST_F(amt_packet_bounds, text_whose_length_does_not_fit_16_bits_is_not_added)
 {
-    for (const size_t length : {4086, 65535, 65536, 65540, 131072}) {
+    for (const size_t length : std::initializer_list<size_t>{4086, 65535, 65536, 65540, 131072}) {
         amt_packet_add_string(packet(), 2, std::string(length, 'x').c_str());
         EXPECT_EQ(amt_packet_get_length(packet()), 6) << length;
     }
@@ -156,7 +156,9 @@ TEST_F(amt_packet_bounds, atom_whose_length_field_passes_the_end_is_absent)
 
 TEST_F(amt_packet_bounds, lengths_that_wrap_the_position_lead_nowhere)
 {
-    for (const uint16_t length : {4080, 4085, 4086, 4090, 32768, 0xFFF5, 0xFFFA, 0xFFFB, 0xFFFC, 0xFFFF}) {
+    for (const uint16_t length : std::initializer_list<uint16_t>{4080, 4085, 4086, 4090, 32768, 0xFFF5,
+                                                                 0xFFFA, 0xFFFB, 0xFFFC, 0xFFFF})
+    {
         amt_packet_init(packet(), 1);
         put_atom_head(6, 1, length);
         claim_everything();
@@ -187,7 +189,7 @@ TEST_F(amt_packet_bounds, value_bytes_behind_the_area_count_as_zero)
 TEST_F(amt_packet_bounds, texts_and_bytes_behind_the_area_count_as_zero)
 {
     const uint32_t start = AMT_PACKET_SIZE - 5 - 3;
-    for (const uint16_t n : {3, 4, 100, 4096, 65535}) {
+    for (const uint16_t n : std::initializer_list<uint16_t>{3, 4, 100, 4096, 65535}) {
         fill_up_to(start);
         put_atom_head(start, 2, n);
         memset(packet() + start + 5, 'x', 3);
@@ -219,7 +221,7 @@ using amt_packet_bounds_death_test = amt_packet_bounds;
 TEST_F(amt_packet_bounds_death_test, numbers_longer_than_4_bytes_abort)
 {
     ::testing::FLAGS_gtest_death_test_style = "threadsafe";
-    for (const uint16_t n : {5, 6, 4085, 65535}) {
+    for (const uint16_t n : std::initializer_list<uint16_t>{5, 6, 4085, 65535}) {
         amt_packet_init(packet(), 1);
         put_atom_head(6, 2, n);
         claim_everything();

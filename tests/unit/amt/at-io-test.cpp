@@ -36,7 +36,7 @@ bool holds_in_order(const texts_t &text_list, const texts_t &wanted)
 {
     size_t place = 0;
     for (const std::string &text : text_list) {
-        place += place < wanted.size() && text == wanted[place] ? 1 : 0;
+        place += place < wanted.size() && text == wanted[place] ? 1U : 0U;
     }
     return place == wanted.size();
 }

@@ -152,7 +152,7 @@ uint32_t count_wrong_pixels(const screen_st &screen, size_t page, const bytes &p
             const bool is_picture =
                 x >= left && x < left + AMT_PICTURE_WIDTH && y >= top && y < top + AMT_PICTURE_HEIGHT;
             const uint16_t expected = is_picture ? stored_pixel(picture, x - left, y - top) : 0;
-            wrong += screen.pixel(page, x, y) == expected ? 0 : 1;
+            wrong += screen.pixel(page, x, y) == expected ? 0U : 1U;
         }
     }
     return wrong;
@@ -162,7 +162,7 @@ size_t count_guards(const screen_st &screen, size_t begin, size_t end)
 {
     size_t count = 0;
     for (size_t i = begin; i < end; i++) {
-        count += screen.m_area[i] == GUARD ? 1 : 0;
+        count += screen.m_area[i] == GUARD ? 1U : 0U;
     }
     return count;
 }

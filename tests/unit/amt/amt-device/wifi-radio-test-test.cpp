@@ -143,7 +143,7 @@ TEST_F(wifi_radio, logs_the_start_and_the_stop)
 
 TEST_F(wifi_radio, nothing_else_runs_while_wifi_is_off)
 {
-    for (const uint8_t sub : {3, 4, 5, 6}) {
+    for (const uint8_t sub : std::initializer_list<uint8_t>{3, 4, 5, 6}) {
         expect_failure(sub_command(sub) + channel(1) + rate("ab") + power("cd"), PUB_ERR_FAIL,
                        "WIFI is not running");
     }
@@ -223,7 +223,7 @@ TEST_F(wifi_radio, library_failures_name_the_call)
 
 TEST_F(wifi_radio, an_unknown_sub_command_is_traced_and_refused)
 {
-    for (const uint8_t sub : {0, 7, 255}) {
+    for (const uint8_t sub : std::initializer_list<uint8_t>{0, 7, 255}) {
         forget();
         expect_failure(sub_command(sub), PUB_ERR_PARAM, "unknown operation: " + std::to_string(sub));
         EXPECT_THAT(m_shell.m_commands,
