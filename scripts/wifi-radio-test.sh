@@ -2,7 +2,7 @@
 # Wi-Fi transmission and reception tests with the chip's own tool. The daemon carries this text as constant data; it
 # neither writes nor runs it.
 #
-# Words are left unquoted as the tool has always been called: a missing argument leaves the word out.
+# Words are left unquoted on purpose: a missing argument leaves the word out, as the tool wants it.
 # shellcheck disable=SC2086
 # Every step is "command && its OK line || end"; echo does not fail.
 # shellcheck disable=SC2015

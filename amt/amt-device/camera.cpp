@@ -83,8 +83,7 @@ int test_camera(int32_t control_id, int32_t *verdict_ptr)
     return status;
 }
 
-/* The format is kept as the logs' readers know it: an old "%ld", which some C libraries print as it stands.
- */
+/* "%D" is an old "%ld", which some C libraries print as it stands; log readers look for either. */
 void log_control_id(int32_t control_id)
 {
 #pragma GCC diagnostic push
