@@ -8,8 +8,6 @@
 #include "amt/amt-log.h"
 #include "pub/util/thread-end.h"
 
-std::atomic<pthread_t> g_handshake_picture_thread{0};
-
 namespace {
 
 constexpr uint32_t SHOW_DELAY_MS = 3000;
@@ -54,12 +52,10 @@ int prepare()
 
 void *amt_handle_load_image_for_handshake(void *)
 {
-    g_handshake_picture_thread = pthread_self();
     const bool is_prepared = prepare() == 0;
     pub_util_sleep_ms(SHOW_DELAY_MS);
     if (is_prepared) {
         amt_framebuffer_show(g_pixel_ptr);
     }
-    g_handshake_picture_thread = 0;
     return nullptr;
 }

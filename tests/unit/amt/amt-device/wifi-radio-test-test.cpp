@@ -1,6 +1,7 @@
 #include "amt/amt-device/device-request.h"
 #include "amt/amt-device/embed/embedded-data.h"
 
+#include <set>
 #include <string.h>
 
 #include <gmock/gmock.h>
@@ -139,6 +140,33 @@ TEST_F(wifi_radio, logs_the_start_and_the_stop)
     ASSERT_GE(texts.size(), 3U);
     EXPECT_EQ(texts[1], "WIFI-stop start");
     EXPECT_EQ(texts[2], "WIFI-stop end. return:0.");
+}
+
+/* The lines of all failures, with their numbers. */
+std::vector<std::string> error_lines(const log_capture_c &capture)
+{
+    std::vector<std::string> lines;
+    for (const std::string &text : capture.texts()) {
+        if (text.rfind("FILE-", 0) == 0) {
+            lines.push_back(text);
+        }
+    }
+    return lines;
+}
+
+TEST_F(wifi_radio, each_missing_parameter_shows_its_own_line)
+{
+    start();
+    const log_capture_c capture;
+    errno = 0;
+    request(sub_command(3));
+    request(sub_command(3) + channel(1));
+    request(sub_command(3) + channel(1) + rate("ab"));
+    request(sub_command(5));
+    request(sub_command(5) + channel(1));
+    const std::vector<std::string> lines = error_lines(capture);
+    EXPECT_EQ(lines.size(), 5U);
+    EXPECT_EQ(std::set<std::string>(lines.begin(), lines.end()).size(), 5U);
 }
 
 TEST_F(wifi_radio, nothing_else_runs_while_wifi_is_off)
