@@ -1,4 +1,7 @@
-/* The test entry of the platform's audio HAL, loaded when needed; the entry has C linkage. */
+/*
+ * The test entry of the platform's audio HAL. It is loaded when needed, so what is named here are its path
+ * and the name and shape of the entry, which has C linkage.
+ */
 #pragma once
 
 #include <stdint.h>
