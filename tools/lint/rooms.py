@@ -57,8 +57,6 @@ SHORT_HEADERS: dict[str, str] = {
     "pub/util/util.h": "only gathers the headers of its room",
     "pub/pub-log.h": "the library's log sources, apart from the kit that logs",
     "amt/amt-log.h": "the daemon's log sources, apart from the kit that logs",
-    "amt/amt-device/command.h": "shell commands of the device tests, two ways",
-    "platform/include/audio-loop-hal.h": "one library with one entry",
 }
 
 # No source is longer, but for those with a reason.
