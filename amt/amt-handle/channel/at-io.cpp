@@ -26,7 +26,7 @@ constexpr int WAIT_SECONDS = 5;
 constexpr uint32_t ANSWER_SIZE = 20;
 constexpr uint32_t ANSWER_ROOM = 18;
 
-/* How long to wait before a tty that fails at once is asked again, in milliseconds: nothing may spin on it. */
+/* How long to wait before a tty that answers at once, but with nothing or a failure, is asked again, in ms. */
 constexpr uint32_t FAILED_TTY_PAUSE_MS = 100;
 
 /* What a failed transfer on the AT tty means: -118 when the tty is lost and may be reopened. */
@@ -56,15 +56,22 @@ ssize_t write_once(const char *text, uint32_t length)
     return write(fd, text, length);
 }
 
-/* One read. A line that has hung up reads as empty for ever: that is the EIO of a lost tty. */
+/*
+ * One read. A line that has hung up reads as empty for ever: that is the EIO of a lost tty. Any other that has
+ * nothing may say so at once, and is not asked again at once.
+ */
 ssize_t read_line(int fd, char *buf, uint32_t length)
 {
     const ssize_t count = amt_wait_read(fd, buf, length);
-    if (count == 0 && is_hung_up(fd)) {
+    if (count != 0) {
+        return count;
+    }
+    if (is_hung_up(fd)) {
         errno = EIO;
         return -1;
     }
-    return count;
+    pub_util_sleep_ms(FAILED_TTY_PAUSE_MS);
+    return 0;
 }
 
 ssize_t read_once(char *buf, uint32_t length)
@@ -156,8 +163,8 @@ void read_answer_piece(int fd, answer_st *answer_ptr)
         answer_ptr->m_is_line_lost = errno == EIO;
         pub_log_sys_call(g_amt_handle_log, "read");
         answer_ptr->m_status = fail_switch_off(__LINE__, PUB_ERR_FILE);
+        pub_util_sleep_ms(FAILED_TTY_PAUSE_MS);
     }
-    pub_util_sleep_ms(FAILED_TTY_PAUSE_MS);
 }
 
 int report_time_out(const timespec &start)
