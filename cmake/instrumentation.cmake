@@ -16,10 +16,14 @@ if(VX_COVERAGE)
   add_link_options(--coverage)
 endif()
 
-# A program that ends by _exit writes its counts first.
+# What a program of an instrumented build has beside its own code: one that ends by _exit writes its counts first, and
+# the thread sanitizer is told what it need not report.
 function(vx_count_at_exit target)
   if(VX_COVERAGE)
     target_sources(${target} PRIVATE ${CMAKE_SOURCE_DIR}/cmake/coverage-exit.cpp)
     target_link_options(${target} PRIVATE -Wl,--wrap=_exit)
+  endif()
+  if(VX_SANITIZE MATCHES "thread")
+    target_sources(${target} PRIVATE ${CMAKE_SOURCE_DIR}/cmake/tsan-suppressions.cpp)
   endif()
 endfunction()

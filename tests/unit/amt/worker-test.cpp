@@ -27,6 +27,7 @@ amt_worker_st *g_worker_ptr;
 
 std::atomic<int> g_step{0};
 std::atomic<int> g_released{0};
+std::atomic<int> g_is_looked_at{0}; /* the record of the worker that has just been started */
 int g_pipe_a[2];
 
 long elapsed_ms(steady_clock_t::time_point start)
@@ -50,6 +51,7 @@ protected:
         g_worker_ptr = &g_worker_a[g_worker_count++];
         g_step = 0;
         g_released = 0;
+        g_is_looked_at = 0;
         ASSERT_EQ(pipe(g_pipe_a), 0);
         alarm(DEADLINE_SECONDS);
     }
@@ -65,6 +67,7 @@ protected:
         ASSERT_EQ(amt_worker_start(g_worker_ptr, loop), 0);
         EXPECT_NE(g_worker_ptr->m_id.load(), 0U);
         EXPECT_EQ(g_worker_ptr->m_is_alive, 1);
+        g_is_looked_at = 1;
         wait_for(g_step, STEP_STARTED);
     }
 
@@ -100,12 +103,14 @@ void work_until_released()
 
 void note_deferral()
 {
+    wait_for(g_is_looked_at, 1);
     g_released = pub_util_is_thread_end_deferred() ? 1 : 2;
     g_step = STEP_STARTED;
 }
 
 void leave_and_work_on()
 {
+    wait_for(g_is_looked_at, 1);
     amt_worker_leave(g_worker_ptr);
     g_step = STEP_STARTED;
     wait_for(g_released, 1);
