@@ -27,7 +27,7 @@ FILES: dict[str, str | bytes] = {
     "/sys/class/leds/lcd-backlight/brightness": "128\n",
     "/sys/class/power_supply/ac/online": "0\n",
     "/sys/class/power_supply/battery/temp": "315\n",
-    "/sys/class/power_supply/battery/voltage_now": "3987\n",
+    "/sys/class/power_supply/battery/voltage_now": "3987000\n",
     "/sys/class/timed_output/vibrator/enable": "0\n",
     "/sys/devinfo/emmc_info": "HW8G-0031 7456 MiB rev 5\n",
     "/sys/sarvo/board_info": "KEL board rev C\n",

@@ -11,7 +11,7 @@ from support.traffic import APP_IN, APP_OUT, dump
 
 VOLTAGE = "/sys/class/power_supply/battery/voltage_now"
 PTY_TAG = "vx-kel-pub"
-CLEARED = dump(APP_OUT, packet(10, integer(5, 3987), integer(1, 0)).encode())
+CLEARED = dump(APP_OUT, packet(10, integer(5, 3987000), integer(1, 0)).encode())
 
 
 def link(handset: Handset, path: str = "/dev/ttyAPP0") -> str:
@@ -22,7 +22,7 @@ def link(handset: Handset, path: str = "/dev/ttyAPP0") -> str:
 def test_request_answer_and_their_log(app: AppChannel) -> None:
     trace = Trace(app.handset)
     answer = app.request(9)
-    assert answer == packet(10, integer(5, 3987), integer(1, 0))
+    assert answer == packet(10, integer(5, 3987000), integer(1, 0))
     app.handset.log.wait(CLEARED)
     trace.expect(dump(APP_IN, packet(9).encode()), "handle_amt_app_req()",
                  "receive command id: 9(0x09) - AMT_READ_BATTERY_CMD", CLEARED)
@@ -54,9 +54,9 @@ def test_id_255_is_unknown(app: AppChannel) -> None:
 def test_refused_request_is_cleared(app: AppChannel) -> None:
     app.handset.place(VOLTAGE, None)
     assert app.request(9) == packet(10, integer(1, 1))
-    app.handset.place(VOLTAGE, "3987\n")
+    app.handset.place(VOLTAGE, "3987000\n")
     trace = Trace(app.handset)
-    assert app.request(9) == packet(10, integer(5, 3987), integer(1, 0))
+    assert app.request(9) == packet(10, integer(5, 3987000), integer(1, 0))
     # The second request came alone.
     trace.expect(dump(APP_IN, packet(9).encode()))
 
@@ -114,7 +114,7 @@ def test_app_that_leaves_without_its_answer(app: AppChannel) -> None:
     mux.write(b"\r\n^DMSN: 77\r\n\r\nOK\r\n")
     handset.log.wait("pty disconnect: pts name(", after=mark)
     handset.app.open()
-    assert app.request(9) == packet(10, integer(5, 3987), integer(1, 0))
+    assert app.request(9) == packet(10, integer(5, 3987000), integer(1, 0))
 
 
 def test_app_line_that_cannot_be_made_again(make_handset: HandsetFactory) -> None:

@@ -41,6 +41,7 @@ def test_voltage(app: AppChannel) -> None:
 
 
 def test_voltage_on_the_wire(app: AppChannel) -> None:
+    app.handset.place(VOLTAGE_FILE, "3987\n")
     app.send(bytes.fromhex("0600bb090000"))
     assert app.line.read_exactly(24) == bytes.fromhex(
         "1800bb0a1200" "ee05010400" "930f0000" "ee01010400" "00000000")
