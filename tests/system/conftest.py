@@ -14,6 +14,8 @@ from support.command import COMMAND, PATIENCE, PROJECT
 HandsetFactory = Callable[..., Handset]
 FAKE_DAEMON = Path(__file__).with_name("support") / "fake_daemon.py"
 HANDSETS = pytest.StashKey[list[Handset]]()
+# A test that takes so long hangs, on however busy a machine.
+MOST_SECONDS = 900
 FAILED = pytest.StashKey[bool]()
 
 
@@ -22,6 +24,13 @@ def pytest_addoption(parser: pytest.Parser) -> None:
     parser.addoption("--handset-build", default="release",
                      help="preset or directory of the build whose daemon is tested "
                           "(default: %(default)s)")
+
+
+def pytest_collection_modifyitems(config: pytest.Config, items: list[pytest.Item]) -> None:
+    """Each wait has its own deadline; a test of many waits may need longer than the usual limit."""
+    if config.pluginmanager.hasplugin("timeout"):
+        for item in items:
+            item.add_marker(pytest.mark.timeout(MOST_SECONDS))
 
 
 @pytest.fixture(scope="session")

@@ -41,6 +41,11 @@ class Terminal:
 
     def end(self) -> int:
         """The exit status, once it has ended."""
+        ended = os.pidfd_open(self.pid)
+        try:
+            assert select.select([ended], [], [], PATIENCE)[0], "it does not end"
+        finally:
+            os.close(ended)
         status = os.waitstatus_to_exitcode(os.waitpid(self.pid, 0)[1])
         os.close(self._fd)
         return status
@@ -95,6 +100,8 @@ def test_lines_are_edited_and_kept(terminal: Terminal, tmp_path: Path, handset_b
     again.until(PROMPT)
     again.type(b"\x1b[A\x1b[A\n")
     again.until(b"CONFIGURED")
+    # Keys count from the prompt on: before, the terminal itself edits.
+    again.until(PROMPT)
     again.type(b"\x04")
     assert again.end() == 0
     kept = (tmp_path / "state" / "amt-handset" / "history").read_text().splitlines()
@@ -115,6 +122,19 @@ def test_deaths_are_told_at_the_prompt(terminal: Terminal) -> None:
     kill_init(with_control.directory)
     terminal.until(b"amt-handset: the sandbox has ended with signal 9 (SIGKILL)")
     assert terminal.end() == 1
+
+
+def test_deaths_are_told_without_a_terminal(up, base: Path) -> None:
+    """On standard error, with the statuses; nothing is left."""
+    process = up("--path", "packet")
+    handset = find(None)
+    handset.signal(signal.SIGSEGV)
+    assert process.stderr.readline() == "amt-handset: the daemon has ended with status 0\n"
+    kill_init(handset.directory)
+    assert process.wait(PATIENCE) == 1
+    assert process.stderr.read() == (
+        "amt-handset: the sandbox has ended with signal 9 (SIGKILL)\n")
+    assert list(base.iterdir()) == []
 
 
 def kill_init(directory: Path) -> None:
