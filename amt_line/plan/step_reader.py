@@ -143,6 +143,8 @@ def _limit_problems(step: Step, table: Mapping[str, Any]) -> _Problems:
     for limit in step.limits:
         if "equals" in limit.given and "one_of" in limit.given:
             yield f"limits.{limit.name}", "equals and one_of contradict each other"
+        if set(limit.given) == {"marginal"}:
+            yield f"limits.{limit.name}", "marginal alone limits nothing"
 
 
 def _value_problems(step: Step) -> _Problems:

@@ -26,7 +26,7 @@ def _suite(root: ElementTree.Element, record: Mapping[str, Any]) -> None:
     title = _xml(record["plan"]["title"])
     suite = ElementTree.SubElement(
         root, "testsuite", name=title, timestamp=record["began"].removesuffix("Z"),
-        hostname=_xml(record["station"]), id=record["run"])
+        hostname=_xml(record["station"]))
     _properties(suite, record)
     for step in record["steps"]:
         _case(suite, step, title)

@@ -27,8 +27,17 @@ def _nullable(schema: Schema) -> Schema:
     return {"anyOf": [schema, {"type": "null"}]}
 
 
-_DECODED: Schema = {"type": "object", "required": ["kind"], "properties": {
-    "kind": {"enum": ["packet", "acknowledgement", "text", "skipped"]}}}
+def _kind(kind: str, **properties: Schema) -> Schema:
+    return _table({"kind": {"const": kind}, **properties})
+
+
+_ATOM = _table({"id": {"type": "integer"}, "name": _nullable(_TEXT), "type": _TEXT,
+                "value": {"type": ["string", "integer"]}}, {"text": _TEXT})
+_PACKET = _table({"id": {"type": "integer"}, "name": _TEXT,
+                  "atoms": {"type": "array", "items": _ATOM}})
+_DECODED: Schema = {"oneOf": [
+    _kind("packet", packet=_PACKET), _kind("acknowledgement"), _kind("text", text=_TEXT),
+    _kind("skipped", bytes=_HEX, why=_TEXT)]}
 _RECEIVED = _table({"seconds": _SECONDS, "bytes": _HEX, "decoded": _DECODED}, {"late": _TEXT})
 _EXCHANGE = _table(
     {"purpose": {"enum": ["request", "text", "place"]}, "what": _TEXT, "began": _UTC,
