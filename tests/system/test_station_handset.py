@@ -49,7 +49,8 @@ def test_results(handset):
 """
 
 
-@pytest.mark.parametrize("channel, tests", [("pc", PC_TESTS), ("app", APP_TESTS)], ids=["pc", "app"])
+@pytest.mark.parametrize("channel, tests", [("pc", PC_TESTS), ("app", APP_TESTS)],
+                         ids=["pc", "app"])
 def test_the_plugin_brings_a_handset_up(channel: str, tests: str, tmp_path: Path,
                                         handset_build: "str | Path") -> None:
     (tmp_path / "test_handset.py").write_text(tests, encoding="utf-8")
