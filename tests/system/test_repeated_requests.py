@@ -1,6 +1,6 @@
 """Nothing is left behind by a request, however often it comes: descriptors, threads, children,
-memory. Each request of both lines is repeated; those with a pause of their own, on handsets of their
-own that pause together."""
+memory. Each request of both lines is repeated; those that pause, on handsets of their own
+that pause together."""
 
 from dataclasses import dataclass
 from typing import Mapping, Sequence, Union
