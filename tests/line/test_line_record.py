@@ -72,7 +72,7 @@ def test_a_full_disk_leaves_the_record_on_standard_error(tmp_path: Path, peer: P
     result = subprocess.run(
         station_command("-p", peer.path, "run", str(plan), "--records", str(folder)), cwd=ROOT,
         env=station_environment(PYTHONDONTWRITEBYTECODE="1"), stdin=subprocess.DEVNULL,
-        capture_output=True, text=True, timeout=120, check=False,
+        capture_output=True, text=True, timeout=300, check=False,
         preexec_fn=lambda: resource.setrlimit(resource.RLIMIT_FSIZE, (8192, 8192)))
     assert result.returncode == 7, result.stderr
     document, _, complaint = result.stderr.rpartition("}\n")

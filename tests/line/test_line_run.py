@@ -319,9 +319,7 @@ def test_the_first_request_ends_the_step_and_does_what_is_always_done(
             bench.abort(how)
 
     bench = Bench(load(tmp_path, step + ADC + WRITE_VERDICT), peer, records=records, on_event=stop)
-    start = time.monotonic()
     document = bench.run()
-    assert time.monotonic() - start < 30
     assert verdicts(document) == ["error", "skipped", "pass"] and stored_verdict(bench) == 2
     assert (document["verdict"], document["state"]) == ("ABORTED", "aborted")
     assert document["exit_status"] == how.exit_status and document["reason"].endswith(how.reason)
@@ -350,9 +348,9 @@ def test_always_steps_have_seconds_only_once_a_run_was_ended(tmp_path: Path, pee
 
     bench = Bench(load(tmp_path, "[[step]]\nwait = 60\n[[always]]\nwait = 60\n"), peer,
                   on_event=stop)
-    start = time.monotonic()
-    assert verdicts(bench.run()) == ["error", "error"]
-    assert time.monotonic() - start < 30
+    document = bench.run()
+    assert verdicts(document) == ["error", "error"]
+    assert "no time is left" in document["steps"][1]["reason"]
 
 
 def test_the_deadline_of_a_run(tmp_path: Path, peer: Peer) -> None:
@@ -385,7 +383,7 @@ def test_runs_side_by_side(tmp_path: Path) -> None:
     threads = [in_thread(lambda number=number: work(number))  # type: ignore[misc]
                for number in range(4)]
     for thread in threads:
-        thread.join(120)
+        thread.join(300)
     for number in range(4):
         assert documents[number]["verdict"] == "PASS"
         assert {step["values"][0]["value"] for step in documents[number]["steps"]} == {10 + number}

@@ -39,7 +39,7 @@ class Screen:
 
     def until(self, words: str) -> str:
         """Read until these words stand on the screen."""
-        end = time.monotonic() + 120
+        end = time.monotonic() + 300
         while words not in self.seen:
             assert time.monotonic() < end, f"{words!r} is not in {self.seen!r}"
             if select.select([self.master], [], [], 1.0)[0]:
@@ -59,11 +59,11 @@ class Screen:
         """Read to the end; the exit status."""
         try:
             while True:
-                if select.select([self.master], [], [], 120)[0]:
+                if select.select([self.master], [], [], 300)[0]:
                     self.seen += os.read(self.master, 65536).decode("utf-8", "replace")
         except OSError:
             pass
-        return self.process.wait(120)
+        return self.process.wait(300)
 
 
 @pytest.fixture(name="screens")
