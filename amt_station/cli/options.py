@@ -37,7 +37,7 @@ class Settings:
     timeout: float | None = None
     baud: int | None = None
     json: bool = False
-    serial: str | None = None
+    usb_serial: str | None = None
     vid_pid: str | None = None
 
     def say(self, name: str, value: Any) -> None:
@@ -70,7 +70,7 @@ class Settings:
     @property
     def wanted(self) -> Wanted | None:
         """The port that --serial and --vid-pid choose; None without them."""
-        if not self.serial and not self.vid_pid:
+        if not self.usb_serial and not self.vid_pid:
             return None
         if self.port not in (None, AUTO):
             raise UsageProblem(f"--port {self.port} and --serial or --vid-pid contradict each "
@@ -82,7 +82,7 @@ class Settings:
         """As ``wanted``; without choice any port on USB."""
         from amt_station.found_ports import Wanted
 
-        return Wanted(self.serial or "", self.vid_pid or "")
+        return Wanted(self.usb_serial or "", self.vid_pid or "")
 
     @property
     def chosen_port(self) -> str:
@@ -149,7 +149,7 @@ _OPTIONS = (
                  callback=_remember,
                  help="Port to the handset, any pySerial URL, or auto for the only one on USB  "
                  f"[${PORT_VARIABLE}]"),
-    click.option("--serial", metavar="NUMBER", multiple=True, expose_value=False,
+    click.option("--serial", "usb_serial", metavar="NUMBER", multiple=True, expose_value=False,
                  callback=_remember, help="The USB port with this serial number"),
     click.option("--vid-pid", metavar="VID:PID", multiple=True, expose_value=False,
                  callback=_remember, help="The USB port with these ids"),

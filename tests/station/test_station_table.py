@@ -5,8 +5,10 @@ from __future__ import annotations
 from collections import Counter
 from typing import Hashable
 
+import click
 import pytest
 
+from amt_station.cli.typed import typed_command
 from amt_station.errors import UsageProblem
 from amt_station.perform import run_operation
 from amt_station.requests.at_commands import AT_COMMANDS, FLUSH_COMMAND, known_refusal
@@ -207,6 +209,19 @@ def test_ways_to_name_a_command(text: str, command: int) -> None:
 def test_what_is_no_command(text: str) -> None:
     with pytest.raises(UsageProblem):
         find_command(text)
+
+
+@pytest.mark.parametrize("operation", [operation for _, operation in operations()],
+                         ids=lambda operation: operation.name)
+def test_no_value_is_named_like_an_option_of_all_commands(operation: Operation) -> None:
+    command = typed_command(operation.path[0])
+    for word in operation.path[1:]:
+        assert isinstance(command, click.Group)
+        command = command.commands[word]
+    assert command is not None
+    names = [parameter.name for parameter in command.params]
+    flags = [flag for parameter in command.params for flag in parameter.opts]
+    assert len(set(names)) == len(names) and len(set(flags)) == len(flags)
 
 
 class NoLink:
