@@ -17,13 +17,14 @@ if(VX_COVERAGE)
 endif()
 
 # What a program of an instrumented build has beside its own code: one that ends by _exit writes its counts first, and
-# the thread sanitizer is told what it need not report.
-function(vx_count_at_exit target)
+# the thread sanitizer gets the help it needs.
+function(vx_instrument_program target)
   if(VX_COVERAGE)
     target_sources(${target} PRIVATE ${CMAKE_SOURCE_DIR}/cmake/coverage-exit.cpp)
     target_link_options(${target} PRIVATE -Wl,--wrap=_exit)
   endif()
   if(VX_SANITIZE MATCHES "thread")
-    target_sources(${target} PRIVATE ${CMAKE_SOURCE_DIR}/cmake/tsan-suppressions.cpp)
+    target_sources(${target} PRIVATE ${CMAKE_SOURCE_DIR}/cmake/tsan-support.cpp)
+    target_link_options(${target} PRIVATE -Wl,--wrap=read)
   endif()
 endfunction()
