@@ -22,7 +22,7 @@ class Copy:
         for path in (self.root, self.programs, self.elsewhere):
             path.mkdir()
         shutil.copy(ROOT / "dev", self.root)
-        for name in ("tools", "amt_station", "amt_simulator"):
+        for name in ("tools", "amt_line", "amt_station", "amt_simulator"):
             shutil.copytree(ROOT / name, self.root / name,
                             ignore=shutil.ignore_patterns("__pycache__"))
         # Every package is there, unless a test says otherwise.

@@ -82,7 +82,7 @@ def test_paths_are_the_callers(copy: Copy) -> None:
     (copy.elsewhere / "plan.toml").write_text("no plan\n")
     for name in ("json.py", "click.py"):
         (copy.elsewhere / name).write_text("raise SystemExit('taken from the caller')\n")
-    ended = dev(copy, "station", "-p", "/nowhere", "plan", "plan.toml")
+    ended = dev(copy, "station", "check", "plan.toml")
     assert "plan.toml" in ended.stderr and "taken from" not in ended.stderr
     assert "No such file" not in ended.stderr and "does not exist" not in ended.stderr
 
@@ -124,7 +124,8 @@ def test_an_interrupted_suite_cleans_up_and_is_one_line(copy: Copy, tmp_path: Pa
     began, cleaned = tmp_path / "began", tmp_path / "cleaned"
     folder = copy.root / "tests" / "station"
     folder.mkdir(parents=True)
-    (copy.root / "tests" / "scripts").mkdir()
+    for other in ("line", "scripts"):
+        (copy.root / "tests" / other).mkdir()
     (folder / "test_slow.py").write_text(
         "import pathlib, time\n"
         "def test_slow():\n"

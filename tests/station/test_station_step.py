@@ -3,6 +3,7 @@
 from __future__ import annotations
 
 import threading
+import time
 from typing import Sequence
 
 import pytest
@@ -92,22 +93,26 @@ def test_without_a_place_nothing_else_is_sent(peer: Peer, link: Link) -> None:
     assert not link.in_step
 
 
-def test_a_line_that_never_falls_silent_is_an_error(peer: Peer, link: Link) -> None:
-    stop = threading.Event()
+class EndlessPort:
+    """A line on which there is always another OK."""
 
-    def flood() -> None:
-        while not stop.wait(0.02):
-            peer.say(OK)
+    name = "endless"
 
-    lost(peer, link, [OK])
-    flooding = threading.Thread(target=flood)
-    flooding.start()
-    try:
-        with pytest.raises(OutOfStep, match="fall silent"):
-            link.find_place()
-    finally:
-        stop.set()
-        flooding.join()
+    def read(self, timeout: float) -> bytes:
+        """The next OK, at once where there is no time to wait for it."""
+        time.sleep(min(timeout, 0.02))
+        return OK if timeout > 0 else b""
+
+    def write(self, data: bytes, timeout: float) -> None:
+        """Taken, and not looked at."""
+
+    def close(self) -> None:
+        """Nothing is held."""
+
+
+def test_a_line_that_never_falls_silent_is_an_error() -> None:
+    with pytest.raises(OutOfStep, match="fall silent"):
+        Link(EndlessPort()).find_place()
 
 
 def test_a_held_packet_found_on_the_way_is_refused_with_the_advice(peer: Peer, link: Link) -> None:
