@@ -12,6 +12,7 @@ from typing import Callable
 
 import pytest
 
+from amt_simulator.running import find
 from amt_station import wire
 from support.command import COMMAND, PATIENCE, PROJECT, handset, output
 from support.modem_desk import OK
@@ -92,8 +93,10 @@ def test_usb_and_restart(up) -> None:
 def test_the_port_goes_with_the_cable(up) -> None:
     """A program that holds it sees the hang-up; plugged in, it is there again under its name."""
     up()
+    up_handset = find(None)
     status = json.loads(output("status", "--json"))
-    for again in ("plug", "configure"):
+    for number, again in enumerate(("plug", "configure")):
+        assert talk(status["pc"], b"AT\r", OK) == OK
         held = os.open(status["pc"], os.O_RDWR | os.O_NOCTTY)
         output("unplug")
         assert not os.path.lexists(status["pc"])
@@ -104,6 +107,8 @@ def test_the_port_goes_with_the_cable(up) -> None:
             os.write(held, b"AT\r")
         os.close(held)
         output(again)
+        # The daemon that the unplugging ends may still take a text, and take it along.
+        assert up_handset.wait_exit(number) == 0
         assert talk(status["pc"], b"AT\r", OK) == OK
         # What is plugged in already stays as it is.
         before = os.readlink(status["pc"])

@@ -128,6 +128,7 @@ def test_deaths_are_told_without_a_terminal(up, base: Path) -> None:
     """On standard error, with the statuses; nothing is left."""
     process = up("--path", "packet")
     handset = find(None)
+    handset.log.wait("amt_handle_read_app_loop()")
     handset.signal(signal.SIGSEGV)
     assert process.stderr.readline() == "amt-handset: the daemon has ended with status 0\n"
     kill_init(handset.directory)
