@@ -62,14 +62,15 @@ def unanswered(exchange: Exchange, limit: float) -> StationError:
 
 def no_final_result(reply: AtReply, echoed: bool, limit: float) -> StationError:
     """The error for an AT text whose final result did not come within ``limit`` seconds."""
-    wrong = _wrong_line(reply.stray, Channel.PC)
+    arrived = [timed.item for timed in reply.transcript.items]
+    wrong = _wrong_line(arrived, Channel.PC)
     if wrong:
         return BadFrame(f"no final result for {reply.sent} within {limit:g} s: {wrong}")
     damage = _first_damage(reply.stray)
     if damage is not None:
         return BadFrame(f"the answer to {reply.sent} could not be read: {damage.error}",
                         damage.error)
-    instead = _instead([timed.item for timed in reply.transcript.items])
+    instead = _instead(arrived)
     if echoed and not reply.lines:
         instead = ": the line only sent the text itself back, as an echo or a loop does"
     return NoAnswer(f"no final result for {reply.sent} within {limit:g} s{instead}", reply.stray)
@@ -88,9 +89,10 @@ def _wrong_line(items: Sequence[Item], channel: Channel) -> str:
     """That the answer came in the form of the other line; empty when it did not."""
     if channel is not Channel.PC:
         return ""
-    skipped = b"".join(item.raw for item in items if isinstance(item, Skipped))
-    packets = [item.packet for item in BareDecoder().feed(skipped) if isinstance(item, Frame)]
-    if not packets or MAGIC in skipped:
+    # Some bytes of a bare packet may look like text.
+    unframed = b"".join(item.raw for item in items if isinstance(item, (Skipped, Text)))
+    packets = [item.packet for item in BareDecoder().feed(unframed) if isinstance(item, Frame)]
+    if not packets or _first_damage(items) is None or MAGIC in unframed:
         return ""
     return f"{_packet(packets[0])} came without an envelope; {_APP_CHANNEL}"
 
