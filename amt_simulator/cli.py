@@ -124,12 +124,7 @@ def up(path: str, build: str, **given: Any) -> None:
     # Only who stays needs the library for typing.
     from amt_simulator import prompt
 
-    def end(_number: int, _frame: object) -> None:
-        # One is enough: the end is on its way.
-        for number in ENDS:
-            signal.signal(number, signal.SIG_IGN)
-        raise KeyboardInterrupt
-
+    end = prompt.End()
     for number in ENDS:
         signal.signal(number, end)
     place: str | Path = Path(build).resolve() if os.sep in build else build
@@ -139,7 +134,7 @@ def up(path: str, build: str, **given: Any) -> None:
         with made:
             _introduce(made, _announce(made, build))
             sys.stdout.flush()
-            prompt.serve(made, handset)
+            prompt.serve(made, handset, end)
             death = made.death
     except KeyboardInterrupt:
         pass

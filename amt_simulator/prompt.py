@@ -27,12 +27,29 @@ class _Down(Exception):
     """The handset has ended while a command was awaited."""
 
 
+class End:
+    """The handler of the signals that ask for the end: one is enough, it is on its way then."""
+
+    def __init__(self) -> None:
+        self.is_asked = False
+        self.is_final = False
+
+    def __call__(self, number: int, _frame: object) -> None:
+        """Interrupt the main thread, once."""
+        self.is_final = self.is_final or number != signal.SIGINT
+        if not self.is_asked:
+            self.is_asked = True
+            raise KeyboardInterrupt
+
+
 class Watch:
     """Looks at the handset from time to time, in the main thread, whatever that waits for."""
 
-    def __init__(self, handset: Handset) -> None:
+    def __init__(self, handset: Handset, end: "End") -> None:
         self._handset = handset
+        self._end = end
         self._told = 0
+        self._is_over = False
         self.is_typing = False
 
     @contextlib.contextmanager
@@ -43,11 +60,17 @@ class Watch:
         try:
             yield
         finally:
+            self._is_over = True
             signal.setitimer(signal.ITIMER_REAL, 0)
             signal.signal(signal.SIGALRM, before)
 
     def look(self) -> None:
-        """Tell of the daemon's deaths; a wait for a command ends with the handset."""
+        """Tell of the daemon's deaths; a wait for a command ends with the handset.
+
+        An end that was asked for is repeated: what interrupted a finalizer got lost there.
+        """
+        if self._end.is_asked and not self._is_over:
+            raise KeyboardInterrupt
         with contextlib.suppress(OSError, HandsetError):
             exits = self._handset.exits()
             for status in exits[self._told:]:
@@ -62,21 +85,21 @@ class Watch:
             readline.redisplay()
 
 
-def serve(handset: Handset, group: click.Group) -> None:
+def serve(handset: Handset, group: click.Group, end: End) -> None:
     """Stay until the handset ends; at a terminal, run the commands that are typed."""
-    watch = Watch(handset)
+    watch = Watch(handset, end)
     with watch.set_up():
         if sys.stdin.isatty():
             click.echo("type a command (help lists them), exit or Ctrl-D ends", err=True)
             with history(), contextlib.suppress(_Down):
-                _converse(handset, group, watch)
+                _converse(handset, group, watch, end)
         else:
             while handset.is_up:
                 signal.pause()
         watch.look()
 
 
-def _converse(handset: Handset, group: click.Group, watch: Watch) -> None:
+def _converse(handset: Handset, group: click.Group, watch: Watch, end: End) -> None:
     """Take commands until one ends it."""
     names = ["help", *LEAVE, *(name for name in group.commands if name != "up")]
     readline.set_completer(lambda text, state: [
@@ -93,7 +116,7 @@ def _converse(handset: Handset, group: click.Group, watch: Watch) -> None:
             watch.is_typing = False
         if line.split()[:1] and line.split()[0] in LEAVE:
             return
-        run_line(handset, group, line)
+        run_line(handset, group, line, end)
 
 
 @contextlib.contextmanager
@@ -112,7 +135,7 @@ def history() -> Iterator[None]:
             readline.write_history_file(path)
 
 
-def run_line(handset: Handset, group: click.Group, line: str) -> None:
+def run_line(handset: Handset, group: click.Group, line: str, end: End) -> None:
     """Run one typed line as a command; what is wrong with it is said, nothing ends."""
     try:
         words = shlex.split(line)
@@ -126,7 +149,10 @@ def run_line(handset: Handset, group: click.Group, line: str) -> None:
     except (HandsetError, OSError, ValueError) as error:
         click.echo(f"{PROGRAM}: {error}", err=True)
     except (KeyboardInterrupt, click.Abort):
-        # Ends a log that is followed; the next one ends the handset.
+        if end.is_final:
+            raise KeyboardInterrupt from None
+        # Ctrl-C ends a log that is followed; the next one ends the handset.
+        end.is_asked = False
         click.echo(err=True)
 
 
