@@ -31,7 +31,10 @@ class Terminal:
         """Read up to TEXT; returns what came before."""
         while text not in self._said:
             assert select.select([self._fd], [], [], PATIENCE)[0], self._said
-            self._said += os.read(self._fd, 4096)
+            try:
+                self._said += os.read(self._fd, 4096)
+            except OSError:
+                raise AssertionError(f"the terminal has closed after {self._said!r}") from None
         before, _, self._said = self._said.partition(text)
         return before
 
