@@ -5,7 +5,6 @@
 #include <fcntl.h>
 #include <limits.h>
 #include <pthread.h>
-#include <sched.h>
 #include <signal.h>
 #include <stdio.h>
 #include <string.h>
@@ -26,6 +25,7 @@
 
 namespace {
 
+constexpr int INTERRUPT_COUNT = 10;
 const std::string CHECK_RUN = "pub_util_get_pid_and_check_run";
 
 std::string util_error(const std::string &func, int error_code, int error_number)
@@ -439,76 +439,6 @@ TEST(process_path, unreadable_command_line_is_passed_on)
     EXPECT_EQ(run.m_text_list[2], util_error("pub_util_get_cmd_line", -118, EMFILE));
 }
 
-TEST(priority, is_real_time_four_below_the_highest)
-{
-    const child_run_st run = run_in_child([] {
-        const int status = pub_util_raise_process_priority();
-        sched_param param = {};
-        sched_getparam(0, &param);
-        PUB_LOG((pub_log_source_st{"", ""}), "policy %d priority %d", sched_getscheduler(0),
-                param.sched_priority);
-        return status;
-    });
-    ASSERT_TRUE(run.m_is_complete);
-    if (run.m_result != PUB_ERR_NONE) {
-        GTEST_SKIP() << "real-time scheduling is not permitted here";
-    }
-    EXPECT_THAT(
-        run.m_text_list,
-        testing::ElementsAre("pub_util_raise_process_priority()",
-                             "policy 1 priority " + std::to_string(sched_get_priority_max(SCHED_FIFO) - 4)));
-}
-
-TEST(priority, is_the_calling_thread_s_too)
-{
-    const child_run_st run = run_in_child([] {
-        int status = -1;
-        pthread_t thread = 0;
-        const auto raise = [](void *status_ptr) -> void * {
-            *static_cast<int *>(status_ptr) = pub_util_raise_process_priority();
-            PUB_LOG((pub_log_source_st{"", ""}), "own policy %d, process's %d", sched_getscheduler(0),
-                    sched_getscheduler(getpid()));
-            return nullptr;
-        };
-        pthread_create(&thread, nullptr, raise, &status);
-        pthread_join(thread, nullptr);
-        return status;
-    });
-    ASSERT_TRUE(run.m_is_complete);
-    if (run.m_result != PUB_ERR_NONE) {
-        GTEST_SKIP() << "real-time scheduling is not permitted here";
-    }
-    EXPECT_THAT(run.m_text_list,
-                testing::ElementsAre("pub_util_raise_process_priority()", "own policy 1, process's 1"));
-}
-
-TEST(priority, refused_policy)
-{
-    const child_run_st run = run_in_child(pub_util_raise_process_priority, {SYS_sched_setscheduler, EPERM});
-    if (!run.m_is_complete) {
-        GTEST_SKIP() << "no system call can be refused here";
-    }
-    EXPECT_EQ(run.m_result, PUB_ERR_SYS_CALL);
-    EXPECT_THAT(run.m_text_list,
-                testing::ElementsAre("pub_util_raise_process_priority()",
-                                     sys_call_line("sched_setscheduler", EPERM),
-                                     util_error("pub_util_raise_process_priority", -1, EPERM)));
-}
-
-TEST(priority, unknown_range)
-{
-    const child_run_st run =
-        run_in_child(pub_util_raise_process_priority, {SYS_sched_get_priority_max, EINVAL});
-    if (!run.m_is_complete) {
-        GTEST_SKIP() << "no system call can be refused here";
-    }
-    EXPECT_EQ(run.m_result, PUB_ERR_SYS_CALL);
-    EXPECT_THAT(run.m_text_list,
-                testing::ElementsAre("pub_util_raise_process_priority()",
-                                     sys_call_line("sched_get_priority_max", EINVAL),
-                                     util_error("pub_util_raise_process_priority", -1, EINVAL)));
-}
-
 TEST(run_shell, gives_the_commands_status)
 {
     const log_capture_c capture;
@@ -524,21 +454,24 @@ TEST(run_shell, lets_an_interrupt_on_its_way_get_there_first)
         sigemptyset(&interrupt);
         sigaddset(&interrupt, SIGINT);
         pthread_sigmask(SIG_BLOCK, &interrupt, nullptr);
-        pthread_t thread = 0;
-        const auto run_many = [](void *) -> void * {
-            for (;;) {
-                pub_util_run_shell(":");
-            }
-        };
-        pthread_create(&thread, nullptr, run_many, nullptr);
         int taken = 0;
-        for (int i = 0; i < 50; i++) {
+        for (int i = 0; i < INTERRUPT_COUNT; i++) {
+            /* On its way before the command begins; it is taken only when the command has had time to begin. */
             kill(getpid(), SIGINT);
-            const timespec long_time = {10, 0};
-            taken += sigtimedwait(&interrupt, nullptr, &long_time) == SIGINT ? 1 : 0;
+            pthread_t thread = 0;
+            const auto run_one = [](void *) -> void * {
+                pub_util_run_shell(":");
+                return nullptr;
+            };
+            pthread_create(&thread, nullptr, run_one, nullptr);
+            const timespec head_start = {0, 5000000};
+            nanosleep(&head_start, nullptr);
+            const timespec no_time = {};
+            taken += sigtimedwait(&interrupt, nullptr, &no_time) == SIGINT ? 1 : 0;
+            pthread_join(thread, nullptr);
         }
         return taken;
     });
     ASSERT_TRUE(run.m_is_complete);
-    EXPECT_EQ(run.m_result, 50);
+    EXPECT_EQ(run.m_result, INTERRUPT_COUNT);
 }
