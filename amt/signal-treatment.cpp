@@ -165,11 +165,16 @@ void amt_signal_take(amt_worker_st *starter_ptr)
 
 void amt_signal_settle()
 {
+    /* From here on the caller takes no signal away from the main thread; one it has taken is handed over by now. */
+    const sigset_t terminating = get_terminating_set();
+    sigset_t own_mask;
+    pthread_sigmask(SIG_BLOCK, &terminating, &own_mask);
     g_is_to_settle = true;
     pthread_kill(g_main_thread, SIGUSR1);
     while (g_is_to_settle) {
         pub_util_sleep_ms(SETTLE_PAUSE_MS);
     }
+    pthread_sigmask(SIG_SETMASK, &own_mask, nullptr);
 }
 
 void amt_deinit_resource()
