@@ -39,8 +39,9 @@ PYTHON_FLOORS: Floors = (
     ("amt_station",),
     ("amt_station/cli", "amt_simulator/inside"),
     ("amt_simulator",),
-    ("amt_line/plan",),
+    ("amt_line/plan", "amt_line/statistics"),
     ("amt_line/run",),
+    ("amt_line/store", "amt_line/drawing"),
     ("amt_line/report", "amt_line/view"),
     ("amt_line", "amt_line/cli"),
     # A handset for other people's tests, simulated when none is named.
