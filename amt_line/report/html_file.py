@@ -7,7 +7,7 @@ from typing import Any, Mapping, Sequence
 
 from jinja2 import Environment, PackageLoader, StrictUndefined
 
-from amt_line.report.bars import bar_for
+from amt_line.drawing.value_bar import bar_for
 from amt_line.report.records import (counts, duration, limits_text, number_text, value_text,
                                      verdict_word)
 from amt_station.text import printable

@@ -14,7 +14,7 @@ import pytest
 from line_bench import ADC, OK, Bench, Script, adc, load
 from station_peer import Peer
 
-from amt_line.report.bars import bar_for
+from amt_line.drawing.value_bar import bar_for
 from amt_line.report.csv_file import COLUMNS, csv_text
 from amt_line.report.html_file import html_page
 from amt_line.report.junit import junit_xml

@@ -1,0 +1,1 @@
+"""Drawings: inline SVG, the same for files and for the page."""
