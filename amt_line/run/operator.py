@@ -2,7 +2,8 @@
 
 from __future__ import annotations
 
-from dataclasses import dataclass
+import uuid
+from dataclasses import dataclass, field
 from pathlib import Path
 from typing import Callable, Mapping, Protocol
 
@@ -17,6 +18,7 @@ class Question:
     text: str
     yes_or_no: bool
     picture: Path | None = None
+    id: str = field(default_factory=lambda: uuid.uuid4().hex)
 
 
 @dataclass(frozen=True)
@@ -42,6 +44,9 @@ def is_answer(question: Question, text: str) -> bool:
 class Operator(Protocol):
     """Answers questions. ``check`` is to be called all the time: it raises when the run ends."""
 
+    def expect(self, question: Question) -> None:
+        """A question is about to be told to the views, and asked then."""
+
     def answer(self, question: Question, check: Callable[[], None]) -> Answer | None:
         """The answer, or None when there is nobody to ask."""
 
@@ -51,6 +56,9 @@ class Operator(Protocol):
 
 class Nobody:
     """There is nobody to ask."""
+
+    def expect(self, question: Question) -> None:
+        """As in ``Operator``."""
 
     def answer(self, question: Question, check: Callable[[], None]) -> Answer | None:
         """As in ``Operator``."""
@@ -67,6 +75,11 @@ class GivenAnswers:
     def __init__(self, given: Mapping[str, str], others: Operator) -> None:
         self._given = given
         self._others = others
+
+    def expect(self, question: Question) -> None:
+        """As in ``Operator``."""
+        if question.step not in self._given:
+            self._others.expect(question)
 
     def answer(self, question: Question, check: Callable[[], None]) -> Answer | None:
         """As in ``Operator``."""

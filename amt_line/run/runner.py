@@ -42,6 +42,8 @@ class Setting:
     operator: Operator = field(default_factory=Nobody)
     listeners: Iterable[Listener] = ()
     keep: Callable[[Record], Keeper] = lambda record: NoRecord()
+    # Of a whole line, whose listeners then hear the run instead of those above.
+    stream: Stream | None = None
 
 
 class Runner:
@@ -57,7 +59,8 @@ class Runner:
         self._setting = setting
         self._stop = Stop(plan.deadline)
         self._tally = Tally()
-        self._stream = Stream(setting.listeners, run=self.record.run, slot=setting.where.slot)
+        whole = Stream(setting.listeners) if setting.stream is None else setting.stream
+        self._stream = whole.part(run=self.record.run, slot=setting.where.slot)
         self._connection = Connection(setting.open_port, plan.channel, setting.timeout,
                                       self._stop)
         self._variables: dict[str, Scalar] = dict(inputs)

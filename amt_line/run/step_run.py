@@ -133,12 +133,15 @@ class StepRun:
 
     def _asked(self, question: Question) -> None:
         self._tell("question", name=question.step, text=question.text,
-                   yes_or_no=question.yes_or_no,
-                   picture=str(question.picture) if question.picture else "")
+                   yes_or_no=question.yes_or_no, id=question.id,
+                   kind="yes-no" if question.yes_or_no else "text",
+                   picture=question.picture.name if question.picture else "")
 
-    def _answered(self, question: Question, answer: Answer) -> None:
-        self._tell("answer", name=question.step, answer=answer.text, by=answer.by)
-        self._document["answer"] = {"text": answer.text, "by": answer.by}
+    def _answered(self, question: Question, answer: Answer | None) -> None:
+        given = answer or Answer("", "")
+        self._tell("answer", name=question.step, id=question.id, text=given.text, by=given.by)
+        if answer is not None:
+            self._document["answer"] = {"text": answer.text, "by": answer.by}
 
     def _take(self, outcome: Outcome) -> None:
         self._document["values"] = outcome.documents

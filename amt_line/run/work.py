@@ -63,7 +63,7 @@ class Tools:
     check: Callable[[], None]
     sleep: Callable[[float], None]
     asked: Callable[[Question], None]
-    answered: Callable[[Question, Answer], None]
+    answered: Callable[[Question, Answer | None], None]
 
 
 def attempt(filled: Filled, tools: Tools) -> Outcome:
@@ -151,16 +151,25 @@ def _answer(question: Question, step: Step, tools: Tools) -> Answer:
         if end is not None and time.monotonic() > end:
             raise StationTrouble(f"the operator did not answer within {step.timeout:g} s")
 
+    tools.operator.expect(question)
     tools.asked(question)
-    answer = tools.operator.answer(question, check)
+    answer = None
+    try:
+        answer = _heard(question, tools.operator.answer(question, check))
+    finally:
+        # The views are to take the question away, also when nobody has answered it.
+        tools.answered(question, answer)
+    return answer
+
+
+def _heard(question: Question, answer: Answer | None) -> Answer:
     if answer is None:
         raise StationTrouble("there is nobody to ask: no terminal, and no --answer")
-    if not is_answer(question, answer.text):
-        wanted = "yes nor no" if question.yes_or_no else "a text that can be shown"
-        raise StationTrouble(f"the answer {plain(answer.text)!r} is neither {wanted}"
-                             if question.yes_or_no else f"the answer is not {wanted}")
-    tools.answered(question, answer)
-    return answer
+    if is_answer(question, answer.text):
+        return answer
+    if question.yes_or_no:
+        raise StationTrouble(f"the answer {plain(answer.text)!r} is neither yes nor no")
+    raise StationTrouble("the answer is not a text that can be shown")
 
 
 def _wait(filled: Filled, tools: Tools) -> list[Value]:

@@ -79,6 +79,9 @@ class Terminal:
 
     # during a run
 
+    def expect(self, question: Question) -> None:
+        """As in ``Operator``."""
+
     def answer(self, question: Question, check: Callable[[], None]) -> Answer | None:
         """As in ``Operator``."""
         prompt = question.text + (" [yes/no]" if question.yes_or_no else ":")

@@ -189,6 +189,9 @@ def test_a_held_packet_ends_the_run_with_the_advice(tmp_path: Path, peer: Peer) 
 class Hand:
     """An operator who pulls the cable when asked to."""
 
+    def expect(self, question: Question) -> None:
+        """As in ``Operator``."""
+
     def answer(self, question: Question, check: Callable[[], None]) -> Answer | None:
         """As in ``Operator``: never an answer."""
         while question:
