@@ -65,7 +65,16 @@ class Record:
 
     def text(self) -> str:
         """The document as it is written: a line a step."""
-        head = ",\n".join(f"{json.dumps(name)}: {json.dumps(value)}"
-                          for name, value in self._head.items())
-        steps = ",\n".join(self._texts)
-        return "{\n" + head + ",\n\"steps\": [\n" + steps + "\n]\n}\n"
+        return _text(self._head, self._texts)
+
+
+def document_text(document: Document) -> str:
+    """The text of a whole document, as a record's file has it."""
+    head = {name: value for name, value in document.items() if name != "steps"}
+    return _text(head, [json.dumps(step) for step in document["steps"]])
+
+
+def _text(head: Document, texts: list[str]) -> str:
+    lines = ",\n".join(f"{json.dumps(name)}: {json.dumps(value)}" for name, value in head.items())
+    steps = ",\n".join(texts)
+    return "{\n" + lines + ",\n\"steps\": [\n" + steps + "\n]\n}\n"

@@ -1,0 +1,200 @@
+"""The database of records: put, found again, counted. Threads and processes may share it."""
+
+from __future__ import annotations
+
+import hashlib
+import json
+from typing import Any, Iterable, Iterator, Mapping
+
+from sqlalchemy import delete, func, insert, select, update
+from sqlalchemy.engine import Connection, Engine
+from sqlalchemy.exc import IntegrityError
+
+from amt_line.run.clock import utc_now
+from amt_line.run.record import Document, document_text
+from amt_line.store import queries
+from amt_line.store.engine import make_engine, reading, told, writing
+from amt_line.store.migrate import bring_up_to_date, check_version
+from amt_line.store.problems import BadRecord, StoreProblem
+from amt_line.store.rows import Row, Rows, rows_of
+from amt_line.store.search import Filter, Found, RunRow, Search, StepRow, ValueRow
+from amt_line.store.tables import RECORDS, RUNS, STEP_VALUES, STEPS
+from amt_line.store.url import checked_url, shown_url
+
+_BATCH = 500
+
+
+class Store:
+    """One database. Use ``open``; what goes wrong is ``StoreProblem``, ``StoreAway`` when the
+    same may go well later."""
+
+    def __init__(self, engine: Engine, url: str) -> None:
+        self.url = shown_url(url)
+        self._engine = engine
+
+    @classmethod
+    def open(cls, url: str, create: bool = True) -> Store:
+        """Open a database: make or migrate it, or, without ``create``, take it only as it is.
+
+        One of a newer version is refused.
+        """
+        checked = checked_url(url)
+        engine = make_engine(checked, create)
+        try:
+            if create:
+                with told(engine):
+                    bring_up_to_date(engine)
+            else:
+                check_version(engine)
+        except BaseException:
+            engine.dispose()
+            raise
+        return cls(engine, checked)
+
+    def close(self) -> None:
+        """Give the connections back."""
+        self._engine.dispose()
+
+    def __enter__(self) -> Store:
+        return self
+
+    def __exit__(self, *_error: object) -> None:
+        self.close()
+
+    def put(self, document: Document, origin: str = "", file: str = "") -> bool:
+        """Put a record; False when it is there already, or one that has got further is."""
+        return self.put_text(document_text(document), origin, file)
+
+    def put_text(self, text: str, origin: str = "", file: str = "") -> bool:
+        """Put a record as its file has it. ``origin`` is the directory, ``file`` the name in it.
+
+        ``BadRecord`` when it is none.
+        """
+        rows, record = _taken_apart(text, origin, file)
+        try:
+            with writing(self._engine) as connection:
+                return _put(connection, rows, record)
+        except IntegrityError:
+            # Somebody else has put the same run meanwhile.
+            with told(self._engine), writing(self._engine) as connection:
+                return _put(connection, rows, record)
+
+    def put_new(self, texts: Iterable[str]) -> int:
+        """Put many records quickly, of runs that are not there yet; how many they were."""
+        count = 0
+        for batch in _batches((_taken_apart(text, "", "") for text in texts), _BATCH):
+            try:
+                with writing(self._engine) as connection:
+                    _put_batch(connection, batch)
+            except IntegrityError as error:
+                raise StoreProblem(f"{self.url}: one of the runs is there already") from error
+            count += len(batch)
+        return count
+
+    def record(self, run: str) -> Document | None:
+        """The record of a run."""
+        text = self.record_text(run)
+        return None if text is None else json.loads(text)
+
+    def record_text(self, run: str) -> str | None:
+        """The record of a run as its file has it."""
+        wanted = select(RECORDS.c.document).join_from(RUNS, RECORDS).where(RUNS.c.run == run)
+        with reading(self._engine) as connection:
+            text: str | None = connection.execute(wanted).scalar_one_or_none()
+        return text
+
+    def runs(self, search: Search = Search()) -> Found:
+        """A page of runs."""
+        with reading(self._engine) as connection:
+            total = connection.execute(queries.count(search)).scalar_one()
+            rows = connection.execute(queries.page(search)).all()
+        return Found([RunRow._make(row) for row in rows], int(total))
+
+    def words(self) -> dict[str, list[str]]:
+        """The plans, stations and slots that there are, for a choice."""
+        columns = {"plan": RUNS.c.plan, "station": RUNS.c.station, "slot": RUNS.c.slot}
+        with reading(self._engine) as connection:
+            return {name: list(connection.execute(select(column).distinct().order_by(column))
+                               .scalars())
+                    for name, column in columns.items()}
+
+    def runs_for_statistics(self, wanted: Filter = Filter()) -> Iterator[RunRow]:
+        """The runs in the order of their begin."""
+        return map(RunRow._make, self._stream(queries.chosen_runs(wanted)))
+
+    def steps_for_statistics(self, wanted: Filter = Filter()) -> Iterator[StepRow]:
+        """The steps of these runs, run by run in the order in which they were put."""
+        return map(StepRow._make, self._stream(queries.chosen_steps(wanted)))
+
+    def values_for_statistics(self, wanted: Filter = Filter()) -> Iterator[ValueRow]:
+        """The values of these runs, run by run in the order in which they were put."""
+        return map(ValueRow._make, self._stream(queries.chosen_values(wanted)))
+
+    def _stream(self, query: Any) -> Iterator[Any]:
+        with reading(self._engine) as connection:
+            result = connection.execution_options(stream_results=True).execute(query)
+            for part in result.partitions(10_000):
+                yield from part
+
+
+def _taken_apart(text: str, origin: str, file: str) -> tuple[Rows, Row]:
+    try:
+        data = text.encode("utf-8")
+        document = json.loads(text)
+    except (ValueError, RecursionError) as error:
+        raise BadRecord(f"no record of a run: {error}") from error
+    return rows_of(document), {
+        "document": text, "sha256": hashlib.sha256(data).hexdigest(), "origin": origin,
+        "file": file, "stored": utc_now()}
+
+
+def _put(connection: Connection, rows: Rows, record: Row) -> bool:
+    there = connection.execute(
+        select(RUNS.c.id, RUNS.c.state, RECORDS.c.sha256,
+               select(func.count()).select_from(STEPS).where(STEPS.c.run_id == RUNS.c.id)
+               .scalar_subquery())
+        .join_from(RUNS, RECORDS).where(RUNS.c.run == rows.run["run"])
+        .with_for_update(of=RUNS)).one_or_none()
+    if there is None:
+        number = connection.execute(insert(RUNS), rows.run).inserted_primary_key[0]
+    else:
+        number, state, sha256, steps = there
+        if sha256 == record["sha256"] or state != "running":
+            return False
+        if rows.run["state"] == "running" and len(rows.steps) <= steps:
+            return False
+        for table in (STEP_VALUES, STEPS, RECORDS):
+            connection.execute(delete(table).where(table.c.run_id == number))
+        connection.execute(update(RUNS).where(RUNS.c.id == number), rows.run)
+    _put_parts(connection, [(number, rows, record)])
+    return True
+
+
+def _put_batch(connection: Connection, batch: list[tuple[Rows, Row]]) -> None:
+    connection.execute(insert(RUNS), [rows.run for rows, _ in batch])
+    runs = [rows.run["run"] for rows, _ in batch]
+    numbers: Mapping[str, int] = dict(connection.execute(
+        select(RUNS.c.run, RUNS.c.id).where(RUNS.c.run.in_(runs))).all())
+    _put_parts(connection, [(numbers[rows.run["run"]], rows, record) for rows, record in batch])
+
+
+def _put_parts(connection: Connection, runs: list[tuple[int, Rows, Row]]) -> None:
+    for table, parts in (
+            (RECORDS, [{"run_id": number, **record} for number, _, record in runs]),
+            (STEPS, [{"run_id": number, **step} for number, rows, _ in runs
+                     for step in rows.steps]),
+            (STEP_VALUES, [{"run_id": number, **value} for number, rows, _ in runs
+                           for value in rows.values])):
+        if parts:
+            connection.execute(insert(table), parts)
+
+
+def _batches(items: Iterable[tuple[Rows, Row]], size: int) -> Iterator[list[tuple[Rows, Row]]]:
+    batch = []
+    for item in items:
+        batch.append(item)
+        if len(batch) == size:
+            yield batch
+            batch = []
+    if batch:
+        yield batch
