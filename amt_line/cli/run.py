@@ -13,6 +13,7 @@ import click
 from amt_line.cli import places
 from amt_line.cli.outputs import Outputs
 from amt_line.cli.signals import ending_in_order
+from amt_line.cli.store_option import STORE_OPTION
 from amt_line.plan.filled import check_with_inputs
 from amt_line.plan.inputs import known_values, row_of
 from amt_line.plan.model import Kind, Plan
@@ -22,6 +23,7 @@ from amt_line.run.operator import GivenAnswers, Nobody, Operator, Question, is_a
 from amt_line.run.record import Record, Where
 from amt_line.run.record_file import Keeper, NoRecord, RecordFile, file_name
 from amt_line.run.runner import Runner, Setting
+from amt_line.store import Delivery, checked_url
 from amt_line.view.lines import LineView
 from amt_line.view.prompt import Terminal, there_is_a_terminal
 from amt_station import __version__
@@ -42,6 +44,7 @@ class _Wishes:
     dut: str | None
     answers: Mapping[str, str]
     records: Path | None
+    store: str
     station: str | None
     operator: str | None
 
@@ -57,7 +60,8 @@ class _Wishes:
               help="Answer to an operator step: yes, no, or the text to enter")
 @click.option("--records", type=click.Path(path_type=Path, file_okay=False), metavar="DIR",
               help="Where the record goes (default: below the XDG state directory)")
-@click.option("--no-records", is_flag=True, help="Keep no record")
+@click.option("--no-records", is_flag=True, help="Keep no record, on the disk or in the store")
+@STORE_OPTION
 @click.option("--junit", type=_FILE, metavar="FILE", help="Write a JUnit report too")
 @click.option("--csv", type=_FILE, metavar="FILE", help="Write the values as CSV too")
 @click.option("--html", type=_FILE, metavar="FILE", help="Write an HTML report too")
@@ -67,8 +71,8 @@ class _Wishes:
 @click.pass_context
 def run(context: click.Context, plan: Path, said: Sequence[str], inputs: Path | None,
         dut: str | None, answers: Sequence[str], records: Path | None, no_records: bool,
-        junit: Path | None, csv: Path | None, html: Path | None, station: str | None,
-        operator: str | None) -> None:
+        store_url: str | None, junit: Path | None, csv: Path | None, html: Path | None,
+        station: str | None, operator: str | None) -> None:
     """Carry out a test plan with the handset at the port, and keep a record of the run.
 
     The plan is read and checked whole before anything is sent (`amt-station check` does only
@@ -78,10 +82,12 @@ def run(context: click.Context, plan: Path, said: Sequence[str], inputs: Path | 
     """
     if records is not None and no_records:
         raise UsageProblem("--records and --no-records contradict each other")
+    if store_url is not None and no_records:
+        raise UsageProblem("--store and --no-records contradict each other")
     settings: Settings = context.ensure_object(Settings)
     directory = None if no_records else records or places.records_directory()
     wishes = _Wishes(_pairs(said, "--set"), inputs, dut, _pairs(answers, "--answer"), directory,
-                     station, operator)
+                     "" if no_records else checked_url(store_url), station, operator)
     read = load_plan(plan, settings.chosen_channel)
     _check_wishes(read, settings, wishes)
     outputs = Outputs({"junit": junit, "csv": csv, "html": html})
@@ -138,12 +144,14 @@ def _run(settings: Settings, plan: Plan, wishes: _Wishes, outputs: Outputs) -> i
     values = _values(plan, wishes, terminal)
     dut = check_with_inputs(plan, values) or wishes.dut or ""
     files: list[RecordFile] = []
+    deliveries: list[Delivery] = []
 
     def keep(record: Record) -> Keeper:
         if wishes.records is None:
             return NoRecord()
         name = file_name(dut, record.head["began"], record.run)
         files.append(RecordFile(wishes.records, name, record.text()))
+        deliveries.append(Delivery(wishes.store, wishes.records))
         return files[0]
 
     view = _view(settings)
@@ -160,7 +168,23 @@ def _run(settings: Settings, plan: Plan, wishes: _Wishes, outputs: Outputs) -> i
         view.close()
         for file in files:
             file.close()
-    return _finish(settings, runner, document, files, outputs)
+    status = _finish(settings, runner, document, files, outputs)
+    _deliver(files, deliveries)
+    if runner.defect is not None:
+        raise runner.defect
+    return status
+
+
+def _deliver(files: Sequence[RecordFile], deliveries: Sequence[Delivery]) -> None:
+    """Whatever becomes of it, the verdict and the exit status stay."""
+    for file, delivery in zip(files, deliveries):
+        delivery.recorded(file.path)
+        try:
+            delivery.close()
+        except KeyboardInterrupt:
+            pass  # nobody has to wait for it
+        for line in delivery.lines():
+            console.talk(line)
 
 
 def _view(settings: Settings) -> Any:
@@ -190,6 +214,4 @@ def _finish(settings: Settings, runner: Runner, document: Mapping[str, Any],
         status = status or error.exit_status
     if runner.view_failure is not None and not isinstance(runner.view_failure, BrokenPipeError):
         console.complain(f"the view of the run failed: {runner.view_failure!r}")
-    if runner.defect is not None:
-        raise runner.defect
     return status

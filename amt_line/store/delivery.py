@@ -1,24 +1,254 @@
-"""Hands records on to the store in the background; nothing that goes wrong there ends a run."""
+"""Hands records on to the store in the background; nothing that goes wrong there ends a run.
+
+A record is on the disk before it is handed on, so whatever happens to this process or to the
+database, nothing is lost: when the database answers, the directory is compared with it, and what it
+has missed is delivered, in the order in which the runs began.
+"""
 
 from __future__ import annotations
 
+import logging
+import threading
+import time
+from dataclasses import dataclass
 from pathlib import Path
+from typing import TYPE_CHECKING
+
+from amt_line.run.clock import utc_now
+from amt_line.store.files import file_names, in_order
+from amt_line.store.gap import deliver, find_gap
+from amt_line.store.mark import Mark
+from amt_line.store.problems import BadRecord, StoreAway, StoreProblem
+from amt_line.store.url import shown_url
+
+if TYPE_CHECKING:
+    from amt_line.store.store import Store
+
+_LOG = logging.getLogger("amt_line")
+
+PATIENCE = 6.0
+_FIRST_PAUSE = 0.5
+_LONGEST_PAUSE = 15.0
+_NOTE_SECONDS = 60.0
+
+
+@dataclass(frozen=True)
+class DeliveryState:
+    """How the delivery stands. ``since`` and ``because`` are empty while the database answers."""
+
+    behind: int
+    since: str = ""
+    because: str = ""
+
+    def __str__(self) -> str:
+        if not self.behind and not self.because:
+            return "ok"
+        records = "1 record" if self.behind == 1 else f"{self.behind} records"
+        since = f", since {self.since}" if self.since else ""
+        because = f", because {self.because}" if self.because else ""
+        return f"behind: {records}{since}{because}"
 
 
 class Delivery:
-    """To come: so far nothing is handed on."""
+    """The way of a directory's records into one database, on a thread of its own."""
 
-    def __init__(self, url: str, directory: Path) -> None:
+    def __init__(self, url: str, directory: Path, pauses: tuple[float, float] = (
+            _FIRST_PAUSE, _LONGEST_PAUSE)) -> None:
+        """``url`` is one of ``checked_url``. ``pauses`` are the first and the longest one
+        between two tries, in seconds. Files that lie in the directory now may be waiting."""
         self.url = url
         self.directory = directory
+        self._pauses = pauses
+        self._mark = Mark(url, directory)
+        self._changed = threading.Condition()
+        self._waiting: dict[str, None] = {}
+        self._missed = max(0, _number_of_files(directory) - self._mark.read())
+        self._bad: dict[str, str] = {}
+        self._because = self._since = ""
+        self._failures = 0
+        self._closing = self._last_try = self._given_up = self._prepared = False
+        self._suspect: set[str] = set()
+        self._next_note = 0.0
+        self._store: Store | None = None
+        self._compared = False
+        self._thread = threading.Thread(target=self._serve, name="delivery", daemon=True)
+        self._thread.start()
 
     def recorded(self, path: Path) -> None:
-        """A record is on the disk, whole."""
+        """A record stands in the directory, whole. Returns at once."""
+        with self._changed:
+            self._waiting[path.name] = None
+            self._changed.notify_all()
 
     @property
-    def state(self) -> str:
-        """``ok``, or how many records are still to be delivered, since when, and why."""
-        return "ok"
+    def state(self) -> DeliveryState:
+        """How it stands, for the views."""
+        with self._changed:
+            missed = 0 if self._compared else self._missed
+            return DeliveryState(missed + len(self._waiting), self._since, self._because)
 
-    def close(self, patience: float = 5.0) -> None:
-        """End the thread; what is still to be delivered is waited for that long."""
+    @property
+    def bad_files(self) -> dict[str, str]:
+        """Files in the directory that are no records, and why."""
+        with self._changed:
+            return dict(self._bad)
+
+    def close(self, patience: float = PATIENCE) -> None:
+        """Deliver what is left as far as the database answers, for so many seconds at most.
+
+        What then is left is delivered by whoever opens the directory next.
+        """
+        with self._changed:
+            self._closing = True
+            self._changed.notify_all()
+            # Importing the database library is no matter of the database.
+            self._changed.wait_for(lambda: self._prepared)
+        self._thread.join(patience)
+        with self._changed:
+            self._given_up = True
+            if self._waiting and not self._because:
+                self._because = "the time for it was over"
+
+    def lines(self) -> list[str]:
+        """What the person is to be told at the end; nothing when all is well."""
+        said = []
+        state, bad = self.state, self.bad_files
+        if state.behind:
+            records = "1 record is" if state.behind == 1 else f"{state.behind} records are"
+            said.append(f"store: {records} still to be delivered to {shown_url(self.url)}: "
+                        f"{state.because}; the next run does it, or `amt-station store sync`")
+        if bad:
+            name, reason = next(iter(bad.items()))
+            more = f", and {len(bad) - 1} more" if len(bad) > 1 else ""
+            said.append(f"store: skipped {self.directory / name}: {reason}{more}")
+        return said
+
+    def _serve(self) -> None:
+        try:
+            self._prepare()
+            while self._wait_for_work():
+                self._try()
+            self._leave()
+        except Exception:  # pylint: disable=broad-except
+            _LOG.exception("the delivery of records to the store failed")
+            with self._changed:
+                self._because = self._because or "of a defect of the station itself"
+        finally:
+            with self._changed:
+                self._prepared = True
+                self._changed.notify_all()
+
+    def _prepare(self) -> None:
+        try:
+            import amt_line.store.store  # noqa: F401  pylint: disable=unused-import
+        finally:
+            with self._changed:
+                self._prepared = True
+                self._changed.notify_all()
+
+    def _wait_for_work(self) -> bool:
+        """Wait until there is something to try; False when the thread is to end."""
+        with self._changed:
+            if self._failures:
+                pause = min(self._pauses[0] * 2 ** min(self._failures - 1, 30), self._pauses[1])
+                self._changed.wait_for(lambda: self._closing, pause)
+            else:
+                self._changed.wait_for(
+                    lambda: self._waiting or not self._compared or self._closing)
+            if self._given_up or self._last_try:
+                return False
+            self._last_try = self._closing
+            return bool(self._waiting) or not self._compared
+
+    def _try(self) -> None:
+        try:
+            if self._store is None:
+                from amt_line.store.store import Store
+
+                self._store = Store.open(self.url)
+            if not self._compared:
+                self._compare(self._store)
+            self._deliver_waiting(self._store)
+        except StoreProblem as problem:
+            self._fail(problem)
+            return
+        with self._changed:
+            self._failures = 0
+            self._because = self._since = ""
+            # What came meanwhile is delivered, too, by a thread that is to end.
+            self._last_try = self._last_try and not self._waiting
+        self._note()
+
+    def _compare(self, store: Store) -> None:
+        gap = find_gap(store, self.directory)
+        with self._changed:
+            names = {*gap.names, *self._waiting}.difference(self._bad)
+            self._waiting = dict.fromkeys(in_order(self.directory, names))
+            self._missed, self._compared = 0, True
+
+    def _deliver_waiting(self, store: Store) -> None:
+        while True:
+            with self._changed:
+                name = next(iter(self._waiting), None)
+                if name is None or self._given_up:
+                    return
+            begin = time.monotonic()
+            self._deliver(store, name)
+            with self._changed:
+                del self._waiting[name]
+                self._because = self._since = ""
+                if self._waiting:
+                    # However much there is to be made up for, the runs have the processor first.
+                    self._changed.wait_for(lambda: self._closing, time.monotonic() - begin)
+
+    def _deliver(self, store: Store, name: str) -> None:
+        """Deliver a file, or find that it is no record."""
+        try:
+            deliver(store, self.directory, name)
+        except BadRecord as error:
+            self._skip(name, str(error))
+        except StoreAway:
+            raise
+        except StoreProblem as problem:
+            # It may be the record and it may be the database, which is opened anew to find out.
+            if name not in self._suspect:
+                self._suspect.add(name)
+                raise
+            self._skip(name, str(problem))
+
+    def _skip(self, name: str, reason: str) -> None:
+        _LOG.warning("%s: not delivered to the store: %s", self.directory / name, reason)
+        with self._changed:
+            self._bad[name] = reason
+
+    def _fail(self, problem: StoreProblem) -> None:
+        """The database is away, or of no use: it is tried again later, from the beginning."""
+        _LOG.warning("the store: %s", problem)
+        if self._store is not None:
+            self._store.close()
+            self._store = None
+        with self._changed:
+            self._failures += 1
+            self._compared = False
+            self._since = self._since or utc_now()
+            self._because = str(problem)
+
+    def _note(self) -> None:
+        """Remember how many files the database has; now and then, as it means listing them."""
+        now = time.monotonic()
+        with self._changed:
+            if self._waiting or (now < self._next_note and not self._closing):
+                return
+        self._next_note = now + _NOTE_SECONDS
+        self._mark.write(_number_of_files(self.directory))
+
+    def _leave(self) -> None:
+        if self._store is not None:
+            self._store.close()
+
+
+def _number_of_files(directory: Path) -> int:
+    try:
+        return len(file_names(directory))
+    except OSError:
+        return 0

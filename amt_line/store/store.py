@@ -4,7 +4,7 @@ from __future__ import annotations
 
 import hashlib
 import json
-from typing import Any, Iterable, Iterator, Mapping
+from typing import Any, Iterable, Iterator, Mapping, NamedTuple, TypeVar
 
 from sqlalchemy import delete, func, insert, select, update
 from sqlalchemy.engine import Connection, Engine
@@ -22,6 +22,15 @@ from amt_line.store.tables import RECORDS, RUNS, STEP_VALUES, STEPS
 from amt_line.store.url import checked_url, shown_url
 
 _BATCH = 500
+_Item = TypeVar("_Item")
+
+
+class Stored(NamedTuple):
+    """What the database says of a record: its SHA-256, how far it has got, whence it came."""
+
+    sha256: str
+    state: str
+    origin: str
 
 
 class Store:
@@ -75,9 +84,14 @@ class Store:
             with writing(self._engine) as connection:
                 return _put(connection, rows, record)
         except IntegrityError:
-            # Somebody else has put the same run meanwhile.
-            with told(self._engine), writing(self._engine) as connection:
+            pass
+        # Somebody else has put the same run meanwhile.
+        try:
+            with writing(self._engine) as connection:
                 return _put(connection, rows, record)
+        except IntegrityError as error:
+            raise StoreProblem(f"{self.url}: run {rows.run['run']} is not taken: "
+                               f"{type(error.orig).__name__}") from error
 
     def put_new(self, texts: Iterable[str]) -> int:
         """Put many records quickly, of runs that are not there yet; how many they were."""
@@ -109,6 +123,26 @@ class Store:
             total = connection.execute(queries.count(search)).scalar_one()
             rows = connection.execute(queries.page(search)).all()
         return Found([RunRow._make(row) for row in rows], int(total))
+
+    def files_of(self, origin: str, names: Iterable[str]) -> dict[str, Stored]:
+        """What is stored of a directory's files: of all from ``origin``, and of these names
+        wherever they came from."""
+        columns = (RECORDS.c.file, RECORDS.c.sha256, RUNS.c.state, RECORDS.c.origin)
+        query = select(*columns).join_from(RUNS, RECORDS)
+        with reading(self._engine) as connection:
+            found = {row[0]: Stored._make(row[1:]) for row in
+                     connection.execute(query.where(RECORDS.c.origin == origin))}
+            for part in _batches((name for name in names if name not in found), _BATCH):
+                found.update((row[0], Stored._make(row[1:])) for row in
+                             connection.execute(query.where(RECORDS.c.file.in_(part))).all())
+        return found
+
+    def stored(self, run: str) -> Stored | None:
+        """What is stored of a run."""
+        query = select(RECORDS.c.sha256, RUNS.c.state, RECORDS.c.origin).join_from(RUNS, RECORDS)
+        with reading(self._engine) as connection:
+            row = connection.execute(query.where(RUNS.c.run == run)).one_or_none()
+        return None if row is None else Stored._make(row)
 
     def words(self) -> dict[str, list[str]]:
         """The plans, stations and slots that there are, for a choice."""
@@ -160,6 +194,7 @@ def _put(connection: Connection, rows: Rows, record: Row) -> bool:
     else:
         number, state, sha256, steps = there
         if sha256 == record["sha256"] or state != "running":
+            _adopt(connection, number, sha256, record)
             return False
         if rows.run["state"] == "running" and len(rows.steps) <= steps:
             return False
@@ -168,6 +203,14 @@ def _put(connection: Connection, rows: Rows, record: Row) -> bool:
         connection.execute(update(RUNS).where(RUNS.c.id == number), rows.run)
     _put_parts(connection, [(number, rows, record)])
     return True
+
+
+def _adopt(connection: Connection, number: int, sha256: str, record: Row) -> None:
+    """A record that came without a file gets the name of its file."""
+    if record["file"] and sha256 == record["sha256"]:
+        connection.execute(
+            update(RECORDS).where(RECORDS.c.run_id == number, RECORDS.c.file == ""),
+            {"file": record["file"], "origin": record["origin"]})
 
 
 def _put_batch(connection: Connection, batch: list[tuple[Rows, Row]]) -> None:
@@ -189,8 +232,8 @@ def _put_parts(connection: Connection, runs: list[tuple[int, Rows, Row]]) -> Non
             connection.execute(insert(table), parts)
 
 
-def _batches(items: Iterable[tuple[Rows, Row]], size: int) -> Iterator[list[tuple[Rows, Row]]]:
-    batch = []
+def _batches(items: Iterable[_Item], size: int) -> Iterator[list[_Item]]:
+    batch: list[_Item] = []
     for item in items:
         batch.append(item)
         if len(batch) == size:
