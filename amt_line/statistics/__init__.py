@@ -1,0 +1,1 @@
+"""Statistics of a line: definitions and figures. Pure: rows in, figures out."""
