@@ -80,9 +80,12 @@ def _begin_sqlite(connection: Connection) -> None:
 
 
 @contextmanager
-def reading(engine: Engine) -> Iterator[Connection]:
-    """A transaction that only reads."""
+def reading(engine: Engine, of_one_moment: bool = False) -> Iterator[Connection]:
+    """A transaction that only reads, each time what is there, or all as at its begin."""
     with told(engine), engine.connect() as connection:
+        if of_one_moment and engine.dialect.name == "postgresql":
+            # A transaction of SQLite is so by itself.
+            connection = connection.execution_options(isolation_level="REPEATABLE READ")
         yield connection
 
 

@@ -4,7 +4,7 @@ from __future__ import annotations
 
 import hashlib
 import json
-from typing import Any, Iterable, Iterator, Mapping, NamedTuple, TypeVar
+from typing import Any, ContextManager, Iterable, Iterator, Mapping, NamedTuple, TypeVar
 
 from sqlalchemy import delete, func, insert, select, update
 from sqlalchemy.engine import Connection, Engine
@@ -69,6 +69,10 @@ class Store:
 
     def __exit__(self, *_error: object) -> None:
         self.close()
+
+    def looking(self) -> ContextManager[Connection]:
+        """A transaction of one's own that only reads; all that it reads is of one moment."""
+        return reading(self._engine, of_one_moment=True)
 
     def put(self, document: Document, origin: str = "", file: str = "") -> bool:
         """Put a record; False when it is there already, or one that has got further is."""
