@@ -42,6 +42,13 @@ def _ready(fd: int, event: int, timeout: float) -> bool:
     return bool(poll.poll(min(math.ceil(max(0.0, timeout) * 1000), _LONGEST_POLL)))
 
 
+def _hung_up(fd: int) -> bool:
+    """Whether the other end is gone, without reading what it has left."""
+    poll = select.poll()
+    poll.register(fd, 0)
+    return bool(poll.poll(0))
+
+
 def _write_all(fd: int, data: bytes, timeout: float, name: str) -> None:
     """Write with a deadline, whether the descriptor blocks or not."""
     end = time.monotonic() + timeout
@@ -101,6 +108,10 @@ class FdPort:
             _write_all(self._fd, data, timeout, self.name)
         except OSError as error:
             raise NoPort(f"{self.name} went away: {error.strerror}") from error
+
+    def is_gone(self) -> bool:
+        """Whether the other end has hung up."""
+        return self._fd < 0 or _hung_up(self._fd)
 
     def close(self) -> None:
         """As in ``Port``."""
@@ -171,6 +182,10 @@ class SerialPort:
             raise _not_taken(f"port {self.name}", timeout) from error
         except (OSError, serial.SerialException) as error:
             raise NoPort(f"port {self.name} went away: {_reason(error)}") from error
+
+    def is_gone(self) -> bool:
+        """Whether the other end has hung up; False for a port that cannot tell."""
+        return self._fd is not None and _hung_up(self._fd)
 
     def close(self) -> None:
         """As in ``Port``."""

@@ -69,6 +69,7 @@ class Step:
     retry_delay: float = 0.0
     force: bool = False
     reconnect: float | None = None
+    needs: tuple[str, ...] = ()
 
     @property
     def place(self) -> str:

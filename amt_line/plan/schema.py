@@ -23,7 +23,7 @@ KIND_KEYS: dict[str, tuple[str, ...]] = {
     "command": ("with", "force"), "request": ("atoms", "force"), "at": ("expect",),
     "ask": ("expect", "picture"), "enter": (), "wait": ()}
 _ANSWERED = ("limits", "save", "timeout", "retry", "reconnect")
-COMMON_KEYS = ("name", "stop", "when")
+COMMON_KEYS = ("name", "stop", "when", "needs")
 OTHER_KEYS: dict[str, tuple[str, ...]] = {
     "command": _ANSWERED, "request": _ANSWERED, "at": _ANSWERED,
     "ask": ("timeout", "retry", "reconnect"),
@@ -95,7 +95,10 @@ def _step() -> Schema:
                   "properties": {"times": {"type": "integer", "minimum": 0, "maximum": 1000},
                                  "delay": {"type": "number", "minimum": 0, "maximum": 86400}}},
         "force": {"type": "boolean"},
-        "reconnect": _SECONDS}
+        "reconnect": _SECONDS,
+        "needs": {"type": "array", "minItems": 1, "maxItems": 50, "uniqueItems": True,
+                  "items": {**_TEXT, "maxLength": 200},
+                  "description": "a list of names, each once"}}
     chosen = [{"if": {"properties": {"command": {"const": name}}, "required": ["command"]},
                "then": {"$ref": f"#/definitions/command {name}"}}
               for name in handset.command_names()]

@@ -47,7 +47,8 @@ def _read(table: Mapping[str, Any], section: Section, number: int, channel: Chan
         timeout=table.get("timeout"), stop=table.get("stop", False),
         when=When(table["when"]) if "when" in table else None,
         retries=int(retry.get("times", 0)), retry_delay=float(retry.get("delay", 0.0)),
-        force=table.get("force", False), reconnect=table.get("reconnect"))
+        force=table.get("force", False), reconnect=table.get("reconnect"),
+        needs=tuple(table.get("needs", ())))
 
 
 def _short(kind: Kind, subject: Any) -> str:
@@ -90,6 +91,9 @@ def _step_problems(step: Step, table: Mapping[str, Any]) -> _Problems:
 def _form_problems(step: Step, table: Mapping[str, Any]) -> _Problems:
     if not step.name.isprintable():
         yield "name", f"{shown(step.name)} holds a character that cannot be shown"
+    for name in step.needs:
+        if not name.isprintable():
+            yield "needs", f"{shown(name)} holds a character that cannot be shown"
     if isinstance(table.get("save"), str) and step.kind is not Kind.ENTER:
         yield "save", "needs a table: { VALUE = \"variable\" }"
     if isinstance(table.get("retry", {}).get("times"), float):

@@ -3,7 +3,8 @@
 from __future__ import annotations
 
 import time
-from typing import Callable
+from contextlib import contextmanager
+from typing import Callable, Iterator
 
 from amt_line.run.port import StoppablePort
 from amt_line.run.stop import Stop
@@ -34,6 +35,25 @@ class Connection:
         self._link: Link | None = None
         self._transcripts: list[Transcript] = []
         self._why = "the port was never open"
+        self._may_go = 0
+
+    def is_pulled(self) -> bool:
+        """Whether the handset went away while nobody wanted it to."""
+        return self._port is not None and not self._may_go and self._port.is_gone()
+
+    @property
+    def is_open(self) -> bool:
+        """Whether the port is open."""
+        return self._port is not None
+
+    @contextmanager
+    def allowed_to_go(self) -> Iterator[None]:
+        """Within the block the port may go away and come back."""
+        self._may_go += 1
+        try:
+            yield
+        finally:
+            self._may_go -= 1
 
     def open(self) -> None:
         """Open the port and find the link's place.
@@ -88,7 +108,10 @@ class Connection:
 
         One that stays is opened again all the same, unless it ``must_go``.
         """
-        end = time.monotonic() + seconds
+        with self.allowed_to_go():
+            self._reconnect(time.monotonic() + seconds, seconds, must_go)
+
+    def _reconnect(self, end: float, seconds: float, must_go: bool) -> None:
         gone = self._wait_until_gone(end if must_go
                                      else min(end, time.monotonic() + min(_STAYS, seconds / 2)))
         if must_go and not gone:

@@ -31,6 +31,11 @@ class StoppablePort:
         self._stop.check()
         self._port.write(data, timeout)
 
+    def is_gone(self) -> bool:
+        """Whether the other end has hung up; False where a port cannot tell."""
+        look = getattr(self._port, "is_gone", None)
+        return look is not None and bool(look())
+
     def close(self) -> None:
         """As in ``Port``."""
         self._port.close()

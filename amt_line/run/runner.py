@@ -11,7 +11,7 @@ import logging
 import time
 import traceback
 from dataclasses import dataclass, field
-from typing import Any, Callable, Iterable, Mapping
+from typing import Any, Callable, Iterable, Mapping, Sequence
 
 from amt_line.plan.model import Plan, Section, Step
 from amt_line.plan.references import Scalar
@@ -23,10 +23,11 @@ from amt_line.run.exchanges import exchange_document, late_remarks
 from amt_line.run.operator import Nobody, Operator
 from amt_line.run.record import Document, Record, Where
 from amt_line.run.record_file import Keeper, NoRecord, RecordLost
+from amt_line.run.shared import Shared
 from amt_line.run.step_run import REPLUG_SECONDS, StepRun
-from amt_line.run.stop import Abort, Aborted, Ended, Stop
+from amt_line.run.stop import PULLED, Abort, Aborted, Ended, Stop
 from amt_line.run.tally import EXIT_FAIL, RunVerdict, Tally, Verdict
-from amt_station.errors import Held, Refused, StationError
+from amt_station.errors import Held, NoPort, Refused, StationError
 from amt_station.replug import UNPLUG_NOW
 
 _LOG = logging.getLogger("amt_line")
@@ -44,6 +45,11 @@ class Setting:
     keep: Callable[[Record], Keeper] = lambda record: NoRecord()
     # Of a whole line, whose listeners then hear the run instead of those above.
     stream: Stream | None = None
+    shared: Shared = field(default_factory=Shared)
+    # Requests to end all runs of a line; the list may grow.
+    ends: Sequence[Abort] = ()
+    # Whether a handset that goes away unasked was pulled out, which ends the run.
+    pulled_is_aborted: bool = False
 
 
 class Runner:
@@ -57,7 +63,7 @@ class Runner:
         self.record_problem: RecordLost | None = None
         self.defect: Exception | None = None
         self._setting = setting
-        self._stop = Stop(plan.deadline)
+        self._stop = Stop(plan.deadline, setting.ends, self._watch)
         self._tally = Tally()
         whole = Stream(setting.listeners) if setting.stream is None else setting.stream
         self._stream = whole.part(run=self.record.run, slot=setting.where.slot)
@@ -71,6 +77,16 @@ class Runner:
     def abort(self, how: Abort) -> None:
         """End the run: the step at hand first, at the second call the always steps too."""
         self._stop.request(how)
+
+    @property
+    def is_aborted(self) -> bool:
+        """Whether somebody has ended the run."""
+        return self._stop.requested is not None
+
+    @property
+    def slot(self) -> str:
+        """The slot of the line; empty without one."""
+        return self._setting.where.slot
 
     @property
     def view_failure(self) -> Exception | None:
@@ -140,6 +156,9 @@ class Runner:
         except Ended as error:
             self._block(Verdict.ERROR, 5, str(error), "")
         except StationError as error:
+            if isinstance(error, NoPort):
+                self.note_lost_port()
+                self._note_abort()
             refused = error.exit_status == EXIT_FAIL
             self._block(Verdict.FAIL if refused else Verdict.ERROR, error.exit_status, str(error),
                         getattr(error, "advice", ""))
@@ -168,6 +187,15 @@ class Runner:
         self.defect = self.defect or error
         _LOG.error("a defect of the station: %s", "".join(traceback.format_exception(error)))
 
+    def _watch(self) -> Abort | None:
+        pulled = self._setting.pulled_is_aborted and self._connection.is_pulled()
+        return PULLED if pulled else None
+
+    def note_lost_port(self) -> None:
+        """The port has gone away, and nobody had asked for it."""
+        if self._setting.pulled_is_aborted and self._stop.requested is None:
+            self._stop.request(PULLED)
+
     def exchanges(self) -> list[Document]:
         """What went over the port since the last call, for the record."""
         return [exchange_document(transcript)
@@ -193,7 +221,7 @@ class Runner:
         if step.section is Section.ALWAYS:
             self._stop.hurry()
         work = StepRun(step, number, self._setting.operator, self._connection, self._stop,
-                       self._stream, self)
+                       self._stream, self, self._setting.shared)
         why_not = self._why_not(step)
         if why_not:
             document = work.skipped(why_not)

@@ -3,6 +3,7 @@
 from __future__ import annotations
 
 import time
+from contextlib import ExitStack
 from typing import Any, Mapping, Protocol
 
 from amt_line.plan.filled import Filled, Unfit, filled
@@ -14,6 +15,7 @@ from amt_line.run.connection import Connection
 from amt_line.run.events import Stream
 from amt_line.run.exchanges import late_remarks
 from amt_line.run.operator import Answer, Operator, Question
+from amt_line.run.shared import Shared
 from amt_line.run.stop import Aborted, Ended, Stop
 from amt_line.run.tally import EXIT_FAIL, EXIT_OWN_ERROR, EXIT_PASS, Verdict
 from amt_line.run.work import Outcome, StationTrouble, Tools, attempt
@@ -24,6 +26,8 @@ Document = dict[str, Any]
 EXIT_NO_ANSWER = 5
 # How long somebody has to unplug the cable and plug it in again.
 REPLUG_SECONDS = 60.0
+# Shorter waits for what is shared are not worth a word in the record.
+_WORTH_TELLING = 0.1
 
 
 class Owner(Protocol):
@@ -32,15 +36,22 @@ class Owner(Protocol):
     def note_defect(self, error: Exception) -> None:
         """An exception that nobody thought of."""
 
+    def note_lost_port(self) -> None:
+        """The port has gone away, and nobody had asked for it."""
+
     def exchanges(self) -> list[Document]:
         """What went over the port since the last call."""
+
+    @property
+    def slot(self) -> str:
+        """The slot of the line; empty without one."""
 
 
 class StepRun:
     """Carries one step out. ``saved`` and ``obstacle`` hold afterwards."""
 
     def __init__(self, step: Step, number: int, operator: Operator, connection: Connection,
-                 stop: Stop, stream: Stream, owner: Owner) -> None:
+                 stop: Stop, stream: Stream, owner: Owner, shared: Shared) -> None:
         self.saved: dict[str, Scalar] = {}
         self.obstacle = ""
         self._step = step
@@ -49,6 +60,7 @@ class StepRun:
         self._stop = stop
         self._stream = stream
         self._owner = owner
+        self._shared = shared
         self._start = time.monotonic()
         self._document: Document = {
             "number": number, "section": step.section.value, "name": step.name,
@@ -68,6 +80,30 @@ class StepRun:
         """Carry the step out, as often as it may be tried."""
         self._tell("step-began", name=self._step.name, kind=self._step.kind.value,
                    section=self._step.section.value)
+        with ExitStack() as stack:
+            if self._step.reconnect is not None:
+                stack.enter_context(self._connection.allowed_to_go())
+            if self._take_shared(stack):
+                self._attempts(variables)
+        self._document["seconds"] = round(time.monotonic() - self._start, 6)
+        return self._document
+
+    def _take_shared(self, stack: ExitStack) -> bool:
+        """Hold what the step needs until the stack is left; the time of the step begins then."""
+        try:
+            waited = stack.enter_context(self._shared.taken(
+                self._step.needs, self._owner.slot, self._stop.check,
+                lambda text: self._tell("notice", text=text)))
+        except Ended as error:
+            self._end_by(error)
+            return False
+        if waited >= _WORTH_TELLING:
+            self._document["remarks"].append(
+                f"waited {waited:.1f} s for {', '.join(self._step.needs)}")
+        self._start = time.monotonic()
+        return True
+
+    def _attempts(self, variables: Mapping[str, Scalar]) -> None:
         for number in range(1, self._step.retries + 2):
             if number > 1 and not self._again(number):
                 break
@@ -76,8 +112,6 @@ class StepRun:
             self._keep_exchanges(number)
             if self._document["verdict"] == Verdict.PASS.value or self.obstacle:
                 break
-        self._document["seconds"] = round(time.monotonic() - self._start, 6)
-        return self._document
 
     def _tell(self, event: str, **values: Any) -> None:
         self._stream.send(event, number=self._document["number"], **values)
@@ -104,18 +138,19 @@ class StepRun:
             self._take(outcome)
             if self._step.reconnect is not None:
                 self._connection.reconnect(self._step.reconnect)
-        except Aborted as error:
-            self._set(Verdict.ERROR, str(error), self._stop_status())
-            self.obstacle = str(error)
         except Ended as error:
-            self._set(Verdict.ERROR, str(error), EXIT_NO_ANSWER)
-            self.obstacle = str(error)
+            self._end_by(error)
         except StationError as error:
             self._refused_or_lost(error)
         except Exception as error:  # pylint: disable=broad-except
             self._owner.note_defect(error)
             self._set(Verdict.ERROR, f"the station's own error: {error!r}", EXIT_OWN_ERROR)
             self.obstacle = str(self._document["reason"])
+
+    def _end_by(self, error: Ended) -> None:
+        status = self._stop_status() if isinstance(error, Aborted) else EXIT_NO_ANSWER
+        self._set(Verdict.ERROR, str(error), status)
+        self.obstacle = str(error)
 
     def _stop_status(self) -> int:
         how = self._stop.requested
@@ -177,6 +212,8 @@ class StepRun:
     def _mend(self, error: StationError) -> None:
         """Leave the handset usable for what follows, or say why it is not."""
         if isinstance(error, NoPort):
+            if self._step.reconnect is None and self._connection.is_open:
+                self._owner.note_lost_port()
             self._connection.lose(str(error))
             if self._step.reconnect is None:
                 raise error

@@ -4,10 +4,13 @@ from __future__ import annotations
 
 import time
 from dataclasses import dataclass
+from typing import Callable, Sequence
 
 SLICE = 0.05
 # What the always steps are given when a run was ended, or its time was over.
 LAST_SECONDS = 5.0
+# How often somebody looks whether the handset is still there.
+_WATCH_SECONDS = 0.25
 
 
 @dataclass(frozen=True)
@@ -20,6 +23,8 @@ class Abort:
 
 INTERRUPTED = Abort("interrupted", 130)
 TERMINATED = Abort("terminated", 143)
+STOPPED = Abort("stopped by the operator", 130)
+PULLED = Abort("the handset was pulled out", 3)
 
 
 class Ended(Exception):
@@ -41,21 +46,33 @@ class Stop:
     a lock: a handler may interrupt any line of this.
     """
 
-    def __init__(self, deadline: float | None = None) -> None:
-        """``deadline`` in seconds from now, for the whole run."""
-        self._requests: list[Abort] = []
+    def __init__(self, deadline: float | None = None, of_all: Sequence[Abort] = (),
+                 watch: Callable[[], Abort | None] = lambda: None) -> None:
+        """``deadline`` in seconds from now, for the whole run.
+
+        ``of_all`` may grow: requests to all runs of a line. ``watch`` looks now and then for a
+        reason to end the run.
+        """
+        self._own: list[Abort] = []
+        self._of_all = of_all
+        self._watch = watch
+        self._next_look = 0.0
         self._accepted = 0
         self._what = f"the run's deadline of {deadline:g} s is reached" if deadline else ""
         self._end = time.monotonic() + deadline if deadline else None
 
     def request(self, how: Abort) -> None:
         """End the run."""
-        self._requests.append(how)
+        self._own.append(how)
+
+    @property
+    def _requests(self) -> list[Abort]:
+        return [*self._own, *self._of_all]
 
     @property
     def requested(self) -> Abort | None:
         """The first request."""
-        return self._requests[0] if self._requests else None
+        return next(iter(self._requests), None)
 
     @property
     def at_once(self) -> bool:
@@ -79,10 +96,22 @@ class Stop:
 
     def check(self) -> None:
         """Raise ``Ended`` when the step cannot go on."""
-        if len(self._requests) > self._accepted:
-            raise Aborted(self._requests[-1].reason)
+        requests = self._requests
+        if not requests:
+            requests = self._look()
+        if len(requests) > self._accepted:
+            raise Aborted(requests[-1].reason)
         if self._end is not None and time.monotonic() >= self._end:
             raise TimeOver(self._what)
+
+    def _look(self) -> list[Abort]:
+        now = time.monotonic()
+        if now >= self._next_look:
+            self._next_look = now + _WATCH_SECONDS
+            how = self._watch()
+            if how is not None:
+                self.request(how)
+        return self._requests
 
     def sleep(self, seconds: float) -> None:
         """Wait, unless the run ends."""
