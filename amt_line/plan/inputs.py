@@ -17,7 +17,7 @@ from amt_station.text import printable
 FORMATS = ("text", "int", "imei", "mac")
 LONGEST = 4096
 _INT = re.compile(r"[+-]?[0-9]{1,18}")
-_LONGEST_FILE = 64 * 1024 * 1024
+LARGEST_FILE = 64 * 1024 * 1024
 
 
 @dataclass(frozen=True)
@@ -60,8 +60,8 @@ class Input:
 def row_of(path: Path, dut: str) -> dict[str, str]:
     """The row of an input file for one handset; empty cells are left out."""
     try:
-        if path.stat().st_size > _LONGEST_FILE:
-            raise UsageProblem(f"{path}: larger than {_LONGEST_FILE} bytes")
+        if path.stat().st_size > LARGEST_FILE:
+            raise UsageProblem(f"{path}: larger than {LARGEST_FILE} bytes")
         with path.open(encoding="utf-8-sig", newline="") as file:
             return _find(csv.DictReader(file, strict=True), path, dut)
     except OSError as error:
