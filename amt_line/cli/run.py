@@ -115,8 +115,19 @@ def _check_wishes(plan: Plan, settings: Settings, wishes: _Wishes) -> None:
                            f"--{settings.line} contradicts it")
     if wishes.inputs is not None and wishes.dut is None:
         raise UsageProblem("--inputs needs --dut, which names the row")
+    _check_answers(plan, wishes.answers)
+
+
+def answers_of(plan: Plan, texts: Sequence[str]) -> dict[str, str]:
+    """The answers of ``--answer STEP=ANSWER``; ``UsageProblem`` for one that answers nothing."""
+    answers = _pairs(texts, "--answer")
+    _check_answers(plan, answers)
+    return answers
+
+
+def _check_answers(plan: Plan, answers: Mapping[str, str]) -> None:
     asked = {step.name: step for step in plan.every_step if step.kind in (Kind.ASK, Kind.ENTER)}
-    for name, answer in wishes.answers.items():
+    for name, answer in answers.items():
         step = asked.get(name)
         if step is None:
             raise UsageProblem(f"--answer: the plan has no operator step {printable(name)!r}")

@@ -3,7 +3,7 @@
 from __future__ import annotations
 
 import threading
-from concurrent.futures import ThreadPoolExecutor
+from concurrent.futures import ThreadPoolExecutor, wait
 from contextlib import ExitStack, contextmanager
 from typing import Any, Iterator, Mapping
 
@@ -48,8 +48,13 @@ def _bring_up(handset: Handset) -> None:
 
 def _each(handsets: Mapping[str, Handset], do: Any) -> None:
     """Do something with all, beside each other; the first error once all are done."""
-    with ThreadPoolExecutor(_AT_ONCE) as pool:
+    pool = ThreadPoolExecutor(_AT_ONCE)
+    try:
         done = [pool.submit(do, handset) for handset in handsets.values()]
+        wait(done)
+    finally:
+        # Ended early: those that have not begun need not.
+        pool.shutdown(cancel_futures=True)
     for future in done:
         future.result()
 

@@ -15,12 +15,10 @@ from rich.table import Table
 from rich.text import Text
 
 from amt_line.view.banner import banner
+from amt_line.view.styles import STYLES
 from amt_line.view.words import closing, step_remark, step_time
 from amt_station.text import printable
 
-_STYLES = {"pass": "bold green", "fail": "bold red", "error": "bold yellow", "skipped": "dim",
-           "running": "bold cyan", "PASS": "bold white on green", "FAIL": "bold white on red",
-           "ERROR": "bold black on yellow", "ABORTED": "bold white on magenta"}
 _FRAMES_A_SECOND = 8
 # Lines of the terminal that are not rows of the table.
 _AROUND = 7
@@ -106,8 +104,8 @@ class TerminalView:
         if event != "step-ended":
             seconds = f"{time.monotonic() - row['since']:.0f} s"
             again = f"attempt {row['attempt']}" if "attempt" in row else ""
-            return [number, name, Text("...", _STYLES["running"]), Text(seconds), Text(again)]
-        return [number, name, Text(row["verdict"], _STYLES[row["verdict"]]),
+            return [number, name, Text("...", STYLES["running"]), Text(seconds), Text(again)]
+        return [number, name, Text(row["verdict"], STYLES[row["verdict"]]),
                 Text(step_time(row)), Text(step_remark(row))]
 
     def _verdict(self, event: Mapping[str, Any]) -> RenderableType:
@@ -115,5 +113,5 @@ class TerminalView:
         block = "#" if self._console.options.ascii_only else "█"
         letters = banner(word, block, wide=width > 14 * len(word) + 6)
         block_text = Text("\n".join(letters), no_wrap=True)
-        panel = Panel(Align.center(block_text), style=_STYLES[word], padding=(1, 2))
+        panel = Panel(Align.center(block_text), style=STYLES[word], padding=(1, 2))
         return Group(panel, *(Text(line, "bold") for line in closing(event)))

@@ -41,3 +41,10 @@ def closing(event: Mapping[str, Any]) -> list[str]:
     if event["advice"]:
         lines.append(f"what to do: {printable(event['advice'])}")
     return lines
+
+
+def counts_text(counts: Mapping[str, int]) -> str:
+    """How many runs came to what, and how many of all have passed."""
+    total = sum(counts.values())
+    share = f", {100 * counts['PASS'] / total:.0f} % passed" if total else ""
+    return f"{total} runs: " + ", ".join(f"{counts[word]} {word}" for word in counts) + share
