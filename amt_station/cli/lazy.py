@@ -32,6 +32,7 @@ COMMANDS: Mapping[str, Place] = {
     "run": Place("amt_line.cli.run:run", "Carry out a test plan and keep a record"),
     "schema": Place("amt_line.cli.schema:schema", "Print the schema of plans or records"),
     "send": Place("amt_station.cli.send:send", "Send any request and show its answer"),
+    "serve": Place("amt_line.cli.serve:serve", "Serve runs and statistics as web pages"),
     "show": Place("amt_line.cli.show:show", "Print the record of a run"),
     "store": Place("amt_line.cli.store:store", "Deliver records to the database, compare both"),
     "wait": Place("amt_station.cli.ports:wait", "Wait for a port to appear"),

@@ -37,9 +37,9 @@ class Page:
         """
         self._socket = bound(address)
         self.port: int = self._socket.getsockname()[1]
-        self.url = f"http://{address.url_host}:{self.port}/"
-        # Where a browser that has no token yet gets one.
-        self.entrance = f"{self.url}?token={access}" if access else self.url
+        # For the person at the terminal: it lets a browser in.
+        self.url = f"http://{address.url_host}:{self.port}/" + (
+            f"?token={access}" if access else "")
         self._loop = asyncio.new_event_loop()
         self._changes = Changes(Board(), self._loop)
         self._records = Records(store) if store is not None else None
