@@ -7,15 +7,18 @@ import sys
 from contextlib import ExitStack, contextmanager
 from dataclasses import dataclass
 from pathlib import Path
-from typing import Any, Callable, Iterator, Mapping, Protocol, TextIO
+from typing import TYPE_CHECKING, Any, Callable, Iterator, Mapping, Protocol, TextIO
 
-from amt_line.cli.page import OpenPage, open_page
+from amt_line.cli.page import open_page
 from amt_line.run.desk import Desk
 from amt_line.run.events import Stream
 from amt_line.view.event_file import EventFile
 from amt_line.view.line_lines import LineLines
 from amt_station.cli import console
 from amt_station.errors import UsageProblem
+
+if TYPE_CHECKING:
+    from amt_line.view.web import Page
 
 STANDARD_OUTPUT = "-"
 
@@ -86,7 +89,7 @@ class Views:
             yield
         self._main = None
 
-    def _listen(self, view: "View | OpenPage", stack: ExitStack) -> None:
+    def _listen(self, view: View | Page, stack: ExitStack) -> None:
         self._stream.listen(view)
         stack.callback(view.close)
         stack.callback(self._stream.leave, view)
