@@ -46,7 +46,8 @@ def system(name: str, preset: str, workers: int, patience: Mapping[str, str],
 # In the order in which they begin, and in which their builds are made: what needs no build first,
 # then what needs a short one.
 SUITES = (
-    Suite("station", "", ("tests/station", "tests/line", "tests/scripts", "-n", str(2 * CORES))),
+    Suite("station", "", ("tests/station", "tests/line", "tests/scripts", "-n", str(2 * CORES),
+                          "--dist", "loadgroup")),
     system("system", "release", SYSTEM_WORKERS, PATIENCE),
     system("system-asan", "asan", SANITIZED_WORKERS, SANITIZED_PATIENCE, is_beside=True),
     system("system-tsan", "tsan", SANITIZED_WORKERS, SANITIZED_PATIENCE, is_beside=True),

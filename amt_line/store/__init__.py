@@ -10,15 +10,14 @@ from typing import TYPE_CHECKING, Any
 
 from amt_line.store.delivery import Delivery
 from amt_line.store.problems import BadRecord, StoreAway, StoreProblem
-from amt_line.store.search import Filter, Found, RunRow, Search, StepRow, ValueRow
+from amt_line.store.search import Found, RunRow, Search
 from amt_line.store.url import checked_url, default_store_url, shown_url
 
 if TYPE_CHECKING:
     from amt_line.store.store import Store
 
-__all__ = ["BadRecord", "Delivery", "Filter", "Found", "RunRow", "Search", "StepRow", "Store",
-           "StoreAway", "StoreProblem", "ValueRow", "checked_url", "default_store_url",
-           "shown_url"]
+__all__ = ["BadRecord", "Delivery", "Found", "RunRow", "Search", "Store", "StoreAway",
+           "StoreProblem", "checked_url", "default_store_url", "shown_url"]
 
 
 def __getattr__(name: str) -> Any:

@@ -7,16 +7,14 @@ from typing import Any
 
 from sqlalchemy import func, or_, select
 
-from amt_line.store.search import SORTS, UNFINISHED, Filter, RunRow, Search, StepRow, ValueRow
-from amt_line.store.tables import RUNS, STEP_VALUES, STEPS
+from amt_line.store.search import SORTS, UNFINISHED, RunRow, Search
+from amt_line.store.tables import RUNS
 from amt_station.errors import UsageProblem
 
 _LARGEST_PAGE = 10_000
 _IN_TEXT = ("dut", "plan", "station", "slot", "operator", "reason", "first_failed_step", "run")
 
 _RUN_COLUMNS = [RUNS.c[name] for name in RunRow._fields]
-_STEP_COLUMNS = [STEPS.c[name] for name in StepRow._fields]
-_VALUE_COLUMNS = [STEP_VALUES.c[name] for name in ValueRow._fields]
 
 
 def utc_text(moment: datetime) -> str:
@@ -38,35 +36,6 @@ def page(search: Search) -> Any:
         raise UsageProblem(f"page {search.page} of {search.size} runs cannot be shown")
     return (select(*_RUN_COLUMNS).where(*_searched(search)).order_by(*_order(search.sort))
             .limit(search.size).offset((search.page - 1) * search.size))
-
-
-def chosen_runs(wanted: Filter) -> Any:
-    """The runs of a filter, the oldest first."""
-    return (select(*_RUN_COLUMNS).where(*_chosen(wanted))
-            .order_by(RUNS.c.began, RUNS.c.id))
-
-
-def chosen_steps(wanted: Filter) -> Any:
-    """The steps of the runs of a filter."""
-    return (_of_runs(select(*_STEP_COLUMNS), STEPS, wanted)
-            .order_by(STEPS.c.run_id, STEPS.c.number))
-
-
-def chosen_values(wanted: Filter) -> Any:
-    """The values of the runs of a filter."""
-    return (_of_runs(select(*_VALUE_COLUMNS), STEP_VALUES, wanted)
-            .order_by(STEP_VALUES.c.run_id, STEP_VALUES.c.step, STEP_VALUES.c.position))
-
-
-def _of_runs(query: Any, table: Any, wanted: Filter) -> Any:
-    chosen = _chosen(wanted)
-    return query.join_from(RUNS, table).where(*chosen) if chosen else query
-
-
-def _chosen(wanted: Filter) -> list[Any]:
-    exact = [RUNS.c[name] == text for name in ("plan", "plan_version", "station", "slot", "dut")
-             if (text := getattr(wanted, name))]
-    return exact + _verdict(wanted.verdict) + _between(wanted.since, wanted.until)
 
 
 def _searched(search: Search) -> list[Any]:

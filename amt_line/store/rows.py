@@ -111,14 +111,13 @@ def _measured(value: Any) -> tuple[float | None, str | None]:
 def _clean(text: Any) -> str:
     if not isinstance(text, str):
         raise TypeError("a text is something else")
+    if text.isprintable() and text.isascii():
+        return text
     return _UNSTORABLE.sub(lambda match: f"\\u{ord(match.group()):04x}", text)
 
 
 def _text(record: Mapping[str, Any], name: str) -> str:
-    text = record[name]
-    if not isinstance(text, str):
-        raise TypeError(f"{name} is no text")
-    return _clean(text)
+    return _clean(record[name])
 
 
 def _formed(record: Mapping[str, Any], name: str, form: re.Pattern[str]) -> str:

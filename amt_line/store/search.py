@@ -37,54 +37,6 @@ class RunRow(NamedTuple):
     first_failed_step: str
 
 
-class StepRow(NamedTuple):
-    """A step of a run."""
-
-    run_id: int
-    number: int
-    section: str
-    name: str
-    kind: str
-    verdict: str
-    attempts: int
-    began: str
-    seconds: float
-    reason: str
-
-
-class ValueRow(NamedTuple):
-    """A value of a step: ``number`` or, where it is none, ``text``; limits where it has them."""
-
-    run_id: int
-    step: int
-    position: int
-    step_name: str
-    name: str
-    number: float | None
-    text: str | None
-    unit: str
-    min: float | None
-    max: float | None
-    marginal_min: float | None
-    marginal_max: float | None
-    verdict: str
-    marginal: bool
-
-
-@dataclass(frozen=True)
-class Filter:
-    """Which runs are meant: empty fields choose nothing. ``since`` <= began < ``until``."""
-
-    plan: str = ""
-    plan_version: str = ""
-    station: str = ""
-    slot: str = ""
-    dut: str = ""
-    verdict: str = ""
-    since: datetime | None = None
-    until: datetime | None = None
-
-
 @dataclass(frozen=True)
 class Search:
     """A page of runs. ``text`` and ``dut`` are found anywhere, whatever the case of letters;

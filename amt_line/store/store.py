@@ -4,7 +4,7 @@ from __future__ import annotations
 
 import hashlib
 import json
-from typing import Any, ContextManager, Iterable, Iterator, Mapping, NamedTuple, TypeVar
+from typing import ContextManager, Iterable, Iterator, Mapping, NamedTuple, TypeVar
 
 from sqlalchemy import delete, func, insert, select, update
 from sqlalchemy.engine import Connection, Engine
@@ -14,10 +14,11 @@ from amt_line.run.clock import utc_now
 from amt_line.run.record import Document, document_text
 from amt_line.store import queries
 from amt_line.store.engine import make_engine, reading, told, writing
+from amt_line.store.fast import insert_many
 from amt_line.store.migrate import bring_up_to_date, check_version
 from amt_line.store.problems import BadRecord, StoreProblem
 from amt_line.store.rows import Row, Rows, rows_of
-from amt_line.store.search import Filter, Found, RunRow, Search, StepRow, ValueRow
+from amt_line.store.search import Found, RunRow, Search
 from amt_line.store.tables import RECORDS, RUNS, STEP_VALUES, STEPS
 from amt_line.store.url import checked_url, shown_url
 
@@ -156,24 +157,6 @@ class Store:
                                .scalars())
                     for name, column in columns.items()}
 
-    def runs_for_statistics(self, wanted: Filter = Filter()) -> Iterator[RunRow]:
-        """The runs in the order of their begin."""
-        return map(RunRow._make, self._stream(queries.chosen_runs(wanted)))
-
-    def steps_for_statistics(self, wanted: Filter = Filter()) -> Iterator[StepRow]:
-        """The steps of these runs, run by run in the order in which they were put."""
-        return map(StepRow._make, self._stream(queries.chosen_steps(wanted)))
-
-    def values_for_statistics(self, wanted: Filter = Filter()) -> Iterator[ValueRow]:
-        """The values of these runs, run by run in the order in which they were put."""
-        return map(ValueRow._make, self._stream(queries.chosen_values(wanted)))
-
-    def _stream(self, query: Any) -> Iterator[Any]:
-        with reading(self._engine) as connection:
-            result = connection.execution_options(stream_results=True).execute(query)
-            for part in result.partitions(10_000):
-                yield from part
-
 
 def _taken_apart(text: str, origin: str, file: str) -> tuple[Rows, Row]:
     try:
@@ -218,7 +201,7 @@ def _adopt(connection: Connection, number: int, sha256: str, record: Row) -> Non
 
 
 def _put_batch(connection: Connection, batch: list[tuple[Rows, Row]]) -> None:
-    connection.execute(insert(RUNS), [rows.run for rows, _ in batch])
+    insert_many(connection, RUNS, [rows.run for rows, _ in batch])
     runs = [rows.run["run"] for rows, _ in batch]
     numbers: Mapping[str, int] = dict(connection.execute(
         select(RUNS.c.run, RUNS.c.id).where(RUNS.c.run.in_(runs))).all())
@@ -232,8 +215,7 @@ def _put_parts(connection: Connection, runs: list[tuple[int, Rows, Row]]) -> Non
                      for step in rows.steps]),
             (STEP_VALUES, [{"run_id": number, **value} for number, rows, _ in runs
                            for value in rows.values])):
-        if parts:
-            connection.execute(insert(table), parts)
+        insert_many(connection, table, parts)
 
 
 def _batches(items: Iterable[_Item], size: int) -> Iterator[list[_Item]]:

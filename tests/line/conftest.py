@@ -14,6 +14,7 @@ from hypothesis import HealthCheck, configuration, settings
 
 sys.path.append(str(Path(__file__).resolve().parents[1] / "station"))
 
+from postgresql import Cluster  # noqa: E402
 from station_peer import ROOT, Peer, Run, station_command, station_environment  # noqa: E402
 
 from amt_station.wire.decoder import BareDecoder, EnvelopeDecoder  # noqa: E402
@@ -65,3 +66,21 @@ def run_station(tmp_path: Path) -> Run:
                               cwd=ROOT, capture_output=True, text=True, timeout=300, check=False,
                               stdin=subprocess.DEVNULL)
     return run
+
+
+@pytest.fixture(scope="session")
+def postgresql() -> Iterator[Cluster]:
+    """A PostgreSQL server. Tests that use it belong to one group, so that one serves them all."""
+    cluster = Cluster()
+    yield cluster
+    cluster.close()
+
+
+@pytest.fixture(params=["sqlite", pytest.param(
+    "postgresql", marks=pytest.mark.xdist_group("postgresql"))])
+def store_url(request: pytest.FixtureRequest, tmp_path: Path) -> str:
+    """The URL of an empty database, of either kind."""
+    if request.param == "sqlite":
+        return f"sqlite:///{tmp_path}/line.sqlite"
+    cluster: Cluster = request.getfixturevalue("postgresql")
+    return cluster.new_database()
