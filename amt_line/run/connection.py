@@ -88,7 +88,7 @@ class Connection:
 
     def connected(self) -> bool:
         """Whether the handset answers."""
-        if self._link is None:
+        if self._link is None or (self._port is not None and self._port.is_gone()):
             return False
         try:
             if not self._link.in_step:
