@@ -8,6 +8,7 @@ connection, has nothing waiting for it anywhere, misses nothing and sees nothing
 from __future__ import annotations
 
 import asyncio
+import re
 import secrets
 from collections import deque
 from typing import Any, Mapping
@@ -82,7 +83,7 @@ class Changes:
     def seen(self, event_id: str) -> int | None:
         """The version that an id stands for; None when it is of another life of this server."""
         epoch, _, number = event_id.partition(".")
-        if epoch != self.epoch or not number.isdecimal() or len(number) > 15:
+        if epoch != self.epoch or not re.fullmatch("[0-9]{1,15}", number):
             return None
         return min(int(number), self.version)
 
