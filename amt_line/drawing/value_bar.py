@@ -4,6 +4,12 @@ from __future__ import annotations
 
 from dataclasses import dataclass
 from typing import Any, Mapping
+from xml.etree.ElementTree import Element, SubElement, tostring
+
+from markupsafe import Markup
+
+from amt_line.drawing.svg import INK, coordinate
+from amt_station.text import printable
 
 _LEFT, _RIGHT = 20.0, 80.0
 
@@ -48,3 +54,25 @@ def _scale(number: float, low: float | None, high: float | None) -> tuple[float,
     edge = float(low if low is not None else high or 0.0)
     width = max(abs(number - edge) * 1.25, abs(edge) * 0.25) or 1.0
     return (edge, width) if low is not None else (edge - width, width)
+
+
+def value_bar(value: Mapping[str, Any], label: str) -> Markup:
+    """A record's value as a mark on the bar of its limits; empty without limits of numbers.
+
+    ``label`` says the same in words.
+    """
+    bar = bar_for(value)
+    if bar is None:
+        return Markup()
+    root = Element("svg", {"viewBox": "0 0 100 12", "preserveAspectRatio": "none", "role": "img",
+                           "class": "value-bar", "aria-label": printable(label)})
+    for start, end, band, colour in ((0.0, 100.0, "outside", "#e6eaee"),
+                                     (bar.low, bar.high, "marginal", "#ffd58a"),
+                                     (bar.near_low, bar.near_high, "inside", "#9bd3a8")):
+        SubElement(root, "rect", {"x": coordinate(start), "y": "4", "height": "4",
+                                  "width": coordinate(end - start), "class": band,
+                                  "fill": colour})
+    verdict = "fail" if value.get("verdict") == "fail" else "pass"
+    SubElement(root, "rect", {"x": coordinate(bar.mark - 0.8), "y": "0", "width": "1.6",
+                              "height": "12", "class": f"mark {verdict}", "fill": INK})
+    return Markup(tostring(root, encoding="unicode"))

@@ -7,7 +7,7 @@ from typing import Any, Mapping, Sequence
 
 from jinja2 import Environment, PackageLoader, StrictUndefined
 
-from amt_line.drawing.value_bar import bar_for
+from amt_line.drawing.value_bar import value_bar
 from amt_line.report.records import (counts, duration, limits_text, number_text, value_text,
                                      verdict_word)
 from amt_station.text import printable
@@ -48,7 +48,7 @@ def _environment() -> Environment:
                               lstrip_blocks=True)
     environment.filters.update(safe_text=printable_lines, hex=spaced_hex, decoded=decoded_text,
                                duration=duration, number=number_text)
-    environment.globals.update(bar=bar_for, value_text=value_text, limits_text=limits_text,
+    environment.globals.update(bar=value_bar, value_text=value_text, limits_text=limits_text,
                                verdict=verdict_word, counts=counts)
     return environment
 

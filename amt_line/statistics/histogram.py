@@ -4,7 +4,7 @@ from __future__ import annotations
 
 from bisect import bisect_left, bisect_right
 from dataclasses import dataclass
-from math import cbrt, ceil, floor, log10
+from math import cbrt, ceil, floor, inf, log10, nextafter
 from typing import Sequence
 
 from amt_line.statistics.spread import Numbers
@@ -12,6 +12,8 @@ from amt_line.statistics.spread import Numbers
 _MOST_BINS = 40
 # Above this many different numbers, how far they lie apart at least says nothing.
 _MOST_DIFFERENT = 1000
+# So many steps of a converter are shown one by one.
+_EACH_ITS_BIN = 15
 _ROUND = (1.0, 2.0, 5.0, 10.0)
 
 
@@ -35,16 +37,18 @@ def round_up(width: float) -> float:
     return float(f"{step * power:.6g}")
 
 
-def histogram(numbers: Numbers) -> Histogram | None:
+def histogram(numbers: Numbers, low: float | None = None, high: float | None = None
+              ) -> Histogram | None:
     """The histogram of numbers; None without any.
 
     Numbers with a smallest difference (a converter's counts) lie in the middle of bins that hold
-    equally many of them. Numbers far away from nearly all others are only counted.
+    equally many of them. No bin holds numbers on both sides of a limit, ``low`` or ``high``.
+    Numbers far away from nearly all others are only counted.
     """
     if not numbers.count:
         return None
     first, last = _view(numbers)
-    edges = _edges(numbers, first, last)
+    edges = _edges(numbers, first, last, low, high)
     below = numbers.below(first)
     ends = [below, *(numbers.below(edge) for edge in edges[1:-1]), numbers.not_above(last)]
     return Histogram(tuple(edges), tuple(after - before for before, after in zip(ends, ends[1:])),
@@ -63,24 +67,38 @@ def _view(numbers: Numbers) -> tuple[float, float]:
             different[bisect_right(different, high + far) - 1])
 
 
-def _edges(numbers: Numbers, first: float, last: float) -> Sequence[float]:
+def _edges(numbers: Numbers, first: float, last: float, low: float | None, high: float | None
+           ) -> Sequence[float]:
     if first == last:
-        half = (round_up(abs(first) / 100) if first else 1.0) / 2
+        half = _half_of_one(first, low, high)
         return first - half, first + half
     shown = numbers.different[bisect_left(numbers.different, first):
                               bisect_right(numbers.different, last)]
     grain = _grain(shown)
     wanted = max(_wanted_width(numbers), (last - first) / _MOST_BINS)
-    if grain:
-        # Half a grain before the first number: no number lies on an edge.
-        width = grain * max(1.0, round_up(wanted / grain))
-        start = first - grain / 2
-        bins = int((last - start) / width) + 1
-    else:
-        width = round_up(wanted)
-        start = floor(first / width) * width
-        bins = max(1, ceil((last - start) / width))
-    return [start + width * index for index in range(bins + 1)]
+    if (last - first) <= grain * _EACH_ITS_BIN:
+        wanted = grain
+    # Numbers that are a limit keep it; with a grain, no number lies on an edge.
+    borders = [] if low is None else [low - grain / 2]
+    if high is not None:
+        borders.append(high + grain / 2 if grain else nextafter(high, inf))
+    width = grain * max(1.0, round_up(wanted / grain)) if grain else round_up(wanted)
+    inside = [border for border in borders if first < border < last]
+    anchor = inside[0] if inside else first - grain / 2 if grain else 0.0
+    before = ceil((anchor - first) / width - 1e-9)
+    bins = before + int((last - anchor) / width) + 1
+    edges = [anchor + width * (index - before) for index in range(bins + 1)]
+    for border in inside[1:]:
+        if all(abs(edge - border) > width * 1e-6 for edge in edges):
+            edges.append(border)
+    return sorted(edges)
+
+
+def _half_of_one(number: float, low: float | None, high: float | None) -> float:
+    """Half the width of the bin of a number that all are; narrow beside the limits."""
+    if low is not None and high is not None and high > low:
+        return (high - low) / (2 * _MOST_BINS)
+    return (round_up(abs(number) / 100) if number else 1.0) / 2
 
 
 def _wanted_width(numbers: Numbers) -> float:

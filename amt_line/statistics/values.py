@@ -80,7 +80,7 @@ def _figures(value: ValueName, limits: Limits, own: bool, counted: Sequence[Valu
             if isfinite(number):
                 together[number] = together.get(number, 0) + times
     numbers = Numbers(together)
-    spread, bins = numbers.spread(), histogram(numbers)
+    spread, bins = numbers.spread(), histogram(numbers, limits.low, limits.high)
     if spread is None or bins is None:
         return None
     return ValueFigures(value, limits, own, spread,
