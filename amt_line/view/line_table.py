@@ -106,11 +106,10 @@ class LineTable:
         table.add_column("slot", no_wrap=True)
         table.add_column("state", no_wrap=True)
         table.add_column("handset", overflow="ellipsis", no_wrap=True)
-        table.add_column("step", ratio=2, overflow="fold")
+        table.add_column("step", ratio=1, overflow="fold")
         table.add_column("", width=_BAR_WIDTH, no_wrap=True)
         table.add_column("time", justify="right", no_wrap=True, min_width=6)
         table.add_column("last verdict", no_wrap=True)
-        table.add_column("", ratio=2, overflow="fold")
         for slot in self._board.slots.values():
             table.add_row(*self._cells(slot, height))
         return table
@@ -121,7 +120,7 @@ class LineTable:
         return [Text(printable(slot["slot"]), "bold"), Text(state, STYLES.get(state, "")),
                 Text(printable(slot["dut"] or (last["dut"] if last else ""))),
                 Text(_doing(slot)), _bar(slot), Text(self._elapsed(slot)),
-                self._verdict(slot, height), Text(_why(last))]
+                self._verdict(slot, height)]
 
     def _elapsed(self, slot: Document) -> str:
         if slot["run"]:
@@ -148,6 +147,8 @@ def _doing(slot: Document) -> str:
         name = f" {step['name']}" if step else ""
         notice = f": {slot['notice']}" if slot["notice"] else ""
         return printable(f"{number} of {slot['steps']}{name}{notice}")
+    if slot["state"] in ("verdict", "ended") and (why := _why(slot["last"])):
+        return why
     return printable(slot["text"])
 
 

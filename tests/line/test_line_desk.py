@@ -222,5 +222,3 @@ def test_tab_goes_to_the_next_question_and_escapes_are_shown() -> None:
     assert desk.wait("2", no_end).text == "L2"
     typing.take("wrong\x15L1\n")
     assert desk.wait("1", no_end).text == "L1"
-
-
