@@ -25,7 +25,7 @@ from amt_station.text import printable
 _FRAMES_A_SECOND = 4
 # Lines that are no rows: the head of the table, its title and its end, the prompt below.
 _AROUND = 6
-_BAR_WIDTH = 14
+_BAR_WIDTH = 22
 _WIDE = 110
 
 Prompt = Callable[[], tuple[str, str, str]]
@@ -81,6 +81,9 @@ class LineTable:
         return self._whole(max(1, min(ROWS, room // slots - 1)))
 
     def _whole(self, height: int) -> RenderableType:
+        if self._console.width < _WIDE:
+            # The letters would take the room of the words.
+            height = 1
         with self._turn:
             table = self._table(height)
             counts = dict(self._board.counts)
@@ -106,8 +109,7 @@ class LineTable:
         table.add_column("slot", no_wrap=True)
         table.add_column("state", no_wrap=True)
         table.add_column("handset", overflow="ellipsis", no_wrap=True)
-        table.add_column("step", ratio=1, overflow="fold")
-        table.add_column("", width=_BAR_WIDTH, no_wrap=True)
+        table.add_column("step", ratio=1, overflow="fold", min_width=_BAR_WIDTH)
         table.add_column("time", justify="right", no_wrap=True, min_width=6)
         table.add_column("last verdict", no_wrap=True)
         for slot in self._board.slots.values():
@@ -119,7 +121,7 @@ class LineTable:
         state = slot["state"]
         return [Text(printable(slot["slot"]), "bold"), Text(state, STYLES.get(state, "")),
                 Text(printable(slot["dut"] or (last["dut"] if last else ""))),
-                Text(_doing(slot)), _bar(slot), Text(self._elapsed(slot)),
+                _with_bar(Text(_doing(slot)), slot), Text(self._elapsed(slot)),
                 self._verdict(slot, height)]
 
     def _elapsed(self, slot: Document) -> str:
@@ -152,9 +154,13 @@ def _doing(slot: Document) -> str:
     return printable(slot["text"])
 
 
-def _bar(slot: Document) -> RenderableType:
+def _with_bar(text: Text, slot: Document) -> RenderableType:
     if not slot["run"] or not slot["steps"]:
-        return Text("")
+        return text
+    return Group(text, _bar(slot))
+
+
+def _bar(slot: Document) -> ProgressBar:
     return ProgressBar(total=slot["steps"], completed=len(slot["ended_steps"]), width=_BAR_WIDTH)
 
 
