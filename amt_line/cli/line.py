@@ -11,7 +11,7 @@ from typing import Any, Mapping, Sequence
 import click
 
 from amt_line.cli import places
-from amt_line.cli.line_views import Views, Wanted
+from amt_line.cli.line_views import Views, Wanted, has_keyboard
 from amt_line.cli.run import answers_of
 from amt_line.cli.signals import ending_in_order
 from amt_line.cli.slots import SlotSpec, check_slots, said_slots, slots_of_file
@@ -128,7 +128,7 @@ def _simulated(settings: Settings, plan: Plan, count: int, wishes: Wishes,
 
     names = [SlotSpec(str(number), f"simulated:{number}") for number in range(1, count + 1)]
     # Before handsets come up for nothing.
-    _supplies(plan, names, wishes, Desk(), True)
+    _supplies(plan, names, wishes, Desk(), bool(wishes.http) or has_keyboard())
     console.talk(f"bringing up {count} simulated handsets ...")
     handsets = stack.enter_context(simulated_handsets(count, plan.channel))
     hand = None
