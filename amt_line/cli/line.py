@@ -181,6 +181,8 @@ def _finish(settings: Settings, status: int, board: Board, views: Views, records
     for problem in filter(None, (views.lost_events, *records.problems)):
         console.complain(problem)
         status = status or EXIT_DEFECT
+    for remark in records.remarks:
+        console.talk(remark)
     if stream.failure is not None and not isinstance(stream.failure, BrokenPipeError):
         console.complain(f"a view of the line failed: {stream.failure!r}")
     sys.stdout.flush()

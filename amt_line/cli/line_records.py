@@ -11,7 +11,7 @@ from typing import Iterator
 from amt_line.run.record import Record
 from amt_line.run.record_file import NoRecord, RecordFile, file_name
 from amt_line.run.slot import RecordKeeper
-from amt_line.store import Delivery, checked_url, default_store_url
+from amt_line.store import Delivery, checked_url
 from amt_station.errors import StationError, UsageProblem
 
 
@@ -40,12 +40,13 @@ class LineRecords:
     def __init__(self, directory: Path | None, store: str | None) -> None:
         """``UsageProblem`` when nothing can be written into the directory."""
         self.problems: list[str] = []
+        self.remarks: list[str] = []
         self.store_url: str | None = None
         self._directory = directory
         self._delivery: Delivery | None = None
         self._turn = threading.Lock()
         if directory is not None:
-            self.store_url = checked_url(store) if store else default_store_url()
+            self.store_url = checked_url(store)
             _check_writable(directory)
 
     @contextmanager
@@ -57,7 +58,11 @@ class LineRecords:
             yield
         finally:
             if self._delivery is not None:
-                self._delivery.close()
+                try:
+                    self._delivery.close()
+                except KeyboardInterrupt:
+                    pass  # nobody has to wait for it
+                self.remarks = self._delivery.lines()
 
     def state(self) -> str:
         """How far the store is."""

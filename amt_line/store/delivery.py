@@ -33,7 +33,7 @@ _NOTE_SECONDS = 60.0
 
 
 @dataclass(frozen=True)
-class DeliveryState:
+class Standing:
     """How the delivery stands. ``since`` and ``because`` are empty while the database answers."""
 
     behind: int
@@ -81,11 +81,16 @@ class Delivery:
             self._changed.notify_all()
 
     @property
-    def state(self) -> DeliveryState:
-        """How it stands, for the views."""
+    def state(self) -> str:
+        """``ok``, or ``behind`` with how many records, since when and why: for the views."""
+        return str(self.standing)
+
+    @property
+    def standing(self) -> Standing:
+        """How it stands."""
         with self._changed:
             missed = 0 if self._compared else self._missed
-            return DeliveryState(missed + len(self._waiting), self._since, self._because)
+            return Standing(missed + len(self._waiting), self._since, self._because)
 
     @property
     def bad_files(self) -> dict[str, str]:
@@ -112,11 +117,11 @@ class Delivery:
     def lines(self) -> list[str]:
         """What the person is to be told at the end; nothing when all is well."""
         said = []
-        state, bad = self.state, self.bad_files
-        if state.behind:
-            records = "1 record is" if state.behind == 1 else f"{state.behind} records are"
+        standing, bad = self.standing, self.bad_files
+        if standing.behind:
+            records = "1 record is" if standing.behind == 1 else f"{standing.behind} records are"
             said.append(f"store: {records} still to be delivered to {shown_url(self.url)}: "
-                        f"{state.because}; the next run does it, or `amt-station store sync`")
+                        f"{standing.because}; the next run does it, or `amt-station store sync`")
         if bad:
             name, reason = next(iter(bad.items()))
             more = f", and {len(bad) - 1} more" if len(bad) > 1 else ""
