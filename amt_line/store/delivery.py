@@ -166,6 +166,7 @@ class Delivery:
             return bool(self._waiting) or not self._compared
 
     def _try(self) -> None:
+        was_open = self._store is not None
         try:
             if self._store is None:
                 from amt_line.store.store import Store
@@ -176,6 +177,10 @@ class Delivery:
             self._deliver_waiting(self._store)
         except StoreProblem as problem:
             self._fail(problem)
+            if was_open:
+                # Perhaps only the connection was lost: the next try shows whether there is a
+                # database.
+                self._try()
             return
         with self._changed:
             self._failures = 0
@@ -228,7 +233,8 @@ class Delivery:
 
     def _fail(self, problem: StoreProblem) -> None:
         """The database is away, or of no use: it is tried again later, from the beginning."""
-        _LOG.warning("the store: %s", problem)
+        if str(problem) != self._because:
+            _LOG.warning("the store: %s", problem)
         if self._store is not None:
             self._store.close()
             self._store = None

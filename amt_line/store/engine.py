@@ -40,7 +40,7 @@ def _sqlite_engine(url: str, path: Any, create: bool) -> Engine:
         try:
             path.parent.mkdir(parents=True, exist_ok=True)
         except OSError as error:
-            raise StoreAway(f"{path}: {error.strerror}") from error
+            raise StoreAway(f"{error.filename or path}: {error.strerror}") from error
     elif not path.exists():
         raise StoreAway(f"{path}: no such database")
     engine = create_engine(url, future=True,
