@@ -62,7 +62,9 @@ class Delivery:
         self._mark = Mark(url, directory)
         self._changed = threading.Condition()
         self._waiting: dict[str, None] = {}
-        self._missed = max(0, _number_of_files(directory) - self._mark.read())
+        # What lies there already, until the database has said what it has of it.
+        self._found = set(_files_in(directory))
+        self._known = self._mark.read()
         self._bad: dict[str, str] = {}
         self._because = self._since = ""
         self._failures = 0
@@ -89,8 +91,9 @@ class Delivery:
     def standing(self) -> Standing:
         """How it stands."""
         with self._changed:
-            missed = 0 if self._compared else self._missed
-            return Standing(missed + len(self._waiting), self._since, self._because)
+            missed = max(0, len(self._found) - self._known)
+            new = len(self._waiting.keys() - self._found)
+            return Standing(missed + new, self._since, self._because)
 
     @property
     def bad_files(self) -> dict[str, str]:
@@ -112,7 +115,7 @@ class Delivery:
         with self._changed:
             self._given_up = True
             if self._waiting and not self._because:
-                self._because = "the time for it was over"
+                self._because = f"{shown_url(self.url)}: the time for it was over"
 
     def lines(self) -> list[str]:
         """What the person is to be told at the end; nothing when all is well."""
@@ -120,8 +123,8 @@ class Delivery:
         standing, bad = self.standing, self.bad_files
         if standing.behind:
             records = "1 record is" if standing.behind == 1 else f"{standing.behind} records are"
-            said.append(f"store: {records} still to be delivered to {shown_url(self.url)}: "
-                        f"{standing.because}; the next run does it, or `amt-station store sync`")
+            said.append(f"store: {records} still to be delivered: {standing.because}; "
+                        "the next run does it, or `amt-station store sync`")
         if bad:
             name, reason = next(iter(bad.items()))
             more = f", and {len(bad) - 1} more" if len(bad) > 1 else ""
@@ -194,7 +197,7 @@ class Delivery:
         with self._changed:
             names = {*gap.names, *self._waiting}.difference(self._bad)
             self._waiting = dict.fromkeys(in_order(self.directory, names))
-            self._missed, self._compared = 0, True
+            self._found, self._known, self._compared = set(), 0, True
 
     def _deliver_waiting(self, store: Store) -> None:
         while True:
@@ -251,15 +254,15 @@ class Delivery:
             if self._waiting or (now < self._next_note and not self._closing):
                 return
         self._next_note = now + _NOTE_SECONDS
-        self._mark.write(_number_of_files(self.directory))
+        self._mark.write(len(_files_in(self.directory)))
 
     def _leave(self) -> None:
         if self._store is not None:
             self._store.close()
 
 
-def _number_of_files(directory: Path) -> int:
+def _files_in(directory: Path) -> list[str]:
     try:
-        return len(file_names(directory))
+        return file_names(directory)
     except OSError:
-        return 0
+        return []

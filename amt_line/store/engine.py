@@ -3,10 +3,11 @@
 from __future__ import annotations
 
 from contextlib import contextmanager
+from pathlib import Path
 from typing import Any, Iterator
 
 from sqlalchemy import create_engine, event
-from sqlalchemy.engine import Connection, Engine
+from sqlalchemy.engine import URL, Connection, Engine
 from sqlalchemy.exc import (DatabaseError, DBAPIError, IntegrityError, InterfaceError,
                             InternalError, NoSuchModuleError, OperationalError, SQLAlchemyError)
 
@@ -30,12 +31,12 @@ def make_engine(url: str, create: bool) -> Engine:
                 connect_args={"connect_timeout": _CONNECT_SECONDS, "keepalives_idle": 10,
                               "keepalives_interval": 5, "keepalives_count": 3,
                               "application_name": "amt-station"})
-        return _sqlite_engine(url, path, create)
+        return _sqlite_engine(path, create)
     except (SQLAlchemyError, ImportError, ValueError) as error:
         raise StoreProblem(f"{shown_url(url)}: {_reason(error, url)}") from error
 
 
-def _sqlite_engine(url: str, path: Any, create: bool) -> Engine:
+def _sqlite_engine(path: Path, create: bool) -> Engine:
     if create:
         try:
             path.parent.mkdir(parents=True, exist_ok=True)
@@ -43,7 +44,7 @@ def _sqlite_engine(url: str, path: Any, create: bool) -> Engine:
             raise StoreAway(f"{error.filename or path}: {error.strerror}") from error
     elif not path.exists():
         raise StoreAway(f"{path}: no such database")
-    engine = create_engine(url, future=True,
+    engine = create_engine(URL.create("sqlite", database=str(path)), future=True,
                            connect_args={"timeout": _BUSY_SECONDS, "check_same_thread": False})
     event.listen(engine, "connect", _set_up_sqlite)
     event.listen(engine, "begin", _begin_sqlite)
@@ -123,4 +124,4 @@ def _reason(error: Exception, url: str) -> str:
         return "the driver psycopg2 is missing (Debian: python3-psycopg2)"
     cause = error.orig if isinstance(error, DBAPIError) and error.orig else error
     lines = [line.strip() for line in str(cause).splitlines() if line.strip()]
-    return without_secrets("; ".join(lines[:2]) or type(cause).__name__, url)
+    return without_secrets(lines[0] if lines else type(cause).__name__, url)

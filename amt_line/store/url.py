@@ -5,7 +5,7 @@ from __future__ import annotations
 import os
 import re
 from pathlib import Path
-from urllib.parse import quote, unquote
+from urllib.parse import unquote
 
 from amt_station.errors import UsageProblem
 from amt_station.state import state_directory
@@ -27,8 +27,8 @@ def default_store_url() -> str:
 
 
 def sqlite_url(path: Path) -> str:
-    """The URL of a SQLite file."""
-    return f"{_SQLITE}{quote(str(path))}"
+    """The URL of a SQLite file, whose path stands in it as it is."""
+    return f"{_SQLITE}{path}"
 
 
 def checked_url(said: str | None) -> str:
@@ -36,11 +36,13 @@ def checked_url(said: str | None) -> str:
 
     Raises ``UsageProblem`` for what is no database of a store.
     """
-    url = said or os.environ.get(VARIABLE) or default_store_url()
+    url = said or os.environ.get(VARIABLE)
+    if not url:
+        return default_store_url()
     where = "--store" if said else VARIABLE
     if url.startswith(_SQLITE):
-        path = unquote(url.removeprefix(_SQLITE))
-        if path.split("?")[0] in ("", ":memory:") or "?" in path or "\0" in path:
+        path = url.removeprefix(_SQLITE)
+        if path in ("", ":memory:") or "?" in path or "\0" in path:
             raise UsageProblem(f"{where}: {shown_url(url)!r}: a file is needed, {_SQLITE}FILE")
         return sqlite_url(Path(os.path.abspath(os.path.expanduser(path))))
     match = _POSTGRESQL.match(url)
@@ -52,7 +54,7 @@ def checked_url(said: str | None) -> str:
 
 def sqlite_path(url: str) -> Path | None:
     """The file of a SQLite database; None for others."""
-    return Path(unquote(url.removeprefix(_SQLITE))) if url.startswith(_SQLITE) else None
+    return Path(url.removeprefix(_SQLITE)) if url.startswith(_SQLITE) else None
 
 
 def shown_url(url: str) -> str:

@@ -77,6 +77,10 @@ class Cluster:
 
     def new_database(self) -> str:
         """The URL of an empty database."""
+        assert self._server is not None
+        if self._server.poll() is not None:
+            # A test that failed has left it like this.
+            self.start()
         self._databases += 1
         name = f"line{self._databases}"
         connection = self.connect("postgres")

@@ -10,12 +10,12 @@ from pathlib import Path
 
 from store_bench import record, step, until
 
-from amt_line.run.record import document_text
+from amt_line.run.record import Document, document_text
 from amt_line.run.record_file import RecordFile, file_name
 from amt_line.store import Delivery
 
-RUNNING = {"state": "running", "verdict": None, "exit_status": None, "ended": None,
-           "seconds": None, "steps": []}
+RUNNING: Document = {"state": "running", "verdict": None, "exit_status": None, "ended": None,
+                     "seconds": None, "steps": []}
 
 
 def main(url: str, directory: str, name: str, count: str) -> None:

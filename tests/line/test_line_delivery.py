@@ -7,20 +7,17 @@ import random
 import shutil
 import signal
 import sqlite3
-import subprocess
-import sys
 from pathlib import Path
 from typing import Any, Iterator
 
 import pytest
 from store_bench import keep, record, runs_of, step, unfinished, until
-from station_peer import ROOT, station_environment
+from store_process import station
 
 from amt_line.store import Delivery, Search, Store
 from amt_line.store.gap import compare, find_gap, synchronise
 
 FAST = (0.01, 0.05)
-HERE = Path(__file__).parent
 
 
 @pytest.fixture(autouse=True)
@@ -160,8 +157,8 @@ def test_what_is_missing_is_counted_over_several_starts(folder: Path, tmp_path: 
         delivery.close(300)
         records = "1 record is" if number == 1 else f"{number} records are"
         assert delivery.lines() == [
-            f"store: {records} still to be delivered to {url}: {place}: File exists; the next run "
-            "does it, or `amt-station store sync`"]
+            f"store: {records} still to be delivered: {place}: File exists; the next run does it, "
+            "or `amt-station store sync`"]
     place.unlink()
     (tmp_path / "elsewhere").rename(place)
     last = Delivery(url, folder)
@@ -213,15 +210,6 @@ def test_the_directory_vanishes(folder: Path, url: str) -> None:
     delivery.recorded(path)
     delivery.close(300)
     assert delivery.lines() == [] and delivered(url) == []
-
-
-def station(url: str, folder: Path, name: str, count: int) -> "subprocess.Popen[str]":
-    """A station that only records, as a process."""
-    return subprocess.Popen(
-        [sys.executable, str(HERE / "store_station.py"), url, str(folder), name, str(count)],
-        env=station_environment(PYTHONPATH=f"{ROOT}:{HERE}",
-                                XDG_STATE_HOME=os.environ["XDG_STATE_HOME"]),
-        stdin=subprocess.DEVNULL, stdout=subprocess.PIPE, text=True)
 
 
 @pytest.fixture(params=range(3))
