@@ -2,10 +2,11 @@
 
 from __future__ import annotations
 
+import random
 import threading
 from concurrent.futures import ThreadPoolExecutor, wait
 from contextlib import ExitStack, contextmanager
-from typing import Any, Iterator, Mapping
+from typing import Any, Collection, Iterator, Mapping
 
 from amt_line.cli.slots import SlotSpec
 from amt_simulator import Handset, HandsetError
@@ -16,6 +17,10 @@ MOST_HANDSETS = 64
 _AT_ONCE = 8
 # How long a cable is out when a simulated operator changes the handset.
 _AWAY_SECONDS = 1.0
+# What the battery's driver reads in a handset, and in one of which it would be told.
+_BATTERY = "/handset/devices/battery-adc"
+_USUAL_ADC, _SPREAD_ADC, _WEAK_ADC = 3700, 60, 3100
+_WEAK_SHARE = 0.1
 
 
 class SimulationProblem(StationError):
@@ -26,14 +31,19 @@ class SimulationProblem(StationError):
 
 
 @contextmanager
-def simulated_handsets(count: int, channel: Channel) -> Iterator[dict[str, Handset]]:
-    """Handsets by the names of their slots, brought up beside each other; gone afterwards."""
+def simulated_handsets(count: int, channel: Channel, weak: Collection[str] = ()
+                       ) -> Iterator[dict[str, Handset]]:
+    """Handsets by the names of their slots, brought up beside each other; gone afterwards.
+
+    Those of the ``weak`` slots have a weak battery.
+    """
     path = "pc" if channel is Channel.PC else "packet"
     handsets: dict[str, Handset] = {}
     with ExitStack() as stack:
         try:
             for number in range(1, count + 1):
-                handsets[str(number)] = Handset(path, ports=True)
+                files = {_BATTERY: str(_WEAK_ADC)} if str(number) in weak else {}
+                handsets[str(number)] = Handset(path, ports=True, files=files)
             stack.callback(_each, handsets, Handset.down)
             _each(handsets, _bring_up)
         except HandsetError as error:
@@ -68,7 +78,8 @@ def slots_of(handsets: Mapping[str, Handset], channel: Channel) -> list[SlotSpec
 class Hand:
     """Changes simulated handsets as an operator does: a while after the verdict the cable goes.
 
-    A listener to the events of the line.
+    What is plugged in then has another battery, a weak one now and then. A listener to the events
+    of the line.
     """
 
     def __init__(self, handsets: Mapping[str, Handset], seconds: float) -> None:
@@ -91,6 +102,7 @@ class Hand:
             if not self._stop.wait(self._seconds):
                 handset.usb.unplug()
                 self._stop.wait(_AWAY_SECONDS)
+                handset.place(_BATTERY, str(_some_battery()))
                 handset.usb.plug()
         except HandsetError:
             pass  # it is being taken down, or has powered itself off
@@ -100,3 +112,9 @@ class Hand:
         self._stop.set()
         for thread in list(self._threads):
             thread.join()
+
+
+def _some_battery() -> int:
+    if random.random() < _WEAK_SHARE:
+        return _WEAK_ADC
+    return round(random.gauss(_USUAL_ADC, _SPREAD_ADC))

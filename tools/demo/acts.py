@@ -1,15 +1,19 @@
 """Run the acts: `./dev demo`."""
 
 import argparse
+import tempfile
 import time
+from pathlib import Path
 
 from amt_simulator import Handset
 from amt_simulator.errors import HandsetError
 from amt_simulator.waiting import wait_until
+from amt_station.errors import StationError
 from amt_station.link import Link
 from amt_station.requests.model import Channel
 from amt_station.wire.packet import Packet
 from tools.build import build
+from tools.demo import line
 from tools.demo.stage import Stage
 from tools.project import PROJECT
 
@@ -141,7 +145,9 @@ def main() -> int:
     try:
         for act in (serve_pc, serve_app, insert_cable):
             act(stage)
-    except (HandsetError, TimeoutError) as error:
+        with tempfile.TemporaryDirectory(prefix="demo-line-") as folder:
+            line.play(stage, Path(folder))
+    except (HandsetError, StationError, TimeoutError) as error:
         stage.check("the handset", str(error), False)
     print(f"\n{time.monotonic() - started:.0f} seconds", end="")
     return stage.verdict()
