@@ -13,6 +13,7 @@ from amt_station.link import Link
 from amt_station.requests.model import Channel
 from amt_station.requests.operations import Value, operation_packet
 from amt_station.requests.table import find_operation
+from tools import soak_line
 from tools.build import build
 
 # How much more than at first the daemon may hold, however long it has worked.
@@ -236,7 +237,11 @@ def soak_all(seconds: float, build: str = "release") -> dict[str, Result]:
 
 def main() -> int:
     """Put both paths under load and give the verdict."""
-    parser = argparse.ArgumentParser(prog="./dev soak", description=__doc__)
+    if sys.argv[1:2] == ["line"]:
+        return soak_line.main()
+    parser = argparse.ArgumentParser(
+        prog="./dev soak", description=__doc__,
+        epilog="./dev soak line [RUNS] watches the station instead: runs on a line of eight slots")
     parser.add_argument("minutes", nargs="?", type=float, default=10.0)
     seconds = parser.parse_args().minutes * 60
     if not 0 < seconds < float("inf"):
