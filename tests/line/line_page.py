@@ -16,7 +16,7 @@ from amt_line.view.web.server import Page
 
 PLAN = {"title": "End of line", "version": "7", "path": "end.toml", "sha256": "0" * 64, "steps": 4}
 STEPS = ("battery ADC", "version", "screen", "label")
-PATIENCE = 60.0
+PATIENCE = 120.0
 
 
 def until(condition: Callable[[], Any], what: str) -> Any:
@@ -39,9 +39,12 @@ class ToldLine:
         self.stream.listen(self.page)
         self.stopped: list[str] = []
         self._runs = 0
+        self._asked: list[Asked] = []
 
     def close(self) -> None:
-        """End the page."""
+        """End the page, and whatever still waits for an answer."""
+        for asked in self._asked:
+            asked.give_up()
         self.page.close()
 
     # what happens on the line
@@ -87,10 +90,12 @@ class ToldLine:
                          port=f"/dev/tty{name}")
 
     def ask(self, name: str, text: str, kind: str = "yes-no", run: str = "",
-            picture: Path | None = None, fits: Callable[[str], object] | None = None) -> "Asked":
+            picture: Path | None = None, fits: Callable[[str], object] | None = None) -> Asked:
         """A question is asked, and waits for its answer in a thread."""
-        return Asked(self, OpenQuestion(new_id(), name, run, kind, "question", text, picture),
-                     fits or fits_kind(kind))
+        asked = Asked(self, OpenQuestion(new_id(), name, run, kind, "question", text, picture),
+                      fits or fits_kind(kind))
+        self._asked.append(asked)
+        return asked
 
 
 class Asked:
@@ -106,7 +111,7 @@ class Asked:
         line.stream.send("question", slot=question.slot, run=question.run, id=question.id,
                          kind=question.kind, name=question.name, text=question.text,
                          picture=question.picture.name if question.picture else "")
-        self._thread = threading.Thread(target=self._wait)
+        self._thread = threading.Thread(target=self._wait, daemon=True)
         self._thread.start()
 
     def _wait(self) -> None:

@@ -176,13 +176,15 @@ EVENT = st.one_of(
 def event_of(slot: str, kind: str, word: str) -> dict[str, Any]:
     """An event as a line sends it."""
     plan = {"title": "plan"}
-    return {"event": kind, "slot": slot, "time": "2026-01-31T00:00:00.000Z", "run": "r", **{
+    events: dict[str, dict[str, Any]] = {
         "slot-state": {"state": word, "text": word, "port": ""},
         "run-began": {"run": word, "dut": word, "plan": plan, "steps": [1], "port": ""},
         "run-ended": {"verdict": word, "dut": "", "plan": plan, "reason": "", "advice": "",
                       "seconds": 1},
         "question": {"id": word, "kind": "text", "name": "", "text": word, "picture": ""},
-        "answer": {"id": word, "text": "", "by": ""}}[kind]}
+        "answer": {"id": word, "text": "", "by": ""}}
+    return {"event": kind, "slot": slot, "time": "2026-01-31T00:00:00.000Z", "run": "r",
+            **events[kind]}
 
 
 @given(st.lists(st.one_of(EVENT, st.none()), max_size=40), st.integers())

@@ -101,10 +101,10 @@ class Changes:
         told: Document = shown({"slots": slots, "counts": self._board.counts, "ended": ended})
         return told
 
-    def is_at(self, slot: str, run: str) -> bool:
-        """Whether the slot is busy with this run; an empty one is no run yet."""
-        found = self._board.slots.get(slot)
-        return found is not None and found["run"] == run
+    def slot_with(self, slot: str, run: str) -> str | None:
+        """The slot that is shown by this name, if it is busy with this run; "" is no run yet."""
+        return next((name for name, document in self._board.slots.items()
+                     if printable(name) == slot and document["run"] == run), None)
 
     def _told(self, name: str, slot: Document) -> Document:
         """A slot as a browser needs it. How long a run has taken is said: its clock may be any."""

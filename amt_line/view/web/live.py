@@ -118,10 +118,11 @@ class Live:
 
     async def _stop(self, request: web.Request) -> web.Response:
         said = await _said(request, "slot", "run")
-        if not self._changes.is_at(said["slot"], said["run"]):
+        slot = self._changes.slot_with(said["slot"], said["run"])
+        if slot is None:
             return _no(409, "gone", "")
         try:
-            await asyncio.to_thread(self._desk.stop, said["slot"])
+            await asyncio.to_thread(self._desk.stop, slot)
         except NoSuchSlot:
             return _no(409, "gone", "")
         return web.json_response({"ok": True})

@@ -26,6 +26,7 @@ export class Keys {
     this.last = performance.now();
     if (document.querySelector('dialog[open]')) return;
     if (event.key === 'Escape') {
+      this.last = -Infinity;
       this.desk.unchoose();
       this.field.focus();
     } else if (event.key.length === 1) {
