@@ -2,6 +2,7 @@
 
 from __future__ import annotations
 
+import threading
 from pathlib import Path
 
 from sqlalchemy import inspect, text
@@ -13,6 +14,10 @@ from amt_line.store.url import shown_url
 
 HEAD = 1
 VERSION_TABLE = "amt_store_version"
+SCRIPTS = Path(__file__).parent / "migrations"
+
+# alembic keeps what it is at in the module: in one process, one migration at a time.
+_ONE = threading.Lock()
 
 # One key for all stations: who migrates holds it, and the others wait.
 _LOCK = 0x616D74
@@ -28,7 +33,7 @@ def bring_up_to_date(engine: Engine) -> None:
         if connection.dialect.name == "postgresql":
             connection.execute(text("SELECT pg_advisory_xact_lock(:key)"), {"key": _LOCK})
         if _version(connection) != HEAD:
-            upgrade(connection)
+            upgrade(connection, HEAD)
 
 
 def check_version(engine: Engine) -> None:
@@ -61,16 +66,16 @@ def _version(connection: Connection) -> int:
     return int(words[0])
 
 
-def upgrade(connection: Connection, version: int = HEAD) -> None:
+def upgrade(connection: Connection, version: int) -> None:
     """Carry out the migrations up to ``version`` in the connection's transaction."""
     from alembic import command
     from alembic.config import Config
 
     config = Config()
-    config.set_main_option("script_location",
-                           str(Path(__file__).parent / "migrations").replace("%", "%%"))
+    config.set_main_option("script_location", str(SCRIPTS).replace("%", "%%"))
     config.attributes["connection"] = connection
-    command.upgrade(config, f"{version:04}")
+    with _ONE:
+        command.upgrade(config, f"{version:04}")
 
 
 def _name(connection: Connection) -> str:

@@ -3,10 +3,11 @@
 from __future__ import annotations
 
 import multiprocessing
+import shutil
 import sqlite3
-import threading
+from concurrent.futures import ThreadPoolExecutor
 from pathlib import Path
-from typing import Any
+from typing import Any, Callable
 
 import pytest
 from alembic.autogenerate.api import compare_metadata
@@ -14,7 +15,8 @@ from alembic.migration import MigrationContext
 from sqlalchemy import text
 from store_bench import record, step, value
 
-from amt_line.store import Search, Store, StoreAway, StoreProblem
+from amt_line.run.record import document_text
+from amt_line.store import Search, Store, StoreAway, StoreProblem, migrate
 from amt_line.store.engine import make_engine, writing
 from amt_line.store.migrate import HEAD, VERSION_TABLE, upgrade
 from amt_line.store.queries import count, page
@@ -96,18 +98,30 @@ def test_a_file_that_is_no_database(path: Path) -> None:
         Store.open(f"sqlite:///{path}")
 
 
-def test_a_migration_that_fails_leaves_nothing(store_url: str,
-                                               monkeypatch: pytest.MonkeyPatch) -> None:
-    def fail(connection: Any) -> None:
-        upgrade(connection)
+def fails_behind_a_migration(monkeypatch: pytest.MonkeyPatch, url: str) -> None:
+    """Open a store, and lose the power when it has been migrated, but not committed."""
+    def fail(connection: Any, version: int) -> None:
+        upgrade(connection, version)
         raise OSError("the power went")
 
     with monkeypatch.context() as patch:
-        patch.setattr("amt_line.store.migrate.upgrade", fail)
+        patch.setattr(migrate, "upgrade", fail)
         with pytest.raises(OSError, match="the power went"):
-            Store.open(store_url)
+            Store.open(url)
+
+
+def test_tables_that_were_not_finished_are_made_again(store_url: str,
+                                                      monkeypatch: pytest.MonkeyPatch) -> None:
+    fails_behind_a_migration(monkeypatch, store_url)
     with Store.open(store_url) as store:
         assert store.put(record())
+
+
+def at_once(count: int, work: Callable[[], object]) -> None:
+    """Do it in so many threads; what goes wrong in one goes wrong here."""
+    with ThreadPoolExecutor(count) as threads:
+        for future in [threads.submit(work) for _ in range(count)]:
+            future.result(300)
 
 
 def _open(url: str, ready: Any, results: Any) -> None:
@@ -122,30 +136,88 @@ def _open(url: str, ready: Any, results: Any) -> None:
 
 def test_several_stations_may_make_it_at_once(store_url: str) -> None:
     context = multiprocessing.get_context("spawn")
-    ready, results = context.Barrier(4), context.Queue()
+    ready, results = context.Barrier(2), context.Queue()
     processes = [context.Process(target=_open, args=(store_url, ready, results), daemon=True)
-                 for _ in range(4)]
+                 for _ in range(2)]
     for process in processes:
         process.start()
-    assert [results.get(timeout=300) for _ in processes] == [""] * 4
+    assert [results.get(timeout=300) for _ in processes] == [""] * 2
     for process in processes:
         process.join(300)
     with Store.open(store_url) as store:
-        assert store.runs().total == 4
+        assert store.runs().total == 2
+
+
+NEXT = """
+import sqlalchemy as sa
+from alembic import op
+
+revision = "%s"
+down_revision = "%s"
+
+
+def upgrade():
+    op.add_column("runs", sa.Column("shift", sa.String(), nullable=False, server_default=""))
+    op.execute("UPDATE runs SET shift = CASE WHEN began LIKE '%%T06:00:0%%' THEN 'early' "
+               "ELSE 'late' END")
+    op.create_index("runs_shift", "runs", ["shift"])
+"""
+
+
+@pytest.fixture
+def a_version_later(tmp_path: Path, monkeypatch: pytest.MonkeyPatch) -> Callable[[], None]:
+    """From its call on, this is the next version of the program."""
+    scripts = tmp_path / "migrations %d"
+    shutil.copytree(migrate.SCRIPTS, scripts, ignore=shutil.ignore_patterns("__pycache__"))
+    later = scripts / "versions" / "later.py"
+    later.write_text(NEXT % (f"{HEAD + 1:04}", f"{HEAD:04}"), encoding="utf-8")
+
+    def begin() -> None:
+        monkeypatch.setattr(migrate, "SCRIPTS", scripts)
+        monkeypatch.setattr(migrate, "HEAD", HEAD + 1)
+    return begin
+
+
+def test_an_older_database_is_migrated_with_all_that_is_in_it(
+        store_url: str, a_version_later: Callable[[], None],
+        monkeypatch: pytest.MonkeyPatch) -> None:
+    documents = [record(number) for number in range(20)]
+    with Store.open(store_url) as store:
+        store.put_new(map(document_text, documents))
+    a_version_later()
+    with pytest.raises(StoreProblem) as caught:
+        Store.open(store_url, create=False)
+    assert (f"the database is of version {HEAD}, this program wants {HEAD + 1}; "
+            "`amt-station store sync` migrates it") in str(caught.value)
+    at_once(4, lambda: Store.open(store_url).close())
+    assert execute(store_url, "SELECT shift, count(*) FROM runs GROUP BY shift ORDER BY shift") \
+        == [("early", 10), ("late", 10)]
+    with Store.open(store_url, create=False) as store:
+        assert [store.record(document["run"]) for document in documents] == documents
+        assert store.put(record()) and not store.put(documents[0])
+    monkeypatch.undo()
+    with pytest.raises(StoreProblem, match=f"is of version {HEAD + 1}, this program knows {HEAD}"):
+        Store.open(store_url)
+
+
+def test_a_migration_that_was_interrupted_is_done_again(
+        store_url: str, a_version_later: Callable[[], None],
+        monkeypatch: pytest.MonkeyPatch) -> None:
+    with Store.open(store_url) as store:
+        store.put(record())
+    a_version_later()
+    fails_behind_a_migration(monkeypatch, store_url)
+    assert execute(store_url, f"SELECT version_num FROM {VERSION_TABLE}") == [(f"{HEAD:04}",)]
+    with Store.open(store_url) as store:
+        assert store.runs().total == 1
+    assert execute(store_url, "SELECT shift FROM runs") == [("early",)]
 
 
 def test_the_same_records_from_several_threads(store_url: str) -> None:
     documents = [record(number) for number in range(30)]
     new: list[int] = []
     with Store.open(store_url) as store:
-        def put() -> None:
-            new.append(sum(store.put(document) for document in documents))
-
-        threads = [threading.Thread(target=put) for _ in range(4)]
-        for thread in threads:
-            thread.start()
-        for thread in threads:
-            thread.join(300)
+        at_once(4, lambda: new.append(sum(store.put(document) for document in documents)))
         assert sum(new) == 30 and len(new) == 4 and store.runs().total == 30
 
 
