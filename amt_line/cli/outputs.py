@@ -29,14 +29,17 @@ def _html(records: Records) -> str:
     return html_page(records)
 
 
-MAKERS: Mapping[str, Callable[[Records], str]] = {"junit": _junit, "csv": _csv, "html": _html}
+Makers = Mapping[str, Callable[[Any], str]]
+
+MAKERS: Makers = {"junit": _junit, "csv": _csv, "html": _html}
 
 
 class Outputs:
     """Report files of one command; what stood in them stays until there is something new."""
 
-    def __init__(self, paths: Mapping[str, Path | None]) -> None:
+    def __init__(self, paths: Mapping[str, Path | None], makers: Makers = MAKERS) -> None:
         """``paths`` by the name of what is made; ``UsageProblem`` when one cannot be opened."""
+        self._makers = makers
         self._files: dict[str, TextIO] = {}
         self._paths = {name: path for name, path in paths.items() if path is not None}
         if len({path.resolve() for path in self._paths.values()}) != len(self._paths):
@@ -50,12 +53,12 @@ class Outputs:
                 self.close()
                 raise UsageProblem(f"{path}: {error.strerror}") from error
 
-    def write(self, records: Records) -> None:
+    def write(self, content: Any) -> None:
         """Make and write every report; the first that fails is told when all were tried."""
         failure: RecordLost | None = None
         for name, file in self._files.items():
             try:
-                text = MAKERS[name](records)
+                text = self._makers[name](content)
                 self._new.discard(name)
                 if file.seekable():
                     file.seek(0)

@@ -14,6 +14,8 @@ _MOST_BINS = 40
 _MOST_DIFFERENT = 1000
 # So many steps of a converter are shown one by one.
 _EACH_ITS_BIN = 15
+# Nothing on a line is measured finer: numbers this near are one, and a width is no smaller.
+_SAME, _FINEST_GRAIN, _NARROWEST = 1e-12, 1e-6, 1e-100
 _ROUND = (1.0, 2.0, 5.0, 10.0)
 
 
@@ -32,6 +34,7 @@ class Histogram:
 
 def round_up(width: float) -> float:
     """The next of 1, 2, 5, 10, 20, 50, and so on, large and small."""
+    width = max(width, _NARROWEST)
     power: float = 10.0 ** floor(log10(width))
     step = next((step for step in _ROUND if width <= step * power * (1 + 1e-9)), _ROUND[-1])
     return float(f"{step * power:.6g}")
@@ -69,9 +72,9 @@ def _view(numbers: Numbers) -> tuple[float, float]:
 
 def _edges(numbers: Numbers, first: float, last: float, low: float | None, high: float | None
            ) -> Sequence[float]:
-    if first == last:
+    if last - first <= _SAME * max(abs(first), abs(last)):
         half = _half_of_one(first, low, high)
-        return first - half, first + half
+        return first - half, last + half
     shown = numbers.different[bisect_left(numbers.different, first):
                               bisect_right(numbers.different, last)]
     grain = _grain(shown)
@@ -114,6 +117,8 @@ def _grain(different: Sequence[float]) -> float:
         return 0.0
     gaps = [after - before for before, after in zip(different, different[1:])]
     grain = float(f"{min(gaps):.9g}")
+    if grain < (different[-1] - different[0]) * _FINEST_GRAIN:
+        return 0.0
     if all(abs(gap / grain - round(gap / grain)) < 1e-3 for gap in gaps):
         return grain
     return 0.0

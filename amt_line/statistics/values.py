@@ -3,7 +3,6 @@
 from __future__ import annotations
 
 from dataclasses import dataclass
-from math import isfinite
 from typing import Mapping, NamedTuple, Sequence
 
 from amt_line.statistics.histogram import Histogram, histogram
@@ -15,6 +14,8 @@ from amt_line.statistics.steps import StepName, StepNames
 MOST_LIMITS = 5
 # A spread of fewer values says little.
 FEW = 30
+# What is larger, or no number at all, was not measured.
+_LARGEST = 1e100
 
 
 class ValueName(NamedTuple):
@@ -77,7 +78,7 @@ def _figures(value: ValueName, limits: Limits, own: bool, counted: Sequence[Valu
     together: dict[float, int] = {}
     for counts in counted:
         for number, times in counts.numbers.items():
-            if isfinite(number):
+            if abs(number) <= _LARGEST:
                 together[number] = together.get(number, 0) + times
     numbers = Numbers(together)
     spread, bins = numbers.spread(), histogram(numbers, limits.low, limits.high)

@@ -34,6 +34,7 @@ COMMANDS: Mapping[str, Place] = {
     "send": Place("amt_station.cli.send:send", "Send any request and show its answer"),
     "serve": Place("amt_line.cli.serve:serve", "Serve runs and statistics as web pages"),
     "show": Place("amt_line.cli.show:show", "Print the record of a run"),
+    "stats": Place("amt_line.cli.stats:stats", "Show yields, failures, values and times"),
     "store": Place("amt_line.cli.store:store", "Deliver records to the database, compare both"),
     "wait": Place("amt_station.cli.ports:wait", "Wait for a port to appear"),
 }
