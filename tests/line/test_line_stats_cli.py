@@ -8,7 +8,7 @@ import json
 import re
 from html.parser import HTMLParser
 from pathlib import Path
-from typing import Any
+from typing import Any, Callable, NamedTuple
 
 import pytest
 from station_peer import Run
@@ -19,6 +19,7 @@ from amt_line.report.statistics_file import statistics_page
 from amt_line.store import Store
 from amt_line.store.figures import gather
 from amt_line.view.statistics import plain_lines, show
+from amt_station.cli.main import run
 
 DAY = 86_400.0
 HOSTILE = "\x1b[2J\u202e<script>alert(1)</script>&\"'"
@@ -47,6 +48,30 @@ def make_store(tmp_path: Path) -> str:
     return url
 
 
+class Said(NamedTuple):
+    """What a command came to."""
+
+    returncode: int
+    stdout: str
+    stderr: str
+
+
+Station = Callable[..., Said]
+
+
+@pytest.fixture(name="station")
+def make_station(capsys: pytest.CaptureFixture[str], monkeypatch: pytest.MonkeyPatch,
+                 tmp_path: Path) -> Station:
+    """Carry a command line out here: a process of its own takes longer than its work."""
+    monkeypatch.setenv("XDG_STATE_HOME", str(tmp_path / "state"))
+    monkeypatch.delenv("AMT_STATION_STORE", raising=False)
+
+    def station(*arguments: str) -> Said:
+        status = run(arguments)
+        return Said(status, *capsys.readouterr())
+    return station
+
+
 def rows(text: str) -> dict[tuple[str, ...], str]:
     found = list(csv.DictReader(io.StringIO(text)))
     assert found and tuple(found[0]) == COLUMNS
@@ -54,8 +79,8 @@ def rows(text: str) -> dict[tuple[str, ...], str]:
              row["figure"]): row["number"] for row in found}
 
 
-def test_json(run_station: Run, url: str) -> None:
-    result = run_station("stats", "--store", url, "--json")
+def test_json(station: Station, url: str) -> None:
+    result = station("stats", "--store", url, "--json")
     assert result.returncode == 0, result.stderr
     found = json.loads(result.stdout)
     assert found["ok"] is True and found["store"] == url
@@ -78,9 +103,9 @@ def test_json(run_station: Run, url: str) -> None:
     assert found["steps"][0]["median"] == 0.5
 
 
-def test_filters(run_station: Run, url: str) -> None:
+def test_filters(station: Station, url: str) -> None:
     def counted(*arguments: str) -> tuple[int, int]:
-        result = run_station("stats", "--store", url, "--json", *arguments)
+        result = station("stats", "--store", url, "--json", *arguments)
         assert result.returncode == 0, result.stderr
         whole = json.loads(result.stdout)["all"]
         return whole["runs"], whole["handsets"]
@@ -119,16 +144,18 @@ def test_files_and_plain_text(run_station: Run, url: str, tmp_path: Path) -> Non
     (("--store", "mysql://host/x"), 2, "is no database that can be used"),
     (("--store", "sqlite:////nowhere/x.sqlite"), 3, "there is no such database"),
     (("--store", "sqlite:////dev/null"), 7, "sqlite:////dev/null")])
-def test_what_cannot_be_done_is_told(run_station: Run, url: str, arguments: tuple[str, ...],
-                                     status: int, said: str) -> None:
-    result = run_station("stats", "--json", *arguments, AMT_STATION_STORE=url)
+def test_what_cannot_be_done_is_told(station: Station, url: str, arguments: tuple[str, ...],
+                                     status: int, said: str,
+                                     monkeypatch: pytest.MonkeyPatch) -> None:
+    monkeypatch.setenv("AMT_STATION_STORE", url)
+    result = station("stats", "--json", *arguments)
     assert result.returncode == status, result.stdout + result.stderr
     assert said in result.stderr and not Path("same").exists()
     assert json.loads(result.stdout)["error"]["message"] in result.stderr
 
 
-def test_nothing_is_made_where_nothing_is(run_station: Run, tmp_path: Path) -> None:
-    result = run_station("stats", "--html", str(tmp_path / "s.html"))
+def test_nothing_is_made_where_nothing_is(station: Station, tmp_path: Path) -> None:
+    result = station("stats", "--html", str(tmp_path / "s.html"))
     assert result.returncode == 3 and "line.sqlite: there is no such database" in result.stderr
     assert not [path for path in tmp_path.rglob("*") if path.is_file()]
 
