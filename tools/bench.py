@@ -14,7 +14,7 @@ from amt_simulator import Handset
 from amt_simulator.inside.modem import Modem
 from amt_simulator.inside.modem_table import IDENTITIES
 from amt_station import wire
-from tools import bench_slots
+from tools import bench_slots, bench_stats
 from tools.bare_modem import bare_modem
 from tools.bench_line import bench_station
 from tools.build import build
@@ -134,9 +134,12 @@ def main() -> int:
     """Measure everything. The log goes to its file, as in service."""
     if sys.argv[1:2] == ["line"]:
         return bench_slots.main()
+    if sys.argv[1:2] == ["stats"]:
+        return bench_stats.main()
     parser = argparse.ArgumentParser(
         prog="./dev bench", description=__doc__,
-        epilog="./dev bench line [HANDSETS] measures many handsets on one line instead")
+        epilog="./dev bench line [HANDSETS] measures many handsets on one line instead, "
+        "./dev bench stats [VALUES] the statistics of a large store")
     parser.add_argument("--no-codec", action="store_true", help="only what needs a handset")
     parser.add_argument("--all-cores", action="store_true",
                         help="let the system place the processes, and measure that too")
