@@ -15,7 +15,7 @@ from selenium.webdriver.chrome.service import Service
 from selenium.webdriver.common.action_chains import ActionChains
 from selenium.webdriver.common.by import By
 from selenium.webdriver.remote.webelement import WebElement
-from selenium.webdriver.support.ui import WebDriverWait
+from selenium.webdriver.support.wait import WebDriverWait
 
 SCREENS = Path(__file__).resolve().parents[2] / "build" / "screens"
 # A server that is not there, and an answer that does not fit.
@@ -43,7 +43,7 @@ class Browser:
     def fresh(self) -> None:
         """As if nobody had used it."""
         self.driver.get("about:blank")
-        self.driver.delete_all_cookies()
+        self.driver.execute_cdp_cmd("Network.clearBrowserCookies", {})
         self.driver.get_log("browser")
         self.size(DESKTOP)
 

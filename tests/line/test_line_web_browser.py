@@ -285,7 +285,7 @@ def test_the_page_is_used_by_the_keyboard_alone(browser: Browser, line: ToldLine
     browser.wait_look("A", "running")
     browser.wait(lambda: browser.focused() == "field", "the scanner's field")
     browser.script("document.querySelector('.skip').focus()")
-    order = []
+    order: list[str] = []
     for _ in range(8):
         browser.type(Keys.TAB if order else Keys.SHIFT)
         order.append(browser.focused())
