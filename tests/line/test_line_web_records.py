@@ -14,6 +14,7 @@ from urllib.parse import urlencode
 import pytest
 from line_documents import NOON, exchange, record, step, utc, value
 
+from amt_line.drawing.days import share_text
 from amt_line.store import Store, StoreAway
 from amt_line.view.web.address import Address
 from amt_line.view.web.search import BadQuery, read_query
@@ -263,6 +264,39 @@ def test_times_are_those_of_the_wall(served: Served) -> None:
     served.store.put(record(0))
     text = served.get("/runs")[1]
     assert NOON.astimezone().strftime("%Y-%m-%d %H:%M:%S") in text and utc(NOON) in text
+
+
+def test_statistics_are_those_of_the_filter(served: Served) -> None:
+    for number in range(12):
+        good = number % 4 > 0
+        served.store.put(record(
+            number, "PASS" if good else "FAIL", station="one" if number < 8 else "two",
+            steps=[step(1, HOSTILE, "pass" if good else "fail",
+                        values=[value(3600 + number if good else 50, 100, 4000)])]))
+    response, text = served.get("/statistics")
+    tags = Tags(text)
+    assert response.status == 200 and share_text(0.75) in text and "9 of 12 handsets" in text
+    assert tags.tags.count("svg") == 3 and "script" not in tags.tags and "img" not in tags.tags
+    assert not [name for name in tags.attributes if name.startswith("on") or name == "style"]
+    assert "6 of 8 handsets" in served.get("/statistics", station="one")[1]
+    assert "No run fits" in served.get("/statistics", until="2026-01-29")[1]
+    response, text = served.get("/statistics", since="2026-01-31", until="2026-01-30")
+    assert response.status == 400 and "The period ends before it begins." in text
+    assert served.get("/statistics", since="x")[0].status == 400
+
+
+@pytest.mark.parametrize("code", ["de", "zh-Hans"])
+def test_every_word_of_the_statistics_is_told(served: Served, code: str) -> None:
+    for number in range(8):
+        served.store.put(record(
+            number, "PASS" if number % 2 else "FAIL", station=str(number % 2),
+            plan={**record()["plan"], "title": str(number % 2)}, steps=[
+                step(1, "1", "pass" if number % 2 else "fail", values=[value(5, 1, 9, "2")])]))
+    plain = Tags(served.get("/statistics", lang=code)[1]).text
+    english = Tags(served.get("/statistics", lang="en")[1]).text
+    for word in ("Failures by step", "Step times", "First pass", "Smallest", "With those above",
+                 "values", "first pass", "Handsets", "median", "least capable"):
+        assert word in english and word not in plain, word
 
 
 def everything() -> Any:

@@ -8,6 +8,7 @@ from typing import Any
 from aiohttp import web
 
 from amt_line.run.record_file import file_name
+from amt_line.view.web import language
 from amt_line.view.web.assets import assets
 from amt_line.view.web.records import Records
 from amt_line.view.web.render import Renderer
@@ -31,6 +32,7 @@ class Pages:
         router.add_get("/static/{name}", self._static)
         if self._records is not None:
             router.add_get("/runs", self._runs)
+            router.add_get("/statistics", self._statistics)
             router.add_get(f"/runs/{_RUN}", self._run)
             router.add_get(f"/runs/{_RUN}/record.json", self._record)
 
@@ -62,6 +64,23 @@ class Pages:
         choices = await self._records.ask(lambda store: store.words())
         return self._renderer.page(request, "runs.html", **shown, query=query, wrong="",
                                    given=query.texts, choices=choices, found=found)
+
+    async def _statistics(self, request: web.Request) -> web.Response:
+        from amt_line.store.figures import gather
+        from amt_line.view.web.figures import read_filter, shown_figures
+
+        assert self._records is not None
+        try:
+            texts, chosen = read_filter(request.query)
+        except BadQuery as error:
+            return self._renderer.page(request, "statistics.html", 400, room="statistics",
+                                       given=request.query, choices={}, wrong=str(error))
+        words = language.chosen(request)
+        choices = await self._records.ask(lambda store: store.words())
+        figures = await self._records.ask_long(
+            lambda store: shown_figures(gather(store, chosen), words))
+        return self._renderer.page(request, "statistics.html", room="statistics", given=texts,
+                                   choices=choices, wrong="", figures=figures)
 
     async def _run(self, request: web.Request) -> web.Response:
         record = json.loads(await self._record_text(request))

@@ -24,11 +24,20 @@ class Records:
         self._lock = threading.Lock()
         self._store: Store | None = None
         self._threads = ThreadPoolExecutor(_THREADS, "page-store")
+        self._counting = ThreadPoolExecutor(1, "page-statistics")
 
     async def ask(self, question: Callable[[Store], _Answer]) -> _Answer:
         """The answer; raises ``StoreProblem`` when the store has none to give."""
+        return await self._ask(self._threads, question)
+
+    async def ask_long(self, question: Callable[[Store], _Answer]) -> _Answer:
+        """As ``ask``, for what takes seconds: one at a time, and nobody else waits for it."""
+        return await self._ask(self._counting, question)
+
+    async def _ask(self, threads: ThreadPoolExecutor,
+                   question: Callable[[Store], _Answer]) -> _Answer:
         return await asyncio.get_running_loop().run_in_executor(
-            self._threads, lambda: question(self._opened()))
+            threads, lambda: question(self._opened()))
 
     def _opened(self) -> Store:
         """A database that was away is tried again with every question."""
@@ -39,6 +48,7 @@ class Records:
 
     def close(self) -> None:
         """Give the database back; what is still asked is waited for."""
-        self._threads.shutdown(cancel_futures=True)
+        for threads in (self._threads, self._counting):
+            threads.shutdown(cancel_futures=True)
         if self._store is not None:
             self._store.close()

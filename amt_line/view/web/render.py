@@ -10,6 +10,7 @@ from aiohttp import web
 from jinja2 import Environment, PackageLoader, StrictUndefined
 from yarl import URL
 
+from amt_line.drawing.days import share_text
 from amt_line.drawing.value_bar import bar_for
 from amt_line.report.html_file import decoded_text, printable_lines, spaced_hex
 from amt_line.report.records import duration, number_text, value_text
@@ -27,7 +28,8 @@ def _environment() -> Environment:
                               autoescape=True, undefined=StrictUndefined, trim_blocks=True,
                               lstrip_blocks=True)
     environment.filters.update(safe_text=printable_lines, hex=spaced_hex, decoded=decoded_text,
-                               duration=duration, number=number_text, local=local_time)
+                               duration=duration, number=number_text, local=local_time,
+                               share=share_text)
     environment.globals.update(value_text=value_text, limits_words=limits_words, bar=bar_for)
     return environment
 
