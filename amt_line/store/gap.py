@@ -27,9 +27,9 @@ class Gap:
 def find_gap(store: Store, directory: Path) -> Gap:
     """Compare names; a file is read only where the database has its run as not ended."""
     names = file_names(directory)
-    known = store.files_of(origin_of(directory), names)
-    missing = [name for name in names if name not in known or (
-        known[name].state == "running" and digest(directory / name) != known[name].sha256)]
+    missing, unfinished = store.missing_of(origin_of(directory), names)
+    missing += [name for name, sha256 in unfinished.items()
+                if digest(directory / name) != sha256]
     return Gap(in_order(directory, missing), len(names))
 
 

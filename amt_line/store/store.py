@@ -4,7 +4,7 @@ from __future__ import annotations
 
 import hashlib
 import json
-from typing import ContextManager, Iterable, Iterator, Mapping, NamedTuple, TypeVar
+from typing import ContextManager, Iterable, Iterator, Mapping, NamedTuple, Sequence, TypeVar
 
 from sqlalchemy import delete, func, insert, select, update
 from sqlalchemy.engine import Connection, Engine
@@ -141,6 +141,24 @@ class Store:
                 found.update((row[0], Stored._make(row[1:])) for row in
                              connection.execute(query.where(RECORDS.c.file.in_(part))).all())
         return found
+
+    def missing_of(self, origin: str, names: Sequence[str]) -> tuple[list[str], dict[str, str]]:
+        """Which of a directory's files are not stored; of the others, those whose run has not
+        ended, with the SHA-256 of what is stored."""
+        unfinished = (select(RECORDS.c.file, RECORDS.c.sha256).join_from(RUNS, RECORDS)
+                      .where(RUNS.c.verdict == ""))
+        with reading(self._engine) as connection:
+            result = connection.execute(select(RECORDS.c.file).where(RECORDS.c.origin == origin))
+            # A directory of years holds many: they are taken as the driver has them.
+            there = {row[0] for row in result.cursor.fetchall()}
+            result.close()
+            running = dict(connection.execute(unfinished).all())
+            others = [name for name in names if name not in there]
+            for part in _batches(others, _BATCH):
+                there.update(connection.execute(
+                    select(RECORDS.c.file).where(RECORDS.c.file.in_(part))).scalars())
+        missing = [name for name in names if name not in there]
+        return missing, {name: running[name] for name in names if name in running}
 
     def stored(self, run: str) -> Stored | None:
         """What is stored of a run."""
