@@ -8,10 +8,11 @@ may work side by side in threads.
 from __future__ import annotations
 
 import logging
+import threading
 import time
 import traceback
 from dataclasses import dataclass, field
-from typing import Any, Callable, Iterable, Mapping, Sequence
+from typing import Any, Callable, ContextManager, Iterable, Mapping, Sequence
 
 from amt_line.plan.model import Plan, Section, Step
 from amt_line.plan.references import Scalar
@@ -48,6 +49,9 @@ class Setting:
     shared: Shared = field(default_factory=Shared)
     # Requests to end all runs of a line; the list may grow.
     ends: Sequence[Abort] = ()
+    # Held while a run computes between its exchanges: Python lets one thread compute at a time, and
+    # an answer that has come is to meet one such thread of the line, not all of them.
+    computing: ContextManager[object] = field(default_factory=threading.Lock)
     # Whether a handset that goes away unasked was pulled out, which ends the run.
     pulled_is_aborted: bool = False
 
@@ -198,8 +202,9 @@ class Runner:
 
     def exchanges(self) -> list[Document]:
         """What went over the port since the last call, for the record."""
-        return [exchange_document(transcript)
-                for transcript in self._connection.take_transcripts()]
+        with self._setting.computing:
+            return [exchange_document(transcript)
+                    for transcript in self._connection.take_transcripts()]
 
     def _note_abort(self) -> None:
         how = self._stop.requested
@@ -266,9 +271,10 @@ class Runner:
             self._tally.not_passed(verdict, document["exit_status"],
                                    f"{step.name}: {document['reason']}", document["advice"])
             self._stop_behind(step, work)
-        self.record.add_step(document)
-        self._stream.send("step-ended", **_event(document))
-        self._keep()
+        with self._setting.computing:
+            self.record.add_step(document)
+            self._stream.send("step-ended", **_event(document))
+            self._keep()
 
     def _stop_behind(self, step: Step, work: StepRun) -> None:
         reason = work.obstacle

@@ -7,9 +7,10 @@ handset.
 from __future__ import annotations
 
 import logging
+import threading
 import time
 from dataclasses import dataclass, field
-from typing import Callable, Mapping, Protocol
+from typing import Callable, ContextManager, Mapping, Protocol
 
 from amt_line.plan.model import Plan
 from amt_line.plan.problems import PlanProblem
@@ -58,6 +59,7 @@ class Shop:
     once: bool = False
     patience: Patience = Patience()
     shared: Shared = field(default_factory=Shared)
+    computing: ContextManager[object] = field(default_factory=threading.Lock)
     # Told of every record that can no longer be written, with its text: rather there than nowhere.
     lost_record: Callable[[StationError, str], None] = lambda error, text: None
     # Requests to end the whole line; a signal handler may add to it.
@@ -205,7 +207,8 @@ class Slot:
         runner = Runner(shop.plan, values, dut, Setting(
             open_port, shop.where(self.name, arrival.seen.url), shop.timeout,
             GivenAnswers(shop.answers, others), keep=keep, stream=shop.stream,
-            shared=shop.shared, ends=shop.ends, pulled_is_aborted=True))
+            shared=shop.shared, ends=shop.ends, computing=shop.computing,
+            pulled_is_aborted=True))
         self._desk_operator.run = runner.record.run
         self._state(RUNNING, "", arrival.seen.url)
         self._runner = runner
