@@ -9,6 +9,7 @@ from pathlib import Path
 from typing import Any, Iterator, Sequence
 
 import pytest
+from postgresql import Cluster
 from store_bench import BEGIN, record, stamp, step, unfinished, value
 
 from amt_line.statistics.filter import Filter
@@ -220,3 +221,14 @@ def test_indexes_are_used(tmp_path: Path) -> None:
                     assert f"SEARCH {table.name} USING PRIMARY KEY (run_id" in _plan(
                         connection, part)
                 assert len(list(parts_of(query, table, range(1, 4002)))) == 3
+
+
+@pytest.mark.xdist_group("postgresql")
+def test_both_databases_say_the_same(postgresql: Cluster, tmp_path: Path) -> None:
+    texts = [_text(one) for one in shift(80, seed=9)]
+    found = []
+    for url in (postgresql.new_database(), f"sqlite:///{tmp_path}/line.sqlite"):
+        with Store.open(url) as store:
+            store.put_new(texts)
+            found.append(gather(store))
+    assert found[0] == found[1] and found[0].values
