@@ -59,7 +59,7 @@ def ask_behind(desk: ModemDesk, rest: bytes) -> None:
 
 def say_at_once(desk: ModemDesk, said: bytes) -> None:
     """All of a long answer is there when the daemon reads."""
-    with standing_still(desk.handset):
+    with standing_still(desk.handset, len(said)):
         desk.mux.write(said)
 
 
@@ -141,8 +141,9 @@ def test_2041_bytes_pass_and_2042_are_refused(desk: ModemDesk) -> None:
         desk.mux.write(line("0400000000") + OK)
         desk.expect(packet(4, integer(1, 0)))
     trace = Trace(desk.handset)
-    with standing_still(desk.handset):
-        desk.app.send(packet(3, raw(4, data)).encode())
+    refused = packet(3, raw(4, data)).encode()
+    with standing_still(desk.handset, len(refused)):
+        desk.app.send(refused)
     desk.expect(refusal(3, NOT_SERVED))
     trace.expect("amt_modem_handle_req()", error_line("amt_modem_handle_req", -100),
                  "(10 + 2042 * 2 + 2) < 4096")
