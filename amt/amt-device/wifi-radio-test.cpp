@@ -3,7 +3,6 @@
 #include "amt/amt-atom.h"
 #include "amt/amt-command.h"
 #include "amt/amt-device/command.h"
-#include "amt/amt-device/device-fail.h"
 #include "amt/amt-device/device-request.h"
 #include "amt/amt-device/embed/embedded-data.h"
 #include "amt/amt-device/radio-step.h"
@@ -54,9 +53,9 @@ bool get_rate(const amt_buf_st *req_ptr, uint16_t *value_ptr)
     return get_number(req_ptr, AMT_ATOM_WIFI_RATE, 2, value_ptr);
 }
 
-int fail(const char *text, const amt_device_place_st &place = {HANDLER})
+int fail(const char *text, const pub_log_place_st &place = {g_amt_device_log, HANDLER})
 {
-    return amt_device_fail(place, PUB_ERR_FAIL, "%s", text);
+    return pub_log_fail(place, PUB_ERR_FAIL, "%s", text);
 }
 
 int start_wifi(const amt_buf_st *, amt_buf_st *)
@@ -153,7 +152,7 @@ constexpr uint8_t SUB_COMMAND_MAX = sizeof(SUB_COMMAND_A) / sizeof(SUB_COMMAND_A
 int operate(uint8_t sub_command, const amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
     if (sub_command == 0 || sub_command > SUB_COMMAND_MAX) {
-        amt_device_fail({HANDLER}, PUB_ERR_PARAM, "unknown operation: %u", sub_command);
+        pub_log_fail({g_amt_device_log, HANDLER}, PUB_ERR_PARAM, "unknown operation: %u", sub_command);
         amt_device_run("echo the subcmd is invalid >> " TRACE_FILE);
         return PUB_ERR_PARAM;
     }
@@ -185,8 +184,7 @@ int amt_device_wifi_rtx_test(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *
     amt_packet_get_bytes(req_ptr->m_buf_a, AMT_ATOM_WIFI_SUB_COMMAND, &sub_command, sizeof(sub_command));
     trace_sub_command(sub_command);
     amt_packet_add_bytes(rsp_ptr->m_buf_a, AMT_ATOM_WIFI_SUB_COMMAND, &sub_command, sizeof(sub_command));
-    const int status = operate(sub_command, req_ptr, rsp_ptr);
-    if (status != PUB_ERR_NONE) {
+    if (const int status = operate(sub_command, req_ptr, rsp_ptr); status != PUB_ERR_NONE) {
         return status;
     }
     return amt_reply_finish_ok(channel, rsp_ptr);

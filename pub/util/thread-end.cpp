@@ -153,9 +153,7 @@ int pub_util_kill_thread(pthread_t *thread_ptr)
 {
     pub_log_entry(g_pub_util_log);
     if (thread_ptr == nullptr) {
-        pub_log_error(g_pub_util_log, PUB_ERR_PARAM);
-        pub_log_flags(g_pub_util_log, {true});
-        return PUB_ERR_PARAM;
+        return pub_log_bad_param(g_pub_util_log, {true});
     }
     if (*thread_ptr == 0 || pthread_kill(*thread_ptr, 0) == ESRCH) {
         return PUB_ERR_NONE;

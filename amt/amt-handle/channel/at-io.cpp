@@ -86,8 +86,7 @@ ssize_t read_once(char *buf, uint32_t length)
 
 int rewrite_after_reopen(const char *text, uint32_t length)
 {
-    const int status = amt_at_open();
-    if (status != PUB_ERR_NONE) {
+    if (const int status = amt_at_open(); status != PUB_ERR_NONE) {
         return status;
     }
     errno = 0; /* a short write has no errno, and shows none of the reopening */
@@ -96,8 +95,7 @@ int rewrite_after_reopen(const char *text, uint32_t length)
 
 int reread_after_reopen(char *buf, uint32_t length, ssize_t *count_ptr)
 {
-    const int status = amt_at_open();
-    if (status != PUB_ERR_NONE) {
+    if (const int status = amt_at_open(); status != PUB_ERR_NONE) {
         return status;
     }
     errno = 0;
@@ -108,8 +106,7 @@ int reread_after_reopen(char *buf, uint32_t length, ssize_t *count_ptr)
 /* The error line of the switch-off, which always names the public operation. */
 int fail_switch_off(int line, int error_code)
 {
-    pub_log_error(g_amt_handle_log, error_code, "disable_unsolicited_code", line);
-    return error_code;
+    return pub_log_error({g_amt_handle_log, "disable_unsolicited_code", line}, error_code);
 }
 
 int send_switch_off(int fd)
@@ -209,9 +206,7 @@ bool holds_error_result(const answer_st &answer)
 int write_at(const char *text, uint32_t length)
 {
     if (text == nullptr || length == 0) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
-        pub_log_flags(g_amt_handle_log, {text == nullptr, length == 0});
-        return PUB_ERR_PARAM;
+        return pub_log_bad_param(g_amt_handle_log, {text == nullptr, length == 0});
     }
     pub_log_entry(g_amt_handle_log);
     pub_print("[%s:L%d]write_at: %s\n", PROGRAM, WRITE_AT_LINE, text);
@@ -224,8 +219,7 @@ int write_at(const char *text, uint32_t length)
         status = rewrite_after_reopen(text, length);
     }
     if (status != PUB_ERR_NONE) {
-        pub_log_error(g_amt_handle_log, status);
-        return status;
+        return pub_log_error(g_amt_handle_log, status);
     }
     PUB_LOG(g_amt_handle_log, "send ==> %.1023s", text);
     return PUB_ERR_NONE;
@@ -234,9 +228,7 @@ int write_at(const char *text, uint32_t length)
 int read_at(char *buf, uint32_t length, int32_t *count_ptr)
 {
     if (buf == nullptr || length == 0 || count_ptr == nullptr) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
-        pub_log_flags(g_amt_handle_log, {buf == nullptr, length == 0, count_ptr == nullptr});
-        return PUB_ERR_PARAM;
+        return pub_log_bad_param(g_amt_handle_log, {buf == nullptr, length == 0, count_ptr == nullptr});
     }
     pub_print("[%s]read_at\n", PROGRAM);
     ssize_t count = read_once(buf, length);
@@ -254,8 +246,7 @@ int read_at(char *buf, uint32_t length, int32_t *count_ptr)
         *count_ptr = static_cast<int32_t>(count);
     }
     if (status != PUB_ERR_NONE) {
-        pub_log_error(g_amt_handle_log, status);
-        return status;
+        return pub_log_error(g_amt_handle_log, status);
     }
     PUB_LOG(g_amt_handle_log, "receive <== %.1023s", buf);
     return PUB_ERR_NONE;
@@ -266,8 +257,7 @@ int disable_unsolicited_code(int fd)
     if (fd <= 0) {
         return fail_switch_off(__LINE__, PUB_ERR_PARAM);
     }
-    const int status = send_switch_off(fd);
-    if (status != PUB_ERR_NONE) {
+    if (const int status = send_switch_off(fd); status != PUB_ERR_NONE) {
         return status;
     }
     /* A silent modem is waited for without limit: without its answer nothing that follows could be told
@@ -286,8 +276,7 @@ int disable_unsolicited_code(int fd)
 int amt_at_open()
 {
     for (int32_t i = 0; i < AMT_TTY_AT_ATTEMPTS; i++) {
-        const int status = amt_tty_open_at();
-        if (status != PUB_ERR_NONE) {
+        if (const int status = amt_tty_open_at(); status != PUB_ERR_NONE) {
             return status;
         }
         disable_unsolicited_code(g_handle_context.m_fd_at);
