@@ -9,7 +9,7 @@
 #include "amt/amt-cfg.h"
 #include "amt/amt-handle/channel/at-io.h"
 #include "amt/amt-handle/channel/context.h"
-#include "amt/amt-handle/channel/service-process.h"
+#include "amt/amt-handle/channel/process-end.h"
 #include "amt/amt-handle/channel/tty.h"
 #include "amt/amt-handle/handshake.h"
 #include "amt/amt-handle/reader/identity-write.h"

@@ -12,6 +12,7 @@
 #include "pub/error.h"
 #include "pub/file/scan.h"
 #include "pub/pub-log.h"
+#include "pub/util/signal-table.h"
 
 namespace {
 
@@ -43,8 +44,8 @@ bool read_pid_file(const char *path, long *pid_ptr)
     }
     const int scanned = pub_file_scan_long(file, pid_ptr);
     if (scanned != 1) {
-        pub_log_error({g_pub_util_log, CHECK_RUN}, PUB_ERR_FILE);
-        PUB_LOG(g_pub_util_log, "fscanf() return: %d; %d - %s", scanned, errno, strerror(errno));
+        pub_log_fail({g_pub_util_log, CHECK_RUN}, PUB_ERR_FILE, "fscanf() return: %d; %d - %s", scanned,
+                     errno, strerror(errno));
         return false;
     }
     PUB_LOG(g_pub_util_log, "pub_util_get_pid_and_check_run pid[%d]", static_cast<int>(*pid_ptr));
@@ -74,11 +75,9 @@ bool is_program(long pid, const char *name)
 void let_interrupt_pass()
 {
     const int saved_errno = errno;
-    sigset_t interrupt;
+    const sigset_t interrupt = pub_util_get_signal_set({SIGINT});
     sigset_t own_mask;
     sigset_t pending;
-    sigemptyset(&interrupt);
-    sigaddset(&interrupt, SIGINT);
     pthread_sigmask(SIG_BLOCK, &interrupt, &own_mask); /* only what is blocked is shown as pending */
     for (uint32_t i = 0; i < INTERRUPT_PATIENCE_MS; i++) {
         if (sigpending(&pending) != 0 || sigismember(&pending, SIGINT) != 1) {
@@ -125,8 +124,7 @@ int pub_util_create_pid_file(const char *name)
     char command_a[SHELL_COMMAND_SIZE];
     snprintf(command_a, sizeof(command_a), "echo %d > /tmp/%s.pid", pid, name);
     /* A process without a pid file serves all the same. */
-    const int ignored = pub_util_run_shell(command_a);
-    static_cast<void>(ignored);
+    pub_util_run_shell(command_a);
     PUB_LOG(g_pub_util_log, "PID of %s: %d", name, pid);
     return PUB_ERR_NONE;
 }

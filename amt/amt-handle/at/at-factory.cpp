@@ -5,7 +5,6 @@
 #include <stdlib.h>
 
 #include "amt/amt-handle/at/at-operand.h"
-#include "amt/amt-handle/at/at-reply.h"
 #include "amt/amt-handle/channel/factory-file.h"
 #include "amt/amt-handle/request/handshake-permission.h"
 #include "amt/amt-handle/request/identity-store.h"

@@ -4,7 +4,6 @@
 #include <stdlib.h>
 
 #include "amt/amt-handle/at/at-operand.h"
-#include "amt/amt-handle/at/at-reply.h"
 #include "amt/amt-log.h"
 #include "platform/include/ldt.h"
 #include "pub/error.h"

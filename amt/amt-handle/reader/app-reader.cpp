@@ -5,9 +5,8 @@
 #include <unistd.h>
 
 #include "amt/amt-handle/channel/context.h"
-#include "amt/amt-handle/channel/service-process.h"
+#include "amt/amt-handle/channel/process-end.h"
 #include "amt/amt-handle/reader/dispatch.h"
-#include "amt/amt-handle/reader/line-reader.h"
 #include "amt/amt-log.h"
 #include "pub/error.h"
 

@@ -4,12 +4,11 @@
 
 #include "amt/amt-handle/at/at-command.h"
 #include "amt/amt-handle/channel/context.h"
+#include "amt/amt-handle/channel/process-end.h"
 #include "amt/amt-handle/channel/reply.h"
-#include "amt/amt-handle/channel/service-process.h"
 #include "amt/amt-handle/handshake.h"
 #include "amt/amt-handle/reader/dispatch.h"
 #include "amt/amt-handle/reader/identity-write.h"
-#include "amt/amt-handle/reader/line-reader.h"
 #include "amt/amt-log.h"
 #include "pub/error.h"
 

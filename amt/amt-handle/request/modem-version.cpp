@@ -1,4 +1,4 @@
-#include "amt/amt-handle/request/modem-version.h"
+#include "amt/amt-handle/request/version.h"
 
 #include <string.h>
 #include <string_view>

@@ -4,7 +4,6 @@
 #include "amt/amt-command.h"
 #include "amt/amt-handle/channel/reply.h"
 #include "amt/amt-handle/request/ap-version.h"
-#include "amt/amt-handle/request/modem-version.h"
 #include "amt/amt-packet.h"
 #include "pub/error.h"
 
