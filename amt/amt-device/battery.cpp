@@ -4,7 +4,6 @@
 
 #include "amt/amt-atom.h"
 #include "amt/amt-command.h"
-#include "amt/amt-device/command.h"
 #include "amt/amt-device/device-file.h"
 #include "amt/amt-device/device-request.h"
 #include "amt/amt-handle/channel/factory-file.h"

@@ -1,4 +1,4 @@
-#include "amt/amt-device/command.h"
+#include "amt/amt-device/device-file.h"
 
 #include <errno.h>
 #include <string.h>
@@ -26,10 +26,4 @@ int amt_device_do_command(const char *command)
                      errno, strerror(errno));
     }
     return PUB_ERR_FAIL;
-}
-
-void amt_device_run(const char *command)
-{
-    const int ignored = pub_util_run_shell(command);
-    static_cast<void>(ignored);
 }

@@ -4,7 +4,7 @@
 
 #include "amt/amt-log.h"
 
-/* Kernel files that hold one decimal number. Failures are told from the place. */
+/* Kernel files that hold one decimal number, whose failures are told from the place, and shell commands. */
 
 /*
  * Reads the number at the start of the file. Returns 0, or PUB_ERR_FILE after the error line and the line of
@@ -20,3 +20,10 @@ int amt_device_file_read_int(const char *path, int32_t *value_ptr,
  */
 int amt_device_file_write_int(const char *path, int32_t value,
                               const pub_log_place_st &place = g_amt_device_log);
+
+/*
+ * Runs a command by the platform's shell and waits for its end, however long it takes; at once again when it
+ * fails, five times at most. Logs every failed attempt, or that it succeeded. Returns 0, or PUB_ERR_FAIL after
+ * the fifth failure.
+ */
+int amt_device_do_command(const char *command);

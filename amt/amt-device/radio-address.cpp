@@ -5,7 +5,6 @@
 
 #include "amt/amt-atom.h"
 #include "amt/amt-command.h"
-#include "amt/amt-device/command.h"
 #include "amt/amt-device/device-request.h"
 #include "amt/amt-device/radio-step.h"
 #include "amt/amt-handle/channel/factory-file.h"
@@ -15,6 +14,7 @@
 #include "platform/include/ldt.h"
 #include "pub/error.h"
 #include "pub/file/file.h"
+#include "pub/util/process.h"
 
 namespace {
 
@@ -30,7 +30,7 @@ void expose(const char *folder)
 {
     char command_a[COMMAND_SIZE];
     snprintf(command_a, sizeof(command_a), "chmod -R 555 %s", folder);
-    amt_device_run(command_a);
+    pub_util_run_shell(command_a);
     PUB_LOG(g_amt_device_log, "path = %s change to chmod -R 555", folder);
 }
 
@@ -166,8 +166,12 @@ int operate(const radio_st &radio, int32_t operation, const amt_buf_st *req_ptr,
     }
 }
 
-int serve(const radio_st &radio, uint32_t channel, const amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
+int serve(const radio_st &radio, uint32_t channel, const amt_buf_st *req_ptr, amt_buf_st *rsp_ptr,
+          const pub_log_place_st &place = g_amt_device_log)
 {
+    if (amt_reply_enter(place, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+        return PUB_ERR_PARAM;
+    }
     amt_reply_start(rsp_ptr, radio.m_rsp_id);
     const int32_t operation = amt_packet_get_int(req_ptr->m_buf_a, radio.m_operation_atom);
     PUB_LOG(g_amt_device_log, "%s op_type:%d", radio.m_check_step.m_handler_ptr, operation);
@@ -193,16 +197,10 @@ uint32_t amt_radio_address_get(const amt_buf_st *req_ptr, uint8_t atom_id, char 
 
 int amt_device_bt_address(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    if (amt_reply_enter(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
-        return PUB_ERR_PARAM;
-    }
     return serve(BT_RADIO, channel, req_ptr, rsp_ptr);
 }
 
 int amt_device_wifi_address(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    if (amt_reply_enter(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
-        return PUB_ERR_PARAM;
-    }
     return serve(WIFI_RADIO, channel, req_ptr, rsp_ptr);
 }

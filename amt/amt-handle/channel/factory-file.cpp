@@ -45,8 +45,7 @@ void amt_factory_file_sync()
     const int saved_errno = errno;
     for (int i = 0; i < FLUSH_COUNT; i++) {
         pub_util_sleep_ms(FLUSH_PAUSE_MS);
-        const int ignored_status = pub_util_run_shell(SYNC_COMMAND);
-        static_cast<void>(ignored_status);
+        pub_util_run_shell(SYNC_COMMAND);
     }
     errno = saved_errno;
 }

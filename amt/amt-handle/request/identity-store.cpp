@@ -45,8 +45,7 @@ void run_on_folder(const char *verb, const char *path)
 {
     char command_a[FOLDER_COMMAND_SIZE];
     snprintf(command_a, sizeof(command_a), "%s %s", verb, path);
-    const int ignored_status = pub_util_run_shell(command_a);
-    static_cast<void>(ignored_status);
+    pub_util_run_shell(command_a);
 }
 
 } // namespace
