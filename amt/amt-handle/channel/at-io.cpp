@@ -103,34 +103,28 @@ int reread_after_reopen(char *buf, uint32_t length, ssize_t *count_ptr)
     return *count_ptr > 0 ? PUB_ERR_NONE : PUB_ERR_FAIL;
 }
 
-/* The error line of the switch-off, which always names the public operation. */
-int fail_switch_off(int line, int error_code)
-{
-    return pub_log_error({g_amt_handle_log, "disable_unsolicited_code", line}, error_code);
-}
+/* The error lines of the switch-off name the public operation, whichever part has failed. */
+constexpr char SWITCH_OFF[] = "disable_unsolicited_code";
 
 int send_switch_off(int fd)
 {
     const int ready = amt_wait_writable(fd, WAIT_SECONDS * 1000);
     if (ready == 0) {
-        const int status = fail_switch_off(__LINE__, PUB_ERR_TIMEOUT);
-        PUB_LOG(g_amt_handle_log, "wait %d seconds to write time out", WAIT_SECONDS);
-        return status;
+        return pub_log_fail({g_amt_handle_log, SWITCH_OFF}, PUB_ERR_TIMEOUT,
+                            "wait %d seconds to write time out", WAIT_SECONDS);
     }
     if (ready < 0) {
-        pub_log_sys_call(g_amt_handle_log, "select");
-        return fail_switch_off(__LINE__, PUB_ERR_FILE);
+        return pub_log_call_error({g_amt_handle_log, SWITCH_OFF}, "select", PUB_ERR_FILE);
     }
     const ssize_t written = write(fd, UNSOLICITED_OFF, sizeof(UNSOLICITED_OFF) - 1);
     if (written < 0) {
-        pub_log_sys_call(g_amt_handle_log, "write");
-        return fail_switch_off(__LINE__, PUB_ERR_FILE);
+        return pub_log_call_error({g_amt_handle_log, SWITCH_OFF}, "write", PUB_ERR_FILE);
     }
     if (written != static_cast<ssize_t>(sizeof(UNSOLICITED_OFF) - 1)) {
         PUB_LOG(g_amt_handle_log, "WARNING !");
         PUB_LOG(g_amt_handle_log, "write not completed: to write(%zu) != written(%zd)",
                 sizeof(UNSOLICITED_OFF) - 1, written);
-        return fail_switch_off(__LINE__, PUB_ERR_INCOMPLETE);
+        return pub_log_error({g_amt_handle_log, SWITCH_OFF}, PUB_ERR_INCOMPLETE);
     }
     return PUB_ERR_NONE;
 }
@@ -158,8 +152,7 @@ void read_answer_piece(int fd, answer_st *answer_ptr)
     }
     if (count < 0) {
         answer_ptr->m_is_line_lost = errno == EIO;
-        pub_log_sys_call(g_amt_handle_log, "read");
-        answer_ptr->m_status = fail_switch_off(__LINE__, PUB_ERR_FILE);
+        answer_ptr->m_status = pub_log_call_error({g_amt_handle_log, SWITCH_OFF}, "read", PUB_ERR_FILE);
         pub_util_sleep_ms(FAILED_TTY_PAUSE_MS);
     }
 }
@@ -173,7 +166,7 @@ int report_time_out(const timespec &start)
     }
     PUB_LOG(g_amt_handle_log, "read time out: %ld:%ld -> %ld:%ld", static_cast<long>(start.tv_sec),
             start.tv_nsec, static_cast<long>(end.tv_sec), end.tv_nsec);
-    return fail_switch_off(__LINE__, PUB_ERR_FILE);
+    return pub_log_error({g_amt_handle_log, SWITCH_OFF}, PUB_ERR_FILE);
 }
 
 /* Waits for one piece of the answer. Each piece replaces the one before it. */
@@ -188,8 +181,7 @@ answer_st wait_for_answer_piece(int fd)
     } else if (ready == 0) {
         answer.m_status = report_time_out(start);
     } else {
-        pub_log_sys_call(g_amt_handle_log, "select");
-        answer.m_status = fail_switch_off(__LINE__, PUB_ERR_FILE);
+        answer.m_status = pub_log_call_error({g_amt_handle_log, SWITCH_OFF}, "select", PUB_ERR_FILE);
         pub_util_sleep_ms(FAILED_TTY_PAUSE_MS);
     }
     return answer;
@@ -255,7 +247,7 @@ int read_at(char *buf, uint32_t length, int32_t *count_ptr)
 int disable_unsolicited_code(int fd)
 {
     if (fd <= 0) {
-        return fail_switch_off(__LINE__, PUB_ERR_PARAM);
+        return pub_log_error({g_amt_handle_log, SWITCH_OFF}, PUB_ERR_PARAM);
     }
     if (const int status = send_switch_off(fd); status != PUB_ERR_NONE) {
         return status;
@@ -268,7 +260,7 @@ int disable_unsolicited_code(int fd)
             return answer.m_status;
         }
         if (holds_error_result(answer)) {
-            return fail_switch_off(__LINE__, PUB_ERR_FAIL);
+            return pub_log_error({g_amt_handle_log, SWITCH_OFF}, PUB_ERR_FAIL);
         }
     }
 }

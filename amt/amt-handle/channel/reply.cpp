@@ -39,8 +39,12 @@ int check_sender(uint32_t channel, const amt_buf_st *rsp_ptr,
     return pub_log_bad_param(place, {is_no_channel(channel), rsp_ptr == nullptr});
 }
 
-int send_result(uint32_t channel, amt_buf_st *rsp_ptr, uint8_t rsp_id, int32_t code)
+int send_result(uint32_t channel, amt_buf_st *rsp_ptr, uint8_t rsp_id, int32_t code,
+                const pub_log_place_st &place = g_amt_handle_log)
 {
+    if (check_sender(channel, rsp_ptr, place) != PUB_ERR_NONE) {
+        return PUB_ERR_PARAM;
+    }
     amt_reply_start(rsp_ptr, rsp_id);
     amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_RESULT, code);
     return amt_reply_finish(channel, rsp_ptr);
@@ -148,17 +152,11 @@ int amt_handle_send_rsp(uint32_t channel, amt_buf_st *rsp_ptr)
 
 int amt_handle_send_rsp_ok(uint32_t channel, amt_buf_st *rsp_ptr, uint8_t rsp_id)
 {
-    if (check_sender(channel, rsp_ptr) != PUB_ERR_NONE) {
-        return PUB_ERR_PARAM;
-    }
     return send_result(channel, rsp_ptr, rsp_id, 0);
 }
 
 int amt_handle_send_rsp_err(uint32_t channel, amt_buf_st *rsp_ptr, uint8_t rsp_id, int32_t code)
 {
-    if (check_sender(channel, rsp_ptr) != PUB_ERR_NONE) {
-        return PUB_ERR_PARAM;
-    }
     return send_result(channel, rsp_ptr, rsp_id, code);
 }
 
