@@ -46,11 +46,14 @@ handshake_st g_handshake; /* under g_mutex */
 std::atomic<bool> g_is_ac_power;     /* the start was refused because of AC power */
 std::atomic<bool> g_is_property_set; /* once a process */
 
-/* The end may come by a fault on the very thread that holds the lock, and then goes on without. */
+/*
+ * The end may come by a fault on the very thread that holds the lock, and then goes on without. That thread may
+ * not call try_lock, but POSIX lets it ask.
+ */
 bool lock_for_the_end()
 {
     for (int i = 0; i < END_ATTEMPTS; i++) {
-        if (g_mutex.try_lock()) {
+        if (pthread_mutex_trylock(g_mutex.native_handle()) == 0) {
             return true;
         }
         pub_util_sleep_ms(1);
