@@ -8,7 +8,7 @@ import os
 import select
 import termios
 import time
-from typing import Any, Protocol
+from typing import Any, Callable, Protocol, runtime_checkable
 
 import serial
 
@@ -18,6 +18,11 @@ _CHUNK = 4096
 _BUSY = (errno.EBUSY, errno.EAGAIN, errno.EWOULDBLOCK)
 _POLL_SECONDS = 0.05
 _LONGEST_POLL = 0x7FFFFFFF
+
+# Linux gives this control character no meaning: what it holds outlives every process, however it
+# ends, and goes with the device.
+_CONTROLS, _MEMORY = 6, termios.VSWTC
+_OUT_OF_STEP, _NOTHING = b"\x01", b"\0"
 
 
 class Port(Protocol):
@@ -35,6 +40,17 @@ class Port(Protocol):
         """Give the port back."""
 
 
+@runtime_checkable
+class LastingPort(Port, Protocol):
+    """A port that remembers, beyond the process, whether an answer is still to come on it."""
+
+    def left_out_of_step(self) -> bool:
+        """Whether whoever used the port last left it without an answer."""
+
+    def remember(self, out_of_step: bool) -> None:
+        """Keep it in mind; nothing happens where the port cannot."""
+
+
 def _ready(fd: int, event: int, timeout: float) -> bool:
     """Whether the descriptor is ready, or has an error to tell, within ``timeout`` seconds."""
     poll = select.poll()
@@ -49,20 +65,27 @@ def _hung_up(fd: int) -> bool:
     return bool(poll.poll(0))
 
 
-def _write_all(fd: int, data: bytes, timeout: float, name: str) -> None:
-    """Write with a deadline, whether the descriptor blocks or not."""
+def _write_all(fd: int, data: bytes, timeout: float, name: str, check: Callable[[], None]
+               ) -> None:
+    """Write with a deadline, whether the descriptor blocks or not; ``check`` may end it."""
     end = time.monotonic() + timeout
     blocking = os.get_blocking(fd)
     os.set_blocking(fd, False)
     try:
         while data:
-            if not _ready(fd, select.POLLOUT, end - time.monotonic()):
-                _drop_output(fd)
+            check()
+            left = end - time.monotonic()
+            if not _ready(fd, select.POLLOUT, min(left, _POLL_SECONDS)):
+                if left > _POLL_SECONDS:
+                    continue
                 raise _not_taken(name, timeout)
             try:
                 data = data[os.write(fd, data):]
             except BlockingIOError:
                 continue
+    except BaseException:
+        _drop_output(fd)
+        raise
     finally:
         os.set_blocking(fd, blocking)
 
@@ -79,7 +102,21 @@ def _not_taken(name: str, timeout: float) -> NoAnswer:
     return NoAnswer(f"{name}: nobody takes what is sent, within {timeout:g} s")
 
 
-class FdPort:
+def _nothing() -> None:
+    """A writing that nobody ends."""
+
+
+class _Waiting:
+    """A port that does not wait blindly while it writes.
+
+    ``check`` is called again and again while the peer does not take what is sent; what it raises
+    ends that.
+    """
+
+    check: Callable[[], None] = staticmethod(_nothing)
+
+
+class FdPort(_Waiting):
     """A port over an open descriptor, such as the master side of a pseudo-terminal.
 
     The descriptor stays the caller's unless ``owned``.
@@ -105,7 +142,7 @@ class FdPort:
     def write(self, data: bytes, timeout: float) -> None:
         """As in ``Port``."""
         try:
-            _write_all(self._fd, data, timeout, self.name)
+            _write_all(self._fd, data, timeout, self.name, self.check)
         except OSError as error:
             raise NoPort(f"{self.name} went away: {error.strerror}") from error
 
@@ -120,7 +157,7 @@ class FdPort:
             self._fd, self._owned = -1, False
 
 
-class SerialPort:
+class SerialPort(_Waiting):
     """A port opened by its pySerial URL, for this process alone."""
 
     def __init__(self, url: str, baud: int = 115200) -> None:
@@ -174,7 +211,7 @@ class SerialPort:
         self._check_open()
         try:
             if self._fd is not None:
-                _write_all(self._fd, data, timeout, f"port {self.name}")
+                _write_all(self._fd, data, timeout, f"port {self.name}", self.check)
             else:
                 self._serial.write_timeout = timeout
                 self._serial.write(data)
@@ -186,6 +223,25 @@ class SerialPort:
     def is_gone(self) -> bool:
         """Whether the other end has hung up; False for a port that cannot tell."""
         return self._fd is not None and _hung_up(self._fd)
+
+    def left_out_of_step(self) -> bool:
+        """As in ``LastingPort``; the terminal remembers it."""
+        try:
+            return (self._fd is not None
+                    and termios.tcgetattr(self._fd)[_CONTROLS][_MEMORY] == _OUT_OF_STEP)
+        except termios.error:
+            return False
+
+    def remember(self, out_of_step: bool) -> None:
+        """As in ``LastingPort``."""
+        if self._fd is None:
+            return
+        try:
+            attributes = termios.tcgetattr(self._fd)
+            attributes[_CONTROLS][_MEMORY] = _OUT_OF_STEP if out_of_step else _NOTHING
+            termios.tcsetattr(self._fd, termios.TCSANOW, attributes)
+        except termios.error:
+            pass  # no terminal, or one that went away: a new one has no past
 
     def close(self) -> None:
         """As in ``Port``."""

@@ -90,7 +90,8 @@ def run(context: click.Context, plan: Path, said: Sequence[str], inputs: Path | 
                      "" if no_records else checked_url(store_url), station, operator)
     read = load_plan(plan, settings.chosen_channel)
     _check_wishes(read, settings, wishes)
-    outputs = Outputs({"junit": junit, "csv": csv, "html": html})
+    outputs = Outputs({"junit": junit, "csv": csv, "html": html},
+                      read=[plan] if inputs is None else [plan, inputs])
     try:
         context.exit(_run(settings, read, wishes, outputs))
     finally:
@@ -210,14 +211,14 @@ def _view(settings: Settings) -> Any:
 def _finish(settings: Settings, runner: Runner, document: Mapping[str, Any],
             files: Sequence[RecordFile], outputs: Outputs) -> int:
     status = runner.exit_status
-    if settings.json:
-        console.data_json(document)
     if runner.record_problem is not None:
-        # Rather here than nowhere.
+        # Rather here than nowhere, and before standard output: that may go to the same full disk.
         print(runner.record.text(), end="", file=sys.stderr, flush=True)
         console.complain(printable(str(runner.record_problem)))
     elif files:
         console.talk(f"record: {printable(str(files[0].path))}")
+    if settings.json:
+        console.data_json(document)
     try:
         outputs.write([document])
     except StationError as error:

@@ -5,7 +5,7 @@ from __future__ import annotations
 import time
 
 from amt_line.run.stop import SLICE, Stop
-from amt_station.port import Port
+from amt_station.port import LastingPort, Port
 
 
 class StoppablePort:
@@ -15,6 +15,9 @@ class StoppablePort:
         self.name = port.name
         self._port = port
         self._stop = stop
+        if hasattr(port, "check"):
+            # A write may wait as long as a read.
+            port.check = stop.check
 
     def read(self, timeout: float) -> bytes:
         """As in ``Port``."""
@@ -35,6 +38,15 @@ class StoppablePort:
         """Whether the other end has hung up; False where a port cannot tell."""
         look = getattr(self._port, "is_gone", None)
         return look is not None and bool(look())
+
+    def left_out_of_step(self) -> bool:
+        """As in ``LastingPort``."""
+        return isinstance(self._port, LastingPort) and self._port.left_out_of_step()
+
+    def remember(self, out_of_step: bool) -> None:
+        """As in ``LastingPort``."""
+        if isinstance(self._port, LastingPort):
+            self._port.remember(out_of_step)
 
     def close(self) -> None:
         """As in ``Port``."""

@@ -3,7 +3,7 @@
 from __future__ import annotations
 
 import time
-from contextlib import ExitStack
+from contextlib import ExitStack, suppress
 from typing import Any, Mapping, Protocol
 
 from amt_line.plan.filled import Filled, Unfit, filled
@@ -105,8 +105,8 @@ class StepRun:
 
     def _attempts(self, variables: Mapping[str, Scalar]) -> None:
         for number in range(1, self._step.retries + 2):
-            if number > 1 and not self._again(number):
-                break
+            if number > 1:
+                self._again(number)
             self._document["attempts"] = number
             self._try(variables)
             self._keep_exchanges(number)
@@ -116,17 +116,14 @@ class StepRun:
     def _tell(self, event: str, **values: Any) -> None:
         self._stream.send(event, number=self._document["number"], **values)
 
-    def _again(self, number: int) -> bool:
-        """Wait before the next attempt; False when the run ends meanwhile."""
-        try:
+    def _again(self, number: int) -> None:
+        """Wait before the next attempt, which tells it when the run ends meanwhile."""
+        with suppress(Ended):
             self._stop.sleep(self._step.retry_delay)
-        except Ended:
-            return False
         earlier = {"attempt": number - 1, "verdict": self._document["verdict"],
                    "reason": self._document["reason"]}
         self._document["earlier"].append(earlier)
         self._tell("step-again", attempt=number, reason=earlier["reason"])
-        return True
 
     def _try(self, variables: Mapping[str, Scalar]) -> None:
         """One attempt, whatever comes of it."""
@@ -136,8 +133,7 @@ class StepRun:
             self._document["forced"] = list(whole.prepared.forced) if whole.prepared else []
             outcome = attempt(whole, self._tools())
             self._take(outcome)
-            if self._step.reconnect is not None:
-                self._connection.reconnect(self._step.reconnect)
+            self._come_back()
         except Ended as error:
             self._end_by(error)
         except StationError as error:
@@ -151,6 +147,16 @@ class StepRun:
         status = self._stop_status() if isinstance(error, Aborted) else EXIT_NO_ANSWER
         self._set(Verdict.ERROR, str(error), status)
         self.obstacle = str(error)
+
+    def _come_back(self) -> None:
+        """Behind a step that makes the port go away, wait for it once."""
+        if self._step.reconnect is None:
+            return
+        try:
+            self._connection.reconnect(self._step.reconnect)
+        except NoPort as error:
+            self._set(Verdict.ERROR, str(error), error.exit_status)
+            self.obstacle = str(error)
 
     def _stop_status(self) -> int:
         how = self._stop.requested
