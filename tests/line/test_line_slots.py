@@ -6,6 +6,7 @@ import subprocess
 import sys
 import threading
 import time
+from datetime import datetime, timedelta, timezone
 from pathlib import Path
 from typing import Any
 
@@ -256,3 +257,24 @@ def test_nothing_is_left_behind(tmp_path: Path) -> None:
         bench.sockets["A"].plug(battery(15))
         assert bench.join() == 0
     assert threading.active_count() <= before
+
+
+def test_a_clock_that_is_set_back(tmp_path: Path, records: Path, monkeypatch: Any) -> None:
+    """An hour at every look: durations, order and verdict do not come from it."""
+    moment = [datetime(2026, 10, 25, 12, tzinfo=timezone.utc)]
+
+    class Clock:
+        @staticmethod
+        def now(_zone: Any) -> datetime:
+            moment[0] -= timedelta(hours=1)
+            return moment[0]
+
+    monkeypatch.setattr("amt_line.run.clock.datetime", Clock)
+    with Bench(tmp_path, "[[step]]\nwait = 0.2\n" + ADC, once=True) as bench:
+        bench.sockets["A"].plug(battery(15))
+        assert bench.join() == 0
+    document = bench.record(bench.wait("run-ended")["run"])
+    assert document["began"] > document["ended"], "so the clock says"
+    assert 0.2 <= document["steps"][0]["seconds"] <= document["seconds"] < PATIENCE
+    assert all(exchange["seconds"] >= 0 for exchange in document["steps"][1]["exchanges"])
+    assert document["verdict"] == "PASS"
