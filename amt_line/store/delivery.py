@@ -19,14 +19,14 @@ from amt_line.store.files import file_names, in_order
 from amt_line.store.gap import deliver, find_gap
 from amt_line.store.mark import Mark
 from amt_line.store.problems import BadRecord, StoreAway, StoreProblem
-from amt_line.store.url import shown_url
+from amt_line.store.url import shown_url, sqlite_path
 
 if TYPE_CHECKING:
     from amt_line.store.store import Store
 
 _LOG = logging.getLogger("amt_line")
 
-PATIENCE = 6.0
+PATIENCE = 8.0
 _FIRST_PAUSE = 0.5
 _LONGEST_PAUSE = 15.0
 _NOTE_SECONDS = 60.0
@@ -68,7 +68,9 @@ class Delivery:
         self._bad: dict[str, str] = {}
         self._because = self._since = ""
         self._failures = 0
-        self._closing = self._last_try = self._given_up = self._prepared = False
+        self._closing = self._last_try = self._given_up = False
+        self._prepared = self._ended = False
+        self._stage = 0
         self._suspect: set[str] = set()
         self._next_note = 0.0
         self._store: Store | None = None
@@ -102,7 +104,7 @@ class Delivery:
             return dict(self._bad)
 
     def close(self, patience: float = PATIENCE) -> None:
-        """Deliver what is left as far as the database answers, for so many seconds at most.
+        """Deliver what is left as far as the database answers, with so many seconds of patience.
 
         What then is left is delivered by whoever opens the directory next.
         """
@@ -111,11 +113,17 @@ class Delivery:
             self._changed.notify_all()
             # Importing the database library is no matter of the database.
             self._changed.wait_for(lambda: self._prepared)
-        self._thread.join(patience)
-        with self._changed:
+            self._wait_for_end(patience)
             self._given_up = True
             if self._waiting and not self._because:
                 self._because = f"{shown_url(self.url)}: the time for it was over"
+
+    def _wait_for_end(self, patience: float) -> None:
+        """Opening, comparing and delivering may take so long each."""
+        stage = -1
+        while not self._ended and stage != self._stage:
+            stage = self._stage
+            self._changed.wait_for(lambda: self._ended or self._stage != stage, patience)
 
     def lines(self) -> list[str]:
         """What the person is to be told at the end; nothing when all is well."""
@@ -143,12 +151,16 @@ class Delivery:
                 self._because = self._because or "of a defect of the station itself"
         finally:
             with self._changed:
-                self._prepared = True
+                self._prepared = self._ended = True
                 self._changed.notify_all()
 
     def _prepare(self) -> None:
         try:
             import amt_line.store.store  # noqa: F401  pylint: disable=unused-import
+
+            path = sqlite_path(self.url)
+            if path is not None and not path.exists():
+                import alembic.command  # noqa: F401  pylint: disable=unused-import
         finally:
             with self._changed:
                 self._prepared = True
@@ -175,6 +187,7 @@ class Delivery:
                 from amt_line.store.store import Store
 
                 self._store = Store.open(self.url)
+                self._get_on()
             if not self._compared:
                 self._compare(self._store)
             self._deliver_waiting(self._store)
@@ -198,6 +211,13 @@ class Delivery:
             names = {*gap.names, *self._waiting}.difference(self._bad)
             self._waiting = dict.fromkeys(in_order(self.directory, names))
             self._found, self._known, self._compared = set(), 0, True
+        self._get_on()
+
+    def _get_on(self) -> None:
+        """Something is done that takes time, and whoever waits may wait for the next."""
+        with self._changed:
+            self._stage += 1
+            self._changed.notify_all()
 
     def _deliver_waiting(self, store: Store) -> None:
         while True:
