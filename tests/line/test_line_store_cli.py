@@ -295,6 +295,6 @@ def test_the_guide_knows_what_is_said() -> None:
     for words in ("missing in the database", "differs: the database has an earlier state of this "
                   "run", "differs: the database has another record of this run",
                   "in the database, but not in the directory any more", "no record of a run",
-                  "AMT_STATION_STORE", "3 records are still to be delivered: postgresql+psycopg2://",
+                  "AMT_STATION_STORE", "3 records are still to be delivered: postgresql",
                   *METADATA.tables, VERSION_TABLE):
         assert words in chapter, words
