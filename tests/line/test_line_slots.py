@@ -126,6 +126,22 @@ def test_a_port_that_somebody_else_holds(tmp_path: Path) -> None:
     peer.close()
 
 
+def test_somebody_who_reads_along_is_named_too(tmp_path: Path, monkeypatch: Any) -> None:
+    monkeypatch.setattr("amt_line.run.presence._PSEUDO_TERMINALS", "/none")
+    peer = Peer(EnvelopeDecoder())
+    with subprocess.Popen([sys.executable, "-c", HOLD.replace("fcntl.flock(port, fcntl.LOCK_EX)",
+                                                              ""), peer.path],
+                          stdin=subprocess.PIPE, stdout=subprocess.PIPE) as other:
+        assert other.stdout is not None and other.stdout.readline() == b"held\n"
+        with Bench(tmp_path, ADC, once=True, ports={"A": peer.path}) as bench:
+            held = bench.wait("slot-state", state="held")
+            assert f"({other.pid}) has it open" in held["text"]
+            other.communicate(timeout=PATIENCE)
+            peer.script = battery(15)
+            assert bench.join() == 0
+    peer.close()
+
+
 def test_a_port_that_stays_when_its_handset_goes(tmp_path: Path) -> None:
     peer = Peer(EnvelopeDecoder())
     peer.script = battery(15)
@@ -184,6 +200,35 @@ def test_a_record_that_cannot_be_begun(tmp_path: Path, records: Path) -> None:
         bench.sockets["A"].pull()
         bench.sockets["A"].plug(battery(15))
         bench.wait("run-ended", verdict="PASS")
+
+
+def test_once_ends_also_where_no_run_could_begin(tmp_path: Path) -> None:
+    with Bench(tmp_path, ADC, once=True) as bench:
+        bench.records.write_text("no directory", encoding="utf-8")
+        bench.sockets["A"].plug(battery(15))
+        assert bench.join() == 7
+    assert list(bench.found("slot-state", state="defect")) and bench.verdicts("A") == []
+
+
+def test_a_defect_inside_of_a_run_is_shown_until_the_next_handset(tmp_path: Path,
+                                                                  monkeypatch: Any) -> None:
+    monkeypatch.setenv("XDG_STATE_HOME", str(tmp_path / "state"))
+    failures = [ZeroDivisionError("nobody thought of it")]
+
+    def failing(*_arguments: Any) -> None:
+        if failures:
+            raise failures.pop()
+
+    bench = Bench(tmp_path, ADC)
+    monkeypatch.setattr("amt_line.run.step_run.StepRun._fill", failing)
+    with bench:
+        bench.sockets["A"].plug(battery(15))
+        assert "ZeroDivisionError" in bench.wait("slot-state", state="defect")["text"]
+        ended = bench.wait("run-ended")
+        assert (ended["verdict"], ended["exit_status"]) == ("ERROR", 7)
+        bench.sockets["A"].pull()
+        after = bench.wait("slot-state", state="verdict")
+        assert after["text"] == f"no handset at {tmp_path}/A"
 
 
 # the end
