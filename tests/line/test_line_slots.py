@@ -85,7 +85,10 @@ def test_a_handset_that_is_pulled_out(tmp_path: Path, records: Path, step: str) 
         assert ended["verdict"] == "ABORTED" and ended["reason"].endswith("was pulled out")
         document = bench.record(ended["run"])
         assert (document["state"], document["verdict"]) == ("aborted", "ABORTED")
-        assert [item["verdict"] for item in document["steps"]] == ["error", "skipped", "skipped"]
+        first, *rest = [item["verdict"] for item in document["steps"]]
+        # Between two attempts the verdict is that of the one before.
+        assert first == "error" or (first == "fail" and "retry" in step)
+        assert rest == ["skipped", "skipped"]
         assert "AT+LAST" not in script.asked and not bench.desk.questions()
         bench.sockets["A"].plug(battery(15))
         bench.wait("run-began", 2)
