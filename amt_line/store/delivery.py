@@ -62,6 +62,7 @@ class Delivery:
         self._mark = Mark(url, directory)
         self._changed = threading.Condition()
         self._waiting: dict[str, None] = {}
+        self._at_hand: str | None = None
         # What lies there already, until the database has said what it has of it.
         self._found = set(_files_in(directory))
         self._known = self._mark.read()
@@ -94,7 +95,7 @@ class Delivery:
         """How it stands."""
         with self._changed:
             missed = max(0, len(self._found) - self._known)
-            new = len(self._waiting.keys() - self._found)
+            new = len({*self._waiting, *filter(None, [self._at_hand])} - self._found)
             return Standing(missed + new, self._since, self._because)
 
     @property
@@ -115,7 +116,7 @@ class Delivery:
             self._changed.wait_for(lambda: self._prepared)
             self._wait_for_end(patience)
             self._given_up = True
-            if self._waiting and not self._because:
+            if (self._waiting or self._at_hand) and not self._because:
                 self._because = f"{shown_url(self.url)}: the time for it was over"
 
     def _wait_for_end(self, patience: float) -> None:
@@ -220,19 +221,32 @@ class Delivery:
             self._changed.notify_all()
 
     def _deliver_waiting(self, store: Store) -> None:
-        while True:
-            with self._changed:
-                name = next(iter(self._waiting), None)
-                if name is None or self._given_up:
-                    return
+        while (name := self._next()) is not None:
             begin = time.monotonic()
-            self._deliver(store, name)
+            try:
+                self._deliver(store, name)
+            except StoreProblem:
+                with self._changed:
+                    self._waiting = {name: None, **self._waiting}
+                raise
+            finally:
+                with self._changed:
+                    self._at_hand = None
             with self._changed:
-                del self._waiting[name]
                 self._because = self._since = ""
                 if self._waiting:
                     # However much there is to be made up for, the runs have the processor first.
                     self._changed.wait_for(lambda: self._closing, time.monotonic() - begin)
+
+    def _next(self) -> str | None:
+        """Take the next file. Its run may go on meanwhile: then it is handed on once more."""
+        with self._changed:
+            name = next(iter(self._waiting), None)
+            if name is None or self._given_up:
+                return None
+            del self._waiting[name]
+            self._at_hand = name
+            return name
 
     def _deliver(self, store: Store, name: str) -> None:
         """Deliver a file, or find that it is no record."""
