@@ -49,7 +49,8 @@ at = "AT+CGMM"
 """
 # Every so many runs of a slot the handset is out of its limits, or pulled out in the middle.
 FAILS_EVERY, PULLED_EVERY = 10, 25
-GOOD_ADC, BAD_ADC, SILENT_ADC = 3700, 50, 0
+SILENT_ADC = 0
+ADC = {"PASS": 3700, "FAIL": 50, "ABORTED": SILENT_ADC}
 BATTERY = 224
 # How much more the station may hold in the last quarter of the runs than in the second.
 RESIDENT_BOUND_KIB = 4096
@@ -98,6 +99,8 @@ class Hands:
         self._handsets: dict[str, Handset] = {}
         self._wake_read, self._wake_write = os.pipe()
         self._done: list[str] = []
+        # The runs with another verdict than their handset deserves.
+        self.wrong: list[str] = []
         self._thread = threading.Thread(target=self._serve, daemon=True)
 
     @property
@@ -114,7 +117,11 @@ class Hands:
     def __call__(self, event: Mapping[str, Any]) -> None:
         """Take the next event."""
         if event["event"] == "run-ended":
-            self._done.append(str(event["slot"]))
+            slot = str(event["slot"])
+            if event["verdict"] != _expected(self._counts[slot]):
+                self.wrong.append(f"slot {slot}, run {self._counts[slot]}: {event['verdict']}, "
+                                  f"{event['reason']}")
+            self._done.append(slot)
             os.write(self._wake_write, b"x")
 
     def _plug(self, slot: str) -> None:
@@ -122,10 +129,8 @@ class Hands:
             return
         self._left -= 1
         self._counts[slot] += 1
-        count = self._counts[slot]
-        adc = GOOD_ADC if count % FAILS_EVERY else BAD_ADC
         self._handsets[slot] = Handset(self._links[slot],
-                                       adc if count % PULLED_EVERY else SILENT_ADC)
+                                       ADC[_expected(self._counts[slot])])
 
     def _pull(self, slot: str) -> None:
         handset = self._handsets.pop(slot, None)
@@ -156,6 +161,13 @@ class Hands:
             self._pull(slot)
         os.close(self._wake_read)
         os.close(self._wake_write)
+
+
+def _expected(count: int) -> str:
+    """The verdict of a slot's run of this number."""
+    if count % PULLED_EVERY == 0:
+        return "ABORTED"
+    return "FAIL" if count % FAILS_EVERY == 0 else "PASS"
 
 
 @dataclass(frozen=True)
@@ -249,6 +261,7 @@ def soak(runs: int, folder: Path, progress: Progress | None = None) -> Result:
     # What the database has not had the time for.
     Delivery(url, folder / "records").close(DELIVERY_SECONDS)
     _check_records(result, folder / "records", url, told)
+    result.problems += hands.wrong[:SLOTS]
     if sum(board.counts.values()) != runs:
         result.problems.append(f"the board counts {board.counts}")
     result.judge()
@@ -297,5 +310,5 @@ def main() -> int:
     progress.close()
     print(result)
     print("\n".join(f"FAIL: {problem}" for problem in result.problems) if result.problems
-          else "PASS: nothing grew, and no record is lost")
+          else "PASS: nothing grew, no verdict is wrong, no record is lost")
     return 1 if result.problems else 0

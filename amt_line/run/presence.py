@@ -2,6 +2,7 @@
 
 from __future__ import annotations
 
+import os
 import time
 from dataclasses import dataclass
 from typing import Callable
@@ -10,6 +11,7 @@ from amt_line.run.plug import Plug, Seen
 from amt_line.run.port import StoppablePort
 from amt_line.run.stop import Stop
 from amt_station.errors import PortBusy, Refused, StationError
+from amt_station.found_ports import holders
 from amt_station.link import Link
 from amt_station.port import Port
 from amt_station.requests.model import Channel
@@ -18,6 +20,8 @@ from amt_station.requests.model import Channel
 Tell = Callable[[bool, str], None]
 
 HELD_AGAIN_SECONDS = 0.5
+# At the other end of a terminal of this kind there is a program, which has it open by right.
+_PSEUDO_TERMINALS = "/dev/pts/"
 
 
 @dataclass(frozen=True)
@@ -96,7 +100,9 @@ class Presence:
             port.close()
             raise
         port.close()
-        self._tell(False, f"no handset answers at {seen.url}")
+        others = _holders(seen.url)
+        self._tell(bool(others), f"port {seen.url} is busy: {others} has it open" if others
+                   else f"no handset answers at {seen.url}")
         stop.sleep(self._patience.look)
         return None
 
@@ -144,3 +150,11 @@ class Presence:
             return self.answers(port, stop)
         finally:
             port.close()
+
+
+def _holders(url: str) -> str:
+    """Who else reads what arrives at a port, although the port is not kept for them."""
+    path = os.path.realpath(url)
+    if not os.path.exists(path) or path.startswith(_PSEUDO_TERMINALS):
+        return ""
+    return ", ".join(f"{holder.command} ({holder.pid})" for holder in holders(path))

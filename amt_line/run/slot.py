@@ -74,6 +74,8 @@ class Slot:
         self.runs = 0
         # When the first run that was no pass ended, and its status.
         self.first_failure: tuple[float, int] | None = None
+        # Whether a handset has had its turn, also one whose run could not even begin.
+        self._had_turn = False
         self._plug = plug
         self._supply = supply
         self._shop = shop
@@ -104,7 +106,7 @@ class Slot:
         """Test handset after handset until the line ends."""
         why = ""
         try:
-            while not self._shop.ends and not (self._shop.once and self.runs):
+            while not self._shop.ends and not (self._shop.once and self._had_turn):
                 try:
                     self._serve_one()
                 except NoInputs as error:
@@ -127,11 +129,12 @@ class Slot:
                 self._run(arrival, *ready)
         finally:
             arrival.port.close()
-        if not (self._shop.once and self.runs):
-            self._await_next("the next handset is waited for")
+        if not (self._shop.once and self._had_turn):
+            self._await_next()
 
-    def _await_next(self, text: str) -> None:
-        self._state(VERDICT if self.runs else WAITING, text)
+    def _await_next(self) -> None:
+        if self._told[0] != DEFECT:
+            self._state(VERDICT if self.runs else WAITING, "the next handset is waited for")
         if self._mark is not None:
             self._presence.await_gone(self._mark, self._stop)
 
@@ -141,6 +144,9 @@ class Slot:
             raise error
         self._note_status(EXIT_OWN_ERROR)
         self._show_defect(error)
+        self._had_turn = True
+        if self._shop.once:
+            return
         self._stop.sleep(_AFTER_DEFECT_SECONDS)
         if self._mark is not None:
             try:
@@ -222,13 +228,13 @@ class Slot:
 
     def _take(self, runner: Runner, document: Document) -> None:
         self.runs += 1
+        self._had_turn = True
         if document["exit_status"] != 0:
             self._note_status(document["exit_status"])
         if runner.record_problem is not None:
             self._shop.lost_record(runner.record_problem, runner.record.text())
         if runner.defect is not None:
             self._show_defect(runner.defect)
-            self._stop.sleep(_AFTER_DEFECT_SECONDS)
 
     def _note_status(self, status: int) -> None:
         if self.first_failure is None:

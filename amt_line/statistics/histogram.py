@@ -9,7 +9,7 @@ from typing import Sequence
 
 from amt_line.statistics.spread import Numbers
 
-_MOST_BINS = 40
+_MOST_BINS, _FEWEST_BINS = 40, 10
 # Above this many different numbers, how far they lie apart at least says nothing.
 _MOST_DIFFERENT = 1000
 # So many steps of a converter are shown one by one.
@@ -78,8 +78,9 @@ def _edges(numbers: Numbers, first: float, last: float, low: float | None, high:
     shown = numbers.different[bisect_left(numbers.different, first):
                               bisect_right(numbers.different, last)]
     grain = _grain(shown)
-    wanted = max(_wanted_width(numbers), (last - first) / _MOST_BINS)
-    if (last - first) <= grain * _EACH_ITS_BIN:
+    span = last - first
+    wanted = min(max(_wanted_width(numbers), span / _MOST_BINS), span / _FEWEST_BINS)
+    if span <= grain * _EACH_ITS_BIN:
         wanted = grain
     # Numbers that are a limit keep it; with a grain, no number lies on an edge.
     borders = [] if low is None else [low - grain / 2]

@@ -19,14 +19,14 @@ from amt_line.store.files import file_names, in_order
 from amt_line.store.gap import deliver, find_gap
 from amt_line.store.mark import Mark
 from amt_line.store.problems import BadRecord, StoreAway, StoreProblem
-from amt_line.store.url import shown_url
+from amt_line.store.url import shown_url, sqlite_path
 
 if TYPE_CHECKING:
     from amt_line.store.store import Store
 
 _LOG = logging.getLogger("amt_line")
 
-PATIENCE = 6.0
+PATIENCE = 8.0
 _FIRST_PAUSE = 0.5
 _LONGEST_PAUSE = 15.0
 _NOTE_SECONDS = 60.0
@@ -62,13 +62,16 @@ class Delivery:
         self._mark = Mark(url, directory)
         self._changed = threading.Condition()
         self._waiting: dict[str, None] = {}
+        self._at_hand: str | None = None
         # What lies there already, until the database has said what it has of it.
         self._found = set(_files_in(directory))
         self._known = self._mark.read()
         self._bad: dict[str, str] = {}
         self._because = self._since = ""
         self._failures = 0
-        self._closing = self._last_try = self._given_up = self._prepared = False
+        self._closing = self._last_try = self._given_up = False
+        self._prepared = self._ended = False
+        self._stage = 0
         self._suspect: set[str] = set()
         self._next_note = 0.0
         self._store: Store | None = None
@@ -92,7 +95,7 @@ class Delivery:
         """How it stands."""
         with self._changed:
             missed = max(0, len(self._found) - self._known)
-            new = len(self._waiting.keys() - self._found)
+            new = len({*self._waiting, *filter(None, [self._at_hand])} - self._found)
             return Standing(missed + new, self._since, self._because)
 
     @property
@@ -102,7 +105,7 @@ class Delivery:
             return dict(self._bad)
 
     def close(self, patience: float = PATIENCE) -> None:
-        """Deliver what is left as far as the database answers, for so many seconds at most.
+        """Deliver what is left as far as the database answers, with so many seconds of patience.
 
         What then is left is delivered by whoever opens the directory next.
         """
@@ -111,11 +114,17 @@ class Delivery:
             self._changed.notify_all()
             # Importing the database library is no matter of the database.
             self._changed.wait_for(lambda: self._prepared)
-        self._thread.join(patience)
-        with self._changed:
+            self._wait_for_end(patience)
             self._given_up = True
-            if self._waiting and not self._because:
+            if (self._waiting or self._at_hand) and not self._because:
                 self._because = f"{shown_url(self.url)}: the time for it was over"
+
+    def _wait_for_end(self, patience: float) -> None:
+        """Opening, comparing and delivering may take so long each."""
+        stage = -1
+        while not self._ended and stage != self._stage:
+            stage = self._stage
+            self._changed.wait_for(lambda: self._ended or self._stage != stage, patience)
 
     def lines(self) -> list[str]:
         """What the person is to be told at the end; nothing when all is well."""
@@ -143,12 +152,16 @@ class Delivery:
                 self._because = self._because or "of a defect of the station itself"
         finally:
             with self._changed:
-                self._prepared = True
+                self._prepared = self._ended = True
                 self._changed.notify_all()
 
     def _prepare(self) -> None:
         try:
             import amt_line.store.store  # noqa: F401  pylint: disable=unused-import
+
+            path = sqlite_path(self.url)
+            if path is not None and not path.exists():
+                import alembic.command  # noqa: F401  pylint: disable=unused-import
         finally:
             with self._changed:
                 self._prepared = True
@@ -175,6 +188,7 @@ class Delivery:
                 from amt_line.store.store import Store
 
                 self._store = Store.open(self.url)
+                self._get_on()
             if not self._compared:
                 self._compare(self._store)
             self._deliver_waiting(self._store)
@@ -198,21 +212,41 @@ class Delivery:
             names = {*gap.names, *self._waiting}.difference(self._bad)
             self._waiting = dict.fromkeys(in_order(self.directory, names))
             self._found, self._known, self._compared = set(), 0, True
+        self._get_on()
+
+    def _get_on(self) -> None:
+        """Something is done that takes time, and whoever waits may wait for the next."""
+        with self._changed:
+            self._stage += 1
+            self._changed.notify_all()
 
     def _deliver_waiting(self, store: Store) -> None:
-        while True:
-            with self._changed:
-                name = next(iter(self._waiting), None)
-                if name is None or self._given_up:
-                    return
+        while (name := self._next()) is not None:
             begin = time.monotonic()
-            self._deliver(store, name)
+            try:
+                self._deliver(store, name)
+            except StoreProblem:
+                with self._changed:
+                    self._waiting = {name: None, **self._waiting}
+                raise
+            finally:
+                with self._changed:
+                    self._at_hand = None
             with self._changed:
-                del self._waiting[name]
                 self._because = self._since = ""
                 if self._waiting:
                     # However much there is to be made up for, the runs have the processor first.
                     self._changed.wait_for(lambda: self._closing, time.monotonic() - begin)
+
+    def _next(self) -> str | None:
+        """Take the next file. Its run may go on meanwhile: then it is handed on once more."""
+        with self._changed:
+            name = next(iter(self._waiting), None)
+            if name is None or self._given_up:
+                return None
+            del self._waiting[name]
+            self._at_hand = name
+            return name
 
     def _deliver(self, store: Store, name: str) -> None:
         """Deliver a file, or find that it is no record."""

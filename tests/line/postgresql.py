@@ -2,6 +2,7 @@
 
 from __future__ import annotations
 
+import ctypes
 import os
 import shutil
 import signal
@@ -16,6 +17,8 @@ import psycopg2
 
 PASSWORD = "p%ss/w@rd:1"
 _PATIENCE = 300.0
+_LIBC = ctypes.CDLL(None)
+_PR_SET_PDEATHSIG = 1
 _PROGRAMS = sorted(Path("/usr/lib/postgresql").glob("*/bin"), key=lambda path: float(
     path.parent.name))
 
@@ -57,7 +60,8 @@ class Cluster:
                 [self._bin / "postgres", "-D", self.directory / "data", "-k", self.directory,
                  "-c", "listen_addresses=", "-c", "fsync=off", "-c", "shared_buffers=16MB"],
                 stdin=subprocess.DEVNULL, stdout=log, stderr=log, cwd=self.directory,
-                **self._user)
+                # Tests that are killed leave no server behind.
+                preexec_fn=lambda: _LIBC.prctl(_PR_SET_PDEATHSIG, signal.SIGQUIT), **self._user)
         while self._server.poll() is None:
             assert time.monotonic() < deadline, self._log()
             try:

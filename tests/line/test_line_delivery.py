@@ -7,6 +7,7 @@ import random
 import shutil
 import signal
 import sqlite3
+import threading
 from pathlib import Path
 from typing import Any, Iterator
 
@@ -15,7 +16,7 @@ from store_bench import keep, record, runs_of, step, unfinished, until
 from store_process import station
 
 from amt_line.store import Delivery, Search, Store
-from amt_line.store.gap import compare, find_gap, synchronise
+from amt_line.store.gap import compare, deliver, find_gap, synchronise
 
 FAST = (0.01, 0.05)
 
@@ -86,6 +87,28 @@ def test_a_run_left_in_the_middle_is_stored_as_it_is_and_later_whole(folder: Pat
         keep(folder, record(0, run=left["run"]))
         assert len(find_gap(store, folder).names) == 1
         assert synchronise(store, folder).delivered == 1 and compare(store, folder).agree
+
+
+def test_a_run_that_ends_just_while_its_beginning_is_delivered(
+        folder: Path, url: str, monkeypatch: pytest.MonkeyPatch) -> None:
+    at_it, goes_on = threading.Event(), threading.Event()
+
+    def slow(store: Store, directory: Path, name: str) -> bool:
+        new = deliver(store, directory, name)
+        at_it.set()
+        return goes_on.wait(300) and new
+
+    monkeypatch.setattr("amt_line.store.delivery.deliver", slow)
+    document = unfinished()
+    keep(folder, document)
+    delivery = Delivery(url, folder)
+    assert at_it.wait(300)
+    end = record(run=document["run"])
+    delivery.recorded(keep(folder, end))
+    goes_on.set()
+    delivery.close(300)
+    with Store.open(url) as store:
+        assert store.record(end["run"]) == end
 
 
 @pytest.mark.parametrize("text", [b"", b"{", b"\xff\xfe\0", b"[]", b'{"record": 99}',

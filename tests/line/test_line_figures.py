@@ -20,7 +20,7 @@ from amt_line.store.figures import (gather, history_query, parts_of, runs_query,
                                     values_query)
 from amt_line.store.tables import STEP_VALUES, STEPS
 
-DAY = 86_400.0
+_PAGE = 4096
 Record = dict[str, Any]
 
 
@@ -194,8 +194,9 @@ def test_a_damaged_database_is_told(tmp_path: Path) -> None:
     with Store.open(f"sqlite:///{path}") as store:
         store.put_new(map(_text, shift(150)))
     whole = path.read_bytes()
-    values = whole.index(b"a text")
-    path.write_bytes(whole[:values] + bytes(len(whole) - values))
+    # One page with late values: the first rows are good, and then it breaks off.
+    page = whole.rindex(b"step 2namea text") // _PAGE * _PAGE
+    path.write_bytes(whole[:page] + bytes(_PAGE) + whole[page + _PAGE:])
     with Store.open(f"sqlite:///{path}", create=False) as store:
         with pytest.raises(StoreProblem, match="malformed"):
             gather(store)

@@ -17,6 +17,8 @@ from station_peer import ROOT, Peer, Run, station_command, station_environment
 from store_bench import keep, record, runs_of, unfinished, until
 
 from amt_line.store import Search, Store, checked_url, default_store_url, shown_url
+from amt_line.store.migrate import VERSION_TABLE
+from amt_line.store.tables import METADATA
 from amt_line.store.url import without_secrets
 from amt_station.cli.main import run
 from amt_station.errors import UsageProblem
@@ -285,3 +287,14 @@ def test_which_urls_are_taken(tmp_path: Path, monkeypatch: pytest.MonkeyPatch) -
     with pytest.raises(UsageProblem, match="AMT_STATION_STORE: 'oracle://h' is no database"):
         checked_url(None)
     assert checked_url("sqlite:////x") == "sqlite:////x"
+
+
+def test_the_guide_knows_what_is_said() -> None:
+    guide = (ROOT / "docs" / "line.md").read_text(encoding="utf-8")
+    chapter = guide[guide.index("## The store"):]
+    for words in ("missing in the database", "differs: the database has an earlier state of this "
+                  "run", "differs: the database has another record of this run",
+                  "in the database, but not in the directory any more", "no record of a run",
+                  "AMT_STATION_STORE", "3 records are still to be delivered: postgresql",
+                  *METADATA.tables, VERSION_TABLE):
+        assert words in chapter, words

@@ -90,6 +90,14 @@ def test_the_library_is_the_installed_one_and_typed(environment: Path, tmp_path:
     assert where.startswith(os.fspath(environment)) and rest == ["True", "True"], result.stderr
 
 
+def test_the_store_brings_its_migrations(environment: Path, tmp_path: Path) -> None:
+    program = environment / "bin" / "amt-station"
+    for command in ("sync", "check"):
+        result = run(program, "store", command, cwd=tmp_path, XDG_STATE_HOME=str(tmp_path))
+        assert result.returncode == 0, result.stderr
+    assert (tmp_path / "amt-station" / "line.sqlite").stat().st_size > 0
+
+
 def test_pytest_finds_the_plugin(environment: Path, tmp_path: Path, peer: Peer) -> None:
     peer.script = lambda item: [b"\r\nOK\r\n"]
     (tmp_path / "test_line.py").write_text(

@@ -92,7 +92,7 @@ export class Tile {
 
   wordFor(slot, look, running, verdict) {
     if (verdict) return word(`verdict.${look}`);
-    if (look === 'running') return `${currentStep(slot)}/${slot.steps}`;
+    if (look === 'running' && slot.steps) return `${currentStep(slot)}/${slot.steps}`;
     return word(`look.${look}`);
   }
 
