@@ -56,16 +56,22 @@ def found_ports() -> list[FoundPort]:
 def holders(device: str) -> list[Holder]:
     """The processes that have ``device`` open, of those that this user may look at."""
     path = os.path.realpath(device)
+    try:
+        node = os.stat(path)
+    except OSError:
+        return []
     found = []
     for process in Path("/proc").glob("[0-9]*"):
-        if int(process.name) != os.getpid() and _has_open(process, path):
+        if int(process.name) != os.getpid() and _has_open(process, path, node):
             found.append(Holder(int(process.name), _command(process)))
     return sorted(found, key=lambda holder: holder.pid)
 
 
-def _has_open(process: Path, path: str) -> bool:
+def _has_open(process: Path, path: str, node: os.stat_result) -> bool:
+    """Another container may have another device of the same name."""
     try:
-        return any(os.readlink(entry.path) == path for entry in os.scandir(process / "fd"))
+        return any(os.readlink(entry.path) == path and os.path.samestat(os.stat(entry.path), node)
+                   for entry in os.scandir(process / "fd"))
     except OSError:
         return False
 
