@@ -41,8 +41,8 @@ import pytest
 from conftest import HandsetFactory
 from amt_simulator import Handset, Line
 from amt_station import wire
+from amt_station.trace.dialogue import CHANNELS, Dialogue, DialogueError, Step, parse
 from support.channels import AppChannel, Channel, PcChannel, integer, packet
-from support.dialogue import CHANNELS, Dialogue, DialogueError, Step, parse
 from support.modem_desk import FENCE, NOT_SERVED, refusal
 from support.trace import Trace, Wanted, error_line
 from support.traffic import PcTrace

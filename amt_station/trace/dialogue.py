@@ -5,10 +5,10 @@ from dataclasses import dataclass, field
 from pathlib import Path
 from typing import Callable
 
-from amt_simulator.escapes import unescape
 from amt_station import wire
 from amt_station.requests.atom_text import TYPES
 from amt_station.requests.catalogue import command_ids
+from amt_station.wire.escapes import unescape
 
 TOKEN = re.compile(r'(?:[^\s"#]|"(?:[^"\\]|\\.)*")+')
 QUOTED = re.compile(r'"((?:[^"\\]|\\.)*)"')
