@@ -32,6 +32,7 @@ COMMANDS: Mapping[str, Place] = {
     "schema": Place("amt_line.cli.schema:schema", "Print the schema of plans or records"),
     "send": Place("amt_station.cli.send:send", "Send any request and show its answer"),
     "show": Place("amt_line.cli.show:show", "Print the record of a run"),
+    "trace": Place("amt_station.cli.trace:trace", "Show, compare, replay and record traces"),
     "wait": Place("amt_station.cli.ports:wait", "Wait for a port to appear"),
 }
 
