@@ -8,7 +8,7 @@ import os
 import select
 import termios
 import time
-from typing import Any, Protocol
+from typing import Any, Callable, Protocol
 
 import serial
 
@@ -42,20 +42,27 @@ def _ready(fd: int, event: int, timeout: float) -> bool:
     return bool(poll.poll(min(math.ceil(max(0.0, timeout) * 1000), _LONGEST_POLL)))
 
 
-def _write_all(fd: int, data: bytes, timeout: float, name: str) -> None:
-    """Write with a deadline, whether the descriptor blocks or not."""
+def _write_all(fd: int, data: bytes, timeout: float, name: str, check: Callable[[], None]
+               ) -> None:
+    """Write with a deadline, whether the descriptor blocks or not; ``check`` may end it."""
     end = time.monotonic() + timeout
     blocking = os.get_blocking(fd)
     os.set_blocking(fd, False)
     try:
         while data:
-            if not _ready(fd, select.POLLOUT, end - time.monotonic()):
-                _drop_output(fd)
+            check()
+            left = end - time.monotonic()
+            if not _ready(fd, select.POLLOUT, min(left, _POLL_SECONDS)):
+                if left > _POLL_SECONDS:
+                    continue
                 raise _not_taken(name, timeout)
             try:
                 data = data[os.write(fd, data):]
             except BlockingIOError:
                 continue
+    except BaseException:
+        _drop_output(fd)
+        raise
     finally:
         os.set_blocking(fd, blocking)
 
@@ -72,7 +79,21 @@ def _not_taken(name: str, timeout: float) -> NoAnswer:
     return NoAnswer(f"{name}: nobody takes what is sent, within {timeout:g} s")
 
 
-class FdPort:
+def _nothing() -> None:
+    """A writing that nobody ends."""
+
+
+class _Waiting:
+    """A port that does not wait blindly while it writes.
+
+    ``check`` is called again and again while the peer does not take what is sent; what it raises
+    ends that.
+    """
+
+    check: Callable[[], None] = staticmethod(_nothing)
+
+
+class FdPort(_Waiting):
     """A port over an open descriptor, such as the master side of a pseudo-terminal.
 
     The descriptor stays the caller's unless ``owned``.
@@ -98,7 +119,7 @@ class FdPort:
     def write(self, data: bytes, timeout: float) -> None:
         """As in ``Port``."""
         try:
-            _write_all(self._fd, data, timeout, self.name)
+            _write_all(self._fd, data, timeout, self.name, self.check)
         except OSError as error:
             raise NoPort(f"{self.name} went away: {error.strerror}") from error
 
@@ -109,7 +130,7 @@ class FdPort:
             self._fd, self._owned = -1, False
 
 
-class SerialPort:
+class SerialPort(_Waiting):
     """A port opened by its pySerial URL, for this process alone."""
 
     def __init__(self, url: str, baud: int = 115200) -> None:
@@ -163,7 +184,7 @@ class SerialPort:
         self._check_open()
         try:
             if self._fd is not None:
-                _write_all(self._fd, data, timeout, f"port {self.name}")
+                _write_all(self._fd, data, timeout, f"port {self.name}", self.check)
             else:
                 self._serial.write_timeout = timeout
                 self._serial.write(data)

@@ -64,10 +64,15 @@ def _bounds(step: Step, variables: Mapping[str, Scalar]) -> Iterator[Bounds]:
         try:
             yield limit.resolve(variables)
         except ValueError as error:
-            key, _, reason = str(error).partition(": ")
-            known = bool(reason) and " " not in key
-            raise Unfit(f"limits.{limit.name}" + (f".{key}" if known else ""),
-                        reason if known else str(error)) from error
+            raise unfit_limit(limit.name, error) from error
+
+
+def unfit_limit(name: str, error: ValueError) -> Unfit:
+    """What is wrong with a limit; the error's text begins with the key where it is about one."""
+    key, _, reason = str(error).partition(": ")
+    if not reason or " " in key:
+        return Unfit(f"limits.{name}", str(error))
+    return Unfit(f"limits.{name}.{key}", reason)
 
 
 def _prepared(step: Step, text: str, values: Mapping[str, Any], atoms: tuple[str, ...]
@@ -82,7 +87,7 @@ def _prepared(step: Step, text: str, values: Mapping[str, Any], atoms: tuple[str
         return handset.prepared(step.kind.value, text, values, atoms, step.channel, step.force)
     except StationError as error:
         key = {Kind.COMMAND: "with", Kind.REQUEST: "atoms"}.get(step.kind, "at")
-        raise Unfit(key, str(error)) from error
+        raise Unfit(key, handset.in_words_of_a_plan(str(error))) from error
 
 
 def check_with_inputs(plan: Plan, inputs: Mapping[str, Scalar]) -> str:

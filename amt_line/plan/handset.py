@@ -3,7 +3,7 @@
 from __future__ import annotations
 
 import re
-from dataclasses import dataclass
+from dataclasses import dataclass, replace
 from decimal import Decimal
 from functools import lru_cache
 from typing import Any, Mapping
@@ -11,12 +11,14 @@ from typing import Any, Mapping
 from amt_line.plan.measure import Measure
 from amt_station.errors import UsageProblem
 from amt_station.requests import formats
-from amt_station.requests.atom_text import parse_atom
+from amt_station.requests.atom_text import TYPES, parse_atom
 from amt_station.requests.model import RESULT, Channel, Field, Operation, Request
 from amt_station.requests.operations import (Prepared, check_channel, check_value, prepare,
                                              prepare_packet, prepare_text)
 from amt_station.requests.table import (find_command, find_operation, operations,
                                         requests_by_id)
+from amt_station.wire.atoms import Atom
+from amt_station.wire.envelope import LARGEST_REQUEST
 from amt_station.wire.packet import Packet
 
 REPLY = Measure("reply", numeric=False)
@@ -111,10 +113,42 @@ def prepared(kind: str, subject: str, values: Mapping[str, Any], atoms: tuple[st
     if kind == "command":
         return prepare(subject, values, channel, force)
     if kind == "at":
-        return prepare_text(subject, channel, force)
-    number = request_id(subject)
+        return _prepared_text(subject, channel, force)
+    number, forced = request_id(subject), list[str]()
     row = requests_by_id().get(number)
-    return prepare_packet(Packet(number, tuple(parse_atom(row, text) for text in atoms)), channel)
+    packet = Packet(number, tuple(_atom(row, text, force, forced) for text in atoms))
+    return replace(prepare_packet(packet, channel), forced=tuple(forced))
+
+
+def _prepared_text(text: str, channel: Channel, force: bool) -> Prepared:
+    size = len(text.encode("utf-8")) + 1
+    if size > LARGEST_REQUEST:
+        raise UsageProblem(f"an AT text of {size} bytes; the handset takes {LARGEST_REQUEST}")
+    return prepare_text(text, channel, force)
+
+
+def _atom(row: Request | None, text: str, force: bool, forced: list[str]) -> Atom:
+    try:
+        return parse_atom(row, text)
+    except UsageProblem as problem:
+        label, colon, _ = text.partition("=")[2].partition(":")
+        if not force or colon and label in TYPES:
+            raise
+        # A value without its type is of the row's type, however it is forced.
+        atom = parse_atom(row, text, raw=True)
+        forced.append(str(problem))
+        return atom
+
+
+def check_atom(request: str, text: str, force: bool) -> None:
+    """Refuse an atom of a request that cannot be sent."""
+    _atom(requests_by_id().get(request_id(request)), text, force, [])
+
+
+def in_words_of_a_plan(message: str) -> str:
+    """What the table says of a wrong value, without the command line's way around it."""
+    return message.replace("--force sends it", "force = true sends it").replace(
+        " (--raw sends it all the same)", "")
 
 
 def check_format(name: str, text: str) -> None:

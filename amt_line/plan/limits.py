@@ -4,7 +4,7 @@ from __future__ import annotations
 
 from dataclasses import dataclass
 from decimal import Decimal
-from typing import Any, Mapping
+from typing import Any, Iterator, Mapping
 
 from amt_line.plan.measure import Measure, digits
 from amt_line.plan.pattern import BadPattern, compiled, is_found
@@ -37,10 +37,25 @@ class Limit:
                 found.append((key, value))
         return found
 
-    @property
-    def fixed(self) -> bool:
-        """Whether no variable has a say in it."""
-        return not any(names(value) for _, value in self.references())
+    def check_constants(self) -> None:
+        """Raise ``ValueError`` for what is wrong whatever the variables come to."""
+        Limit(self.measure, dict(self._constants())).resolve({})
+        for value in self.given.get("one_of", ()):
+            if not names(value):
+                self._keyed("one_of", value, {})
+        pattern = self.given.get("matches", "")
+        if not only_reference(pattern):
+            self._pattern({name: "x" for name in names(pattern)})
+
+    def _constants(self) -> Iterator[tuple[str, Any]]:
+        """Every key in which no variable has a say."""
+        for key, value in self.given.items():
+            if isinstance(value, Mapping):
+                inner = {name: bound for name, bound in value.items() if not names(bound)}
+                if inner:
+                    yield key, inner
+            elif not any(map(names, value if isinstance(value, list) else [value])):
+                yield key, value
 
     def resolve(self, variables: Mapping[str, Scalar]) -> Bounds:
         """The limit with its references replaced; ``ValueError`` names key and reason."""
@@ -127,6 +142,9 @@ class Bounds:
         _ordered(self.near_high, self.high, "marginal.max", "max")
         _ordered(self.near_low, self.high, "marginal.min", "max")
         _ordered(self.low, self.near_high, "min", "marginal.max")
+        if self.allowed is not None and all(map(self._outside, self.allowed)):
+            key = "equals" if len(self.allowed) == 1 else "one_of"
+            raise ValueError(f"{key}: {self._outside(self.allowed[0])}: nothing can be within both")
 
     def judge(self, value: Scalar) -> Judgement:
         """Judge a value as the handset gave it."""

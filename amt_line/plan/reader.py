@@ -15,7 +15,7 @@ from amt_line.plan.pattern import BadPattern, compiled
 from amt_line.plan.problems import PlanProblem, Problem, shown
 from amt_line.plan.references import names
 from amt_line.plan.step_reader import read_step
-from amt_line.plan.validate import schema_problems
+from amt_line.plan.validate import schema_problems, where
 from amt_station.errors import StationError
 from amt_station.requests.model import Channel
 
@@ -39,7 +39,9 @@ def _load(path: Path, channel: Channel) -> Plan:
         content = tomllib.loads(data.decode("utf-8-sig"))
     except ValueError as error:
         raise PlanProblem(str(path), [Problem("", "", str(error))]) from error
-    problems = [*_odd_numbers(content, ""), *schema_problems(content)]
+    odd = {(problem.place, problem.key): problem for problem in _odd_numbers(content, (), content)}
+    problems = [*odd.values(), *(problem for problem in schema_problems(content)
+                                 if (problem.place, problem.key) not in odd)]
     if problems:
         raise PlanProblem(str(path), problems)
     plan, problems = _build(content, path, hashlib.sha256(data).hexdigest(), channel)
@@ -63,16 +65,17 @@ def _read(path: Path) -> bytes:
     return data
 
 
-def _odd_numbers(value: Any, key: str) -> Iterator[Problem]:
+def _odd_numbers(value: Any, path: tuple[Any, ...], content: Mapping[str, Any]
+                 ) -> Iterator[Problem]:
     """Numbers that are none; a schema does not see them."""
     if isinstance(value, float) and not math.isfinite(value):
-        yield Problem("", key, f"{value} is no number")
+        yield Problem(*where(path, content), f"{value} is no number")
     elif isinstance(value, dict):
         for name, part in value.items():
-            yield from _odd_numbers(part, f"{key}.{name}".lstrip("."))
+            yield from _odd_numbers(part, (*path, name), content)
     elif isinstance(value, list):
-        for number, part in enumerate(value, start=1):
-            yield from _odd_numbers(part, f"{key}[{number}]")
+        for number, part in enumerate(value):
+            yield from _odd_numbers(part, (*path, number), content)
 
 
 def _build(content: Mapping[str, Any], path: Path, sha256: str, channel: Channel
@@ -87,6 +90,7 @@ def _build(content: Mapping[str, Any], path: Path, sha256: str, channel: Channel
     plan = Plan(content.get("title", path.stem), content.get("version", ""), str(path), sha256,
                 channel, content.get("deadline"), content.get("dut", ""), inputs,
                 lists[Section.SETUP], lists[Section.STEP], lists[Section.ALWAYS])
+    problems += _text_problems(content)
     problems += _dut_problems(plan)
     problems += _name_problems(plan)
     if not problems:
@@ -112,6 +116,13 @@ def _inputs(tables: Mapping[str, Mapping[str, Any]], problems: list[Problem]) ->
             reason = str(error).removeprefix(f"input {name}: ")
             problems.append(Problem("", f"{key}.default", reason))
         yield item
+
+
+def _text_problems(content: Mapping[str, Any]) -> Iterator[Problem]:
+    for key in ("title", "version", "dut"):
+        text = content.get(key, "")
+        if not text.isprintable():
+            yield Problem("", key, f"{shown(text)} holds a character that cannot be shown")
 
 
 def _dut_problems(plan: Plan) -> Iterator[Problem]:

@@ -12,6 +12,8 @@ from amt_station.requests.model import Field
 
 Schema = dict[str, Any]
 
+# A line end behind it is no part of a name, but "$" would let it through.
+_NAME_ONLY = f"^{NAME}$(?!\\n)"
 _REFERENCE: Schema = {"type": "string", "pattern": r"\$\{"}
 _TEXT: Schema = {"type": "string", "minLength": 1}
 _SECONDS: Schema = {"type": "number", "exclusiveMinimum": 0, "maximum": 86400,
@@ -20,7 +22,7 @@ _WHOLE = {"minimum": -0x80000000, "maximum": 0x7FFFFFFF}
 _LARGEST = {"minimum": -1e18, "maximum": 1e18}
 
 KIND_KEYS: dict[str, tuple[str, ...]] = {
-    "command": ("with", "force"), "request": ("atoms", "force"), "at": ("expect",),
+    "command": ("with", "force"), "request": ("atoms", "force"), "at": ("expect", "force"),
     "ask": ("expect", "picture"), "enter": (), "wait": ()}
 _ANSWERED = ("limits", "save", "timeout", "retry", "reconnect")
 COMMON_KEYS = ("name", "stop", "when")
@@ -49,7 +51,7 @@ def plan_schema() -> Schema:
             "channel": {"enum": ["pc", "app"]},
             "deadline": _SECONDS,
             "dut": {**_TEXT, "description": "a text under which the record is filed"},
-            "input": {"type": "object", "propertyNames": {"pattern": f"^{NAME}$"},
+            "input": {"type": "object", "propertyNames": {"pattern": _NAME_ONLY},
                       "additionalProperties": {"$ref": "#/definitions/input"}},
             "setup": steps, "step": {**steps, "minItems": 1}, "always": steps},
         "definitions": {"input": _input(), "step": _step(), "limit": _limit(None),
@@ -69,7 +71,7 @@ def _input() -> Schema:
 def _step() -> Schema:
     limits = {"type": "object", "minProperties": 1,
               "additionalProperties": {"$ref": "#/definitions/limit"}}
-    variable = {"type": "string", "pattern": f"^{NAME}$",
+    variable = {"type": "string", "pattern": _NAME_ONLY,
                 "description": "a name of letters, digits, '_' and '-'"}
     properties: Schema = {
         "name": {**_TEXT, "maxLength": 200},

@@ -2,11 +2,12 @@
 
 from __future__ import annotations
 
+import re
 from pathlib import Path, PurePosixPath
 from typing import Any, Iterator, Mapping
 
 from amt_line.plan import handset
-from amt_line.plan.filled import Unfit, filled, holes, references
+from amt_line.plan.filled import Unfit, filled, holes, references, unfit_limit
 from amt_line.plan.limits import Limit
 from amt_line.plan.model import Kind, Section, Step, When
 from amt_line.plan.problems import Problem, shown
@@ -15,7 +16,7 @@ from amt_station.errors import StationError, UsageProblem
 from amt_station.requests.model import Channel
 
 _PICTURES = (".png", ".jpg", ".jpeg", ".gif", ".webp")
-_FINAL_ERRORS = ("+CME ERROR", "+CMS ERROR")
+_FINAL_RESULT = re.compile(r"OK|ERROR|\+CM[ES](?: ERROR(?::.*\S)?)?")
 _LONGEST_NAME = 200
 
 
@@ -106,9 +107,9 @@ def _expect_problems(kind: Kind, expect: Any) -> _Problems:
             yield "expect", f"{shown(expect)} is neither true nor false"
     elif not isinstance(expect, str):
         yield "expect", f"{shown(expect)} is no text"
-    elif expect not in ("OK", "ERROR", "+CME", "+CMS") and not expect.startswith(_FINAL_ERRORS):
-        yield "expect", (f"{shown(expect)} is no final result: OK, ERROR, "
-                         f"{' or '.join(_FINAL_ERRORS)}")
+    elif not _FINAL_RESULT.fullmatch(expect):
+        yield "expect", (f"{shown(expect)} is no final result: OK, ERROR, +CME ERROR or "
+                         "+CMS ERROR, those with ': ' and the error where only one will do")
 
 
 def _picture_problems(path: Path, given: str) -> _Problems:
@@ -156,11 +157,11 @@ def _value_problems(step: Step) -> _Problems:
             yield error.key, error.reason
         return
     for limit in step.limits:
-        if limit.fixed:
-            try:
-                limit.resolve({})
-            except ValueError as error:
-                yield f"limits.{limit.name}", str(error)
+        try:
+            limit.check_constants()
+        except ValueError as error:
+            unfit = unfit_limit(limit.name, error)
+            yield unfit.key, unfit.reason
     yield from _constant_problems(step)
 
 
@@ -172,3 +173,9 @@ def _constant_problems(step: Step) -> _Problems:
                 handset.command(step.subject).check(name, value, step.force)
             except UsageProblem as error:
                 yield f"with.{name}", handset.problem_of(error, name)
+    for text in step.atoms:
+        if not names(text):
+            try:
+                handset.check_atom(step.subject, text, step.force)
+            except UsageProblem as error:
+                yield "atoms", handset.in_words_of_a_plan(str(error))

@@ -15,7 +15,7 @@ from amt_line.plan import handset
 from amt_line.plan.model import Section, place
 from amt_line.plan.problems import Problem, shown
 from amt_line.plan.schema import KIND_KEYS, plan_schema
-from amt_station.text import printable
+from amt_station.text import shortened
 
 _SECTIONS = tuple(section.value for section in Section)
 _MOST = 50
@@ -56,50 +56,50 @@ def _errors(content: Mapping[str, Any]) -> Iterator[ValidationError]:
                     yield error
 
 
-def _where(path: Sequence[Any], content: Mapping[str, Any]) -> tuple[str, str]:
+def where(path: Sequence[Any], content: Mapping[str, Any]) -> tuple[str, str]:
     """The step, and the key in it, that a path into the content leads to."""
     if len(path) >= 2 and path[0] in _SECTIONS and isinstance(path[1], int):
         step = content[path[0]][path[1]]
         name = step.get("name", "") if isinstance(step, dict) else ""
-        where = place(str(path[0]), path[1] + 1, name if isinstance(name, str) else "")
-        return where, _key(path[2:])
+        return (place(str(path[0]), path[1] + 1, name if isinstance(name, str) else ""),
+                _key(path[2:]))
     return "", _key(path)
 
 
 def _key(path: Iterable[Any]) -> str:
     key = ""
     for part in path:
-        key += f"[{part + 1}]" if isinstance(part, int) else f".{part}"
+        key += f"[{part + 1}]" if isinstance(part, int) else f".{shortened(part)}"
     return key.lstrip(".")
 
 
 def _translate(error: ValidationError, content: Mapping[str, Any]) -> list[Problem]:
     path = list(error.absolute_path)
-    where, key = _where(path, content)
+    step, key = where(path, content)
     if "propertyNames" in error.absolute_schema_path:
-        return _wrong_name(error, path, where, key)
+        return _wrong_name(error, path, step, key)
     if error.validator == "additionalProperties":
         known = list(error.schema.get("properties", {}))
-        return [Problem(where, _joined(key, name), _unknown(name, known, path))
+        return [Problem(step, _joined(key, name), _unknown(name, known, path))
                 for name in error.instance if name not in known]
     if error.validator == "required":
         missing = [name for name in error.validator_value if name not in error.instance]
-        return [Problem(where, _joined(key, name), "missing") for name in missing]
-    return [Problem(where, key, _reason(error))]
+        return [Problem(step, _joined(key, name), "missing") for name in missing]
+    return [Problem(step, key, _reason(error))]
 
 
 def _joined(key: str, name: Any) -> str:
-    return f"{key}.{printable(str(name))}".lstrip(".")
+    return f"{key}.{shortened(str(name))}".lstrip(".")
 
 
-def _wrong_name(error: ValidationError, path: Sequence[Any], where: str, key: str
+def _wrong_name(error: ValidationError, path: Sequence[Any], step: str, key: str
                 ) -> list[Problem]:
     name = str(error.instance)
     if error.validator != "enum":
-        return [Problem(where, _joined(key, name), "this cannot be a variable's name")]
+        return [Problem(step, _joined(key, name), "this cannot be a variable's name")]
     if len(path) == 2:
-        return [Problem(where, _joined(key, name), "a step of this kind has no such key")]
-    return [Problem(where, _joined(key, name), _unknown(name, error.validator_value, path))]
+        return [Problem(step, _joined(key, name), "a step of this kind has no such key")]
+    return [Problem(step, _joined(key, name), _unknown(name, error.validator_value, path))]
 
 
 def _unknown(name: str, known: Sequence[str], path: Sequence[Any]) -> str:

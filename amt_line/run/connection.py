@@ -9,7 +9,7 @@ from amt_line.run.port import StoppablePort
 from amt_line.run.stop import Stop
 from amt_station.errors import BadFrame, NoAnswer, NoPort, PortBusy, Refused, StationError
 from amt_station.exchange import Transcript
-from amt_station.link import Link
+from amt_station.link import RECOVER_TIMEOUT, Link
 from amt_station.port import Port
 from amt_station.requests.model import Channel
 
@@ -35,8 +35,8 @@ class Connection:
         self._transcripts: list[Transcript] = []
         self._why = "the port was never open"
 
-    def open(self) -> None:
-        """Open the port and find the link's place.
+    def open(self, seconds: float = RECOVER_TIMEOUT) -> None:
+        """Open the port and find the link's place, each answer within ``seconds``.
 
         When the handset holds a request that it refuses, ``Refused`` says so and the port stays
         open: somebody may pull the cable.
@@ -46,7 +46,7 @@ class Connection:
         link.observers.append(self._transcripts.append)
         self._link = link
         try:
-            link.find_place()
+            link.find_place(min(seconds, RECOVER_TIMEOUT))
         except Refused:
             raise
         except BaseException as error:
@@ -96,7 +96,7 @@ class Connection:
         self.lose("it has not come back yet")
         while True:
             try:
-                self.open()
+                self.open(max(_PAUSE, end - time.monotonic()))
                 return
             except (NoPort, PortBusy, NoAnswer, BadFrame) as error:
                 if time.monotonic() + _PAUSE >= end:

@@ -15,6 +15,9 @@ class StoppablePort:
         self.name = port.name
         self._port = port
         self._stop = stop
+        if hasattr(port, "check"):
+            # A write may wait as long as a read.
+            port.check = stop.check
 
     def read(self, timeout: float) -> bytes:
         """As in ``Port``."""

@@ -102,8 +102,7 @@ class StepRun:
             self._document["forced"] = list(whole.prepared.forced) if whole.prepared else []
             outcome = attempt(whole, self._tools())
             self._take(outcome)
-            if self._step.reconnect is not None:
-                self._connection.reconnect(self._step.reconnect)
+            self._come_back()
         except Aborted as error:
             self._set(Verdict.ERROR, str(error), self._stop_status())
             self.obstacle = str(error)
@@ -116,6 +115,16 @@ class StepRun:
             self._owner.note_defect(error)
             self._set(Verdict.ERROR, f"the station's own error: {error!r}", EXIT_OWN_ERROR)
             self.obstacle = str(self._document["reason"])
+
+    def _come_back(self) -> None:
+        """Behind a step that makes the port go away, wait for it once."""
+        if self._step.reconnect is None:
+            return
+        try:
+            self._connection.reconnect(self._step.reconnect)
+        except NoPort as error:
+            self._set(Verdict.ERROR, str(error), error.exit_status)
+            self.obstacle = str(error)
 
     def _stop_status(self) -> int:
         how = self._stop.requested

@@ -59,10 +59,14 @@ class Peer:
         """The next item that arrived; fails the test when none does."""
         return self.received.get(timeout=PATIENCE)
 
+    def cease(self) -> None:
+        """Read no more, from within a script."""
+        os.write(self._stop_write, b"x")
+
     def stop(self) -> None:
         """End the thread; the terminal stays open."""
         if self._thread.is_alive():
-            os.write(self._stop_write, b"x")
+            self.cease()
             self._thread.join(PATIENCE)
 
     def hang_up(self) -> None:

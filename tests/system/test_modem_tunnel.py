@@ -50,6 +50,19 @@ def answered(desk: ModemDesk, said: bytes, *packets: wire.Packet) -> Trace:
     return trace
 
 
+def ask_behind(desk: ModemDesk, rest: bytes) -> None:
+    """A plain request; before the modem speaks, the daemon has read the REST of its last answer."""
+    mark = desk.handset.log.mark()
+    desk.ask(PLAIN, PLAIN_COMMAND)
+    desk.handset.log.wait(f"read_at read_len_ptr[{len(rest)}]", after=mark)
+
+
+def say_at_once(desk: ModemDesk, said: bytes) -> None:
+    """All of a long answer is there when the daemon reads."""
+    with standing_still(desk.handset, len(said)):
+        desk.mux.write(said)
+
+
 # the way out
 
 
@@ -128,8 +141,9 @@ def test_2041_bytes_pass_and_2042_are_refused(desk: ModemDesk) -> None:
         desk.mux.write(line("0400000000") + OK)
         desk.expect(packet(4, integer(1, 0)))
     trace = Trace(desk.handset)
-    with standing_still(desk.handset):
-        desk.app.send(packet(3, raw(4, data)).encode())
+    refused = packet(3, raw(4, data)).encode()
+    with standing_still(desk.handset, len(refused)):
+        desk.app.send(refused)
     desk.expect(refusal(3, NOT_SERVED))
     trace.expect("amt_modem_handle_req()", error_line("amt_modem_handle_req", -100),
                  "(10 + 2042 * 2 + 2) < 4096")
@@ -279,10 +293,17 @@ def test_longest_text_that_fits_the_area(desk: ModemDesk) -> None:
     size = (room - 18) // 2
     data = bytes(i * 11 & 0xFF for i in range(size))
     text = "7200000000" + size.to_bytes(4, "little").hex() + data.hex().upper()
-    answered(desk, line(text.ljust(room)) + OK, packet(0x72, integer(1, 0), raw(4, data)))
+    reply = packet(0x72, integer(1, 0), raw(4, data))
+    desk.ask(PLAIN, PLAIN_COMMAND)
+    say_at_once(desk, line(text.ljust(room)) + OK)
+    desk.expect(reply)
     # One more, and the final result cannot be read whole any more: "OK" still can.
-    answered(desk, line(text.ljust(room + 1)) + OK, packet(0x72, integer(1, 0), raw(4, data)))
-    desk.exchange(PLAIN, PLAIN_COMMAND, [OK], [])
+    ask_behind(desk, b"\n")
+    say_at_once(desk, line(text.ljust(room + 1)) + OK)
+    desk.expect(reply)
+    ask_behind(desk, b"\r\n")
+    desk.say(OK)
+    desk.expect()
 
 
 # with the simulated modem

@@ -116,8 +116,8 @@ class Operator:
         self.handset.log.wait("pthread_create() amt_handle_load_image_for_handshake success.")
 
     def wait_thread_gone(self) -> None:
-        """Wait until the picture's thread has ended."""
-        wait_until(lambda: set(self.handset.inspect().threads) == self._threads or None,
+        """Wait until the picture's thread has ended; others of before may have ended as well."""
+        wait_until(lambda: set(self.handset.inspect().threads) <= self._threads or None,
                    "the end of the picture's thread", explain=self.handset.log.tail)
 
     @property

@@ -8,6 +8,7 @@ from amt_simulator import Handset
 from amt_simulator.waiting import wait_until
 from amt_station import wire
 from support import channels
+from support.arrived import TERMINAL_SIZE, arrived
 from support.channels import RESULT, AppChannel, integer, packet
 
 # Final results as the modem says them.
@@ -26,8 +27,11 @@ def refusal(command: int, code: int) -> wire.Packet:
 
 
 @contextmanager
-def standing_still(handset: Handset) -> Iterator[None]:
-    """The daemon sees what is sent meanwhile in one piece: a long text fills several pieces."""
+def standing_still(handset: Handset, size: int) -> Iterator[None]:
+    """The daemon sees the SIZE bytes that are sent meanwhile in one piece.
+
+    The kernel carries a long text through a terminal in several, and in its own time.
+    """
     def is_stopped() -> bool:
         return all(thread["state"].startswith("T") for thread in
                    handset.inspect().threads.values())
@@ -36,6 +40,8 @@ def standing_still(handset: Handset) -> Iterator[None]:
     wait_until(is_stopped, "the daemon to stand still")
     try:
         yield
+        there = min(size, TERMINAL_SIZE)
+        wait_until(lambda: arrived(handset) >= there, f"{there} bytes on the daemon's line")
     finally:
         handset.signal(signal.SIGCONT)
 
@@ -52,7 +58,7 @@ class ModemDesk:
         """The app's request reaches the modem as COMMAND, and nothing else does."""
         data = request.encode() if isinstance(request, wire.Packet) else request
         if len(data) > 1024:
-            with standing_still(self.handset):
+            with standing_still(self.handset, len(data)):
                 self.app.send(data)
         else:
             self.app.send(data)
