@@ -209,7 +209,7 @@ def test_a_large_request_goes_on_in_one_piece(peer: Peer, run_station: Run, star
     _, talk = process.communicate(timeout=LONG)
     assert (process.returncode, talk) == (0, "")
     said = [line for line in statements(path) if "says" in line]
-    assert [line[:47] for line in said] == ["station says packet CELL_SWITCH_MODE_CMD 7=bytes"]
+    assert [line[:49] for line in said] == ["station says packet CELL_SWITCH_MODE_CMD 7=bytes:"]
     assert comments(path)[-1] == "# listened no longer"
 
 
