@@ -1,4 +1,4 @@
-"""The commands for traces: show, diff, replay, listen."""
+"""The commands for traces: show, diff, export, dissector, replay, listen."""
 
 from __future__ import annotations
 
@@ -63,6 +63,37 @@ def diff(context: click.Context, first: Path, second: Path) -> None:
         sign, path = ("-", first) if one.is_first else ("+", second)
         console.data(f"{sign} {path}:{one.line}: {one.text}")
     context.exit(1 if found else 0)
+
+
+@trace.command()
+@click.argument("file", type=_FILE)
+@click.option("--pcapng", required=True, metavar="FILE", type=click.Path(path_type=Path),
+              help="Write a capture file, for Wireshark with the dissector; - is standard output")
+@common_options
+@click.pass_obj
+def export(settings: Settings, file: Path, pcapng: Path) -> None:
+    """Write a trace in another form."""
+    from amt_station.trace.pcapng import capture
+
+    data = capture(read_trace(file))
+    if str(pcapng) == "-":
+        sys.stdout.buffer.write(data)
+        return
+    try:
+        pcapng.write_bytes(data)
+    except OSError as error:
+        raise UsageProblem(f"{pcapng}: {error.strerror}") from error
+    if settings.json:
+        console.data_json({"ok": True, "file": str(pcapng), "bytes": len(data)})
+
+
+@trace.command()
+@common_options
+def dissector() -> None:
+    """Print the dissector for captures: a script for the Lua in Wireshark and tshark."""
+    from amt_station.trace.dissector import dissector as script
+
+    sys.stdout.write(script())
 
 
 @trace.command()

@@ -28,6 +28,7 @@ DIALOGUES = sorted((ROOT / "tests" / "system" / "dialogues").glob("*.txt"))
 VERSION = ("station says packet AMT_VERSION_CMD 19=int:16", "station hears acknowledgement",
            'station hears packet AMT_VERSION_RSPCMD 19=int:16 18=bytes:"1.2" 1=int:0')
 ATOMS = (Atom.integer(19, 16), Atom.raw(18, b"1.2"))
+LONG = 60.0
 ONE_LINE = re.compile(r"\Aamt-station: [^\n]+\n\Z")
 
 
@@ -81,9 +82,9 @@ def test_a_port_that_goes_away(peer: Peer, tmp_path: Path) -> None:
     with subprocess.Popen(station_command("-p", peer.path, "--trace", str(path), "at", "AT"),
                           cwd=ROOT, env=station_environment(), stderr=subprocess.PIPE,
                           text=True) as station:
-        peer.next()
+        peer.received.get(timeout=LONG)
         peer.hang_up()
-        _, talk = station.communicate(timeout=60)
+        _, talk = station.communicate(timeout=LONG)
         assert station.returncode == 3 and "went away" in talk
     assert statements(path) == ["channel pc", r'station says "AT\r"', "station loses"]
 
@@ -96,12 +97,12 @@ def test_interrupted(number: int, status: int, peer: Peer, tmp_path: Path) -> No
     with subprocess.Popen(station_command("-p", peer.path, "--trace", str(path), "at", "AT"),
                           cwd=ROOT, env=station_environment(), stderr=subprocess.PIPE,
                           text=True) as station:
-        peer.next()
-        end = time.monotonic() + 60
+        peer.received.get(timeout=LONG)
+        end = time.monotonic() + LONG
         while "+X: 1" not in path.read_text("ascii") and time.monotonic() < end:
             time.sleep(0.01)
         station.send_signal(number)
-        station.communicate(timeout=60)
+        station.communicate(timeout=LONG)
         assert station.returncode == status
     assert statements(path) == ["channel pc", r'station says "AT\r"',
                                 r'station hears "\r\n+X: 1\r\n"']
@@ -127,7 +128,7 @@ def test_a_file_that_may_not_grow_ends_with_a_whole_line(peer: Peer, tmp_path: P
     line = station_command("-p", peer.path, "--trace", str(path), "at", "AT")
     result = subprocess.run(["/bin/sh", "-c", 'ulimit -f 2; exec "$@"', "sh", *line], cwd=ROOT,
                             env=station_environment(PYTHONDONTWRITEBYTECODE="1"),
-                            capture_output=True, text=True, timeout=60, check=False)
+                            capture_output=True, text=True, timeout=LONG, check=False)
     assert result.returncode == 0 and "could not be written: File too large" in result.stderr
     assert statements(path) == ["channel pc", r'station says "AT\r"']
     dialogue.read_trace(path)

@@ -10,7 +10,7 @@ from pathlib import Path
 from typing import Any, Iterator
 
 import pytest
-from station_peer import (PATIENCE, ROOT, Peer, Run, answering, replying, station_command,
+from station_peer import (ROOT, Peer, Run, answering, replying, station_command,
                           station_environment)
 from trace_files import comments, statements, write
 
@@ -50,7 +50,7 @@ def test_a_script_meets_the_same_answers(tmp_path: Path) -> None:
 
 def test_a_station_that_says_something_else_is_hung_up_on(tmp_path: Path) -> None:
     with replay(tmp_path, "channel pc", *VERSION) as handset:
-        with Link.open(handset.port, timeout=PATIENCE) as link, pytest.raises(NoPort):
+        with Link.open(handset.port, timeout=LONG) as link, pytest.raises(NoPort):
             link.request(Packet(45, (Atom.integer(19, 17),)))
         standing = handset.wait(LONG)
         assert not standing.done and standing.line == 2
@@ -63,7 +63,7 @@ def test_a_station_that_says_something_else_is_hung_up_on(tmp_path: Path) -> Non
 
 def test_a_station_that_says_more(tmp_path: Path) -> None:
     with replay(tmp_path, "channel pc", *AT) as handset:
-        with Link.open(handset.port, timeout=PATIENCE) as link:
+        with Link.open(handset.port, timeout=LONG) as link:
             assert link.at("AT").ok
             with pytest.raises(NoPort):
                 link.at("AT+X")
@@ -77,7 +77,7 @@ def test_on_the_app_channel_any_search_is_answered(tmp_path: Path) -> None:
     with replay(tmp_path, "channel app", f"station says packet {asked}",
                 f"station hears packet {asked + 1} 1=int:1", "station says packet 9",
                 "station hears packet 10 5=int:3800000 1=int:0") as handset:
-        with Link.open(handset.port, Channel.APP, PATIENCE) as link:
+        with Link.open(handset.port, Channel.APP, LONG) as link:
             link.find_place()
             assert link.request(Packet(9)).answer.get_int(5) == 3800000
         assert handset.wait(LONG).done
@@ -88,7 +88,7 @@ def test_a_port_that_went_away_goes_away_again(tmp_path: Path) -> None:
     with replay(tmp_path, "channel pc", 'station opens "/dev/x"', AT[0], "station loses",
                 'station opens "/dev/x"', *AT, link=port) as handset:
         assert handset.port == str(port)
-        with Link.open(str(port), timeout=PATIENCE) as link:
+        with Link.open(str(port), timeout=LONG) as link:
             with pytest.raises(NoPort):
                 link.at("AT")
             link.reconnect(LONG)
@@ -200,10 +200,10 @@ def test_a_large_request_goes_on_in_one_piece(peer: Peer, run_station: Run, star
     path = tmp_path / "x.trace"
     process, port = started("-p", peer.path, "trace", "listen", str(path))
     big = Packet(201, (Atom.raw(7, bytes(range(256)) * 15),))
-    with Link.open(port, timeout=PATIENCE) as link:
+    with Link.open(port, timeout=LONG) as link:
         peer.script = answering(acknowledged=False)
         link.request(big)
-    item = peer.next()
+    item = peer.received.get(timeout=LONG)
     assert isinstance(item, Frame) and item.packet == big
     process.send_signal(signal.SIGINT)
     _, talk = process.communicate(timeout=LONG)
@@ -218,9 +218,9 @@ def test_a_line_that_dies_while_it_is_listened_to(peer: Peer, started: Any,
     path = tmp_path / "x.trace"
     process, port = started("-p", peer.path, "trace", "listen", str(path))
     peer.script = replying("\r\nOK\r\n")
-    with Link.open(port, timeout=PATIENCE) as link:
+    with Link.open(port, timeout=LONG) as link:
         assert link.at("AT").ok
-        assert isinstance(peer.next(), Text)
+        assert isinstance(peer.received.get(timeout=LONG), Text)
         peer.hang_up()
         _, talk = process.communicate(timeout=LONG)
         assert process.returncode == 3 and "went away" in talk
