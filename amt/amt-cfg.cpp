@@ -95,11 +95,8 @@ int parse_amt_cfg(const char *path)
     pub_log_entry(g_amt_cfg_log);
     const pub_file_st file(path, pub_file_mode_en::READ);
     if (!file.is_open()) {
-        pub_log_sys_call(g_amt_cfg_log, "fopen");
-        pub_log_error(g_amt_cfg_log, PUB_ERR_SYS_CALL);
-        pub_log_error(g_amt_cfg_log, PUB_ERR_FILE);
-        PUB_LOG(g_amt_cfg_log, "fail to open file: %s", path);
-        return PUB_ERR_FILE;
+        pub_log_call_error(g_amt_cfg_log, "fopen", PUB_ERR_SYS_CALL);
+        return pub_log_fail(g_amt_cfg_log, PUB_ERR_FILE, "fail to open file: %s", path);
     }
     char line_a[LINE_SIZE + 1] = {};
     int is_eof = 0;
@@ -122,9 +119,7 @@ int amt_cfg_init(const char *path)
 {
     pub_log_entry(g_amt_cfg_log);
     if (path == nullptr) {
-        pub_log_error(g_amt_cfg_log, PUB_ERR_PARAM);
-        pub_log_flags(g_amt_cfg_log, {true});
-        return PUB_ERR_PARAM;
+        return pub_log_bad_param(g_amt_cfg_log, {true});
     }
     g_amt_cfg = {};
     g_amt_cfg.m_modem_uart_at_baudrate = AMT_CFG_DEFAULT_BAUDRATE;

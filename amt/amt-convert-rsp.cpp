@@ -121,15 +121,13 @@ int run_row(const uint8_t **cursor, uint8_t *packet, const row_st &row)
 }
 
 /* The check of the steps that read a field of fixed size. The last flag is the atom id's: any id will do. */
-int check_step(const uint8_t **cursor, const uint8_t *packet, const char *func = __builtin_FUNCTION(),
-               int line = __builtin_LINE())
+int check_step(const uint8_t **cursor, const uint8_t *packet,
+               const pub_log_place_st &place = g_amt_convert_log)
 {
     if (!is_target_absent(cursor) && packet != nullptr) {
         return PUB_ERR_NONE;
     }
-    pub_log_error(g_amt_convert_log, PUB_ERR_PARAM, func, line);
-    pub_log_flags(g_amt_convert_log, {cursor == nullptr, is_target_absent(cursor), packet == nullptr, false});
-    return PUB_ERR_PARAM;
+    return pub_log_bad_param(place, {cursor == nullptr, is_target_absent(cursor), packet == nullptr, false});
 }
 
 } // namespace
@@ -157,15 +155,12 @@ int rsp_at_data_2_amt_data_atom_bool(const uint8_t **cursor, uint8_t *packet, ui
 int rsp_at_data_2_amt_data_atom_byte(const uint8_t **cursor, uint8_t *packet, uint32_t count, uint8_t atom_id)
 {
     if (is_target_absent(cursor) || packet == nullptr || count == 0) {
-        pub_log_error(g_amt_convert_log, PUB_ERR_PARAM);
-        pub_log_flags(g_amt_convert_log,
-                      {cursor == nullptr, is_target_absent(cursor), packet == nullptr, count == 0, false});
-        return PUB_ERR_PARAM;
+        return pub_log_bad_param(g_amt_convert_log, {cursor == nullptr, is_target_absent(cursor),
+                                                     packet == nullptr, count == 0, false});
     }
     if (!amt_packet_has_room(packet, count)) {
-        pub_log_error(g_amt_convert_log, PUB_ERR_FAIL);
-        PUB_LOG(g_amt_convert_log, "atom of %u bytes does not fit the packet", count);
-        return PUB_ERR_FAIL;
+        return pub_log_fail(g_amt_convert_log, PUB_ERR_FAIL, "atom of %u bytes does not fit the packet",
+                            count);
     }
     amt_packet_add_bytes(packet, atom_id, *cursor, static_cast<uint16_t>(count));
     *cursor += count;
@@ -176,10 +171,8 @@ int amt_convert_rsp_at_data_2_amt_data(const uint8_t *block, uint32_t len, uint8
 {
     pub_log_entry(g_amt_convert_log);
     if (block == nullptr || len == 0 || packet == nullptr || capacity != AMT_PACKET_SIZE) {
-        pub_log_error(g_amt_convert_log, PUB_ERR_PARAM);
-        pub_log_flags(g_amt_convert_log,
-                      {block == nullptr, len == 0, packet == nullptr, capacity != AMT_PACKET_SIZE});
-        return PUB_ERR_PARAM;
+        return pub_log_bad_param(
+            g_amt_convert_log, {block == nullptr, len == 0, packet == nullptr, capacity != AMT_PACKET_SIZE});
     }
     /* The fields may claim more than the block has: what lies behind it reads as zero bytes, to the end of
      * the area. */

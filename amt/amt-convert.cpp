@@ -59,25 +59,20 @@ bool append(const block_st &block, const uint8_t *data, uint32_t n)
 
 } // namespace
 
-/* A malformed packet ends the conversion: says why, in the name of the function that uses it. */
-#define REFUSE(...)                                                                                          \
-    (pub_log_error(g_amt_convert_log, PUB_ERR_FAIL), PUB_LOG(g_amt_convert_log, __VA_ARGS__), PUB_ERR_FAIL)
-
 int amt_convert_req_amt_data_2_at_data(const uint8_t *packet, uint8_t *out, uint32_t capacity,
                                        uint32_t *out_len)
 {
     pub_log_entry(g_amt_convert_log);
     if (packet == nullptr || out == nullptr || capacity == 0 || out_len == nullptr) {
-        pub_log_error(g_amt_convert_log, PUB_ERR_PARAM);
-        pub_log_flags(g_amt_convert_log,
-                      {packet == nullptr, out == nullptr, capacity == 0, out_len == nullptr});
-        return PUB_ERR_PARAM;
+        return pub_log_bad_param(g_amt_convert_log,
+                                 {packet == nullptr, out == nullptr, capacity == 0, out_len == nullptr});
     }
     amt_packet_clear(out, capacity);
     *out_len = 0;
     const uint8_t head = packet[AMT_PACKET_HEAD_OFFSET];
     if (head != AMT_PACKET_HEAD) {
-        return REFUSE("command head mismatch: %02X != %02X", head, AMT_PACKET_HEAD);
+        return pub_log_fail(g_amt_convert_log, PUB_ERR_FAIL, "command head mismatch: %02X != %02X", head,
+                            AMT_PACKET_HEAD);
     }
     const uint8_t cmd = amt_packet_get_cmd(packet);
     const block_st block = {out, capacity, out_len};
@@ -87,31 +82,35 @@ int amt_convert_req_amt_data_2_at_data(const uint8_t *packet, uint8_t *out, uint
     const uint32_t end = offset + amt_get_u16_le(packet + AMT_PACKET_ATOM_LENGTH_OFFSET);
     while (offset < end) {
         if (offset + AMT_ATOM_HEADER_SIZE > AMT_PACKET_SIZE) {
-            return REFUSE("atom at %u leads outside the packet", offset);
+            return pub_log_fail(g_amt_convert_log, PUB_ERR_FAIL, "atom at %u leads outside the packet",
+                                offset);
         }
         const uint8_t *atom = packet + offset;
         if (atom[0] != AMT_ATOM_HEAD) {
-            return REFUSE("atom head mismatch: %02X != %02X", atom[0], AMT_ATOM_HEAD);
+            return pub_log_fail(g_amt_convert_log, PUB_ERR_FAIL, "atom head mismatch: %02X != %02X", atom[0],
+                                AMT_ATOM_HEAD);
         }
         const uint8_t *length_field = atom + AMT_ATOM_LENGTH_OFFSET;
         if (cmd == AMT_DSP_TRANSPARENT_CONTROL_CMD && !append(block, length_field, sizeof(uint16_t))) {
-            return REFUSE("block of %u bytes is full", capacity);
+            return pub_log_fail(g_amt_convert_log, PUB_ERR_FAIL, "block of %u bytes is full", capacity);
         }
         const uint16_t length = amt_get_u16_le(length_field);
         const uint8_t type = atom[AMT_ATOM_TYPE_OFFSET];
         const length_rule_st *rule_ptr = find_length_rule(type);
         if (rule_ptr == nullptr) {
-            return REFUSE("unknown atom value type: %02X", type);
+            return pub_log_fail(g_amt_convert_log, PUB_ERR_FAIL, "unknown atom value type: %02X", type);
         }
         if (rule_ptr->m_length != ANY_LENGTH && length != rule_ptr->m_length) {
-            return REFUSE("atom length mismatch: %02X != %02X", length, rule_ptr->m_length);
+            return pub_log_fail(g_amt_convert_log, PUB_ERR_FAIL, "atom length mismatch: %02X != %02X", length,
+                                rule_ptr->m_length);
         }
         const uint32_t atom_size = AMT_ATOM_HEADER_SIZE + length;
         if (offset + atom_size > AMT_PACKET_SIZE) {
-            return REFUSE("atom at %u leads outside the packet", offset);
+            return pub_log_fail(g_amt_convert_log, PUB_ERR_FAIL, "atom at %u leads outside the packet",
+                                offset);
         }
         if (!append(block, atom + AMT_ATOM_HEADER_SIZE, length)) {
-            return REFUSE("block of %u bytes is full", capacity);
+            return pub_log_fail(g_amt_convert_log, PUB_ERR_FAIL, "block of %u bytes is full", capacity);
         }
         offset += atom_size;
     }
@@ -122,9 +121,8 @@ int amt_convert_pc_2_app(amt_buf_st *buf_ptr)
 {
     pub_log_entry(g_amt_convert_log);
     if (buf_ptr == nullptr || buf_ptr->m_buf_len == 0) {
-        pub_log_error(g_amt_convert_log, PUB_ERR_PARAM);
-        pub_log_flags(g_amt_convert_log, {buf_ptr == nullptr, buf_ptr != nullptr && buf_ptr->m_buf_len == 0});
-        return PUB_ERR_PARAM;
+        return pub_log_bad_param(g_amt_convert_log,
+                                 {buf_ptr == nullptr, buf_ptr != nullptr && buf_ptr->m_buf_len == 0});
     }
     uint8_t *data = buf_ptr->m_buf_a;
     const uint32_t length = buf_ptr->m_buf_len;
@@ -142,16 +140,12 @@ int amt_convert_app_2_pc(amt_buf_st *buf_ptr)
 {
     pub_log_entry(g_amt_convert_log);
     if (buf_ptr == nullptr) {
-        pub_log_error(g_amt_convert_log, PUB_ERR_PARAM);
-        pub_log_flags(g_amt_convert_log, {true});
-        return PUB_ERR_PARAM;
+        return pub_log_bad_param(g_amt_convert_log, {true});
     }
     uint8_t *data = buf_ptr->m_buf_a;
     const uint32_t length = buf_ptr->m_buf_len != 0 ? buf_ptr->m_buf_len : amt_packet_get_length(data);
     if (length == 0 || length > sizeof(buf_ptr->m_buf_a) - AMT_ENVELOPE_OVERHEAD) {
-        pub_log_error(g_amt_convert_log, PUB_ERR_PARAM);
-        pub_log_flags(g_amt_convert_log, {true});
-        return PUB_ERR_PARAM;
+        return pub_log_bad_param(g_amt_convert_log, {true});
     }
     memmove(data + AMT_ENVELOPE_HEAD_SIZE, data, length);
     amt_put_u32_le(data, AMT_ENVELOPE_MAGIC);

@@ -3,13 +3,13 @@
 #include "amt/amt-atom.h"
 #include "amt/amt-command.h"
 #include "amt/amt-convert.h"
-#include "amt/amt-device/command.h"
 #include "amt/amt-device/radio-step.h"
 #include "amt/amt-handle/channel/reply.h"
 #include "amt/amt-log.h"
 #include "amt/amt-packet.h"
 #include "platform/include/ldt.h"
 #include "pub/error.h"
+#include "pub/util/process.h"
 
 namespace {
 
@@ -75,7 +75,7 @@ int amt_gps_test(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 int amt_gps_read_result(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
     if (amt_reply_enter(g_amt_gps_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
-        amt_device_run("echo gps read result:invalid param > /data/local/wifi/gps_get_result.txt");
+        pub_util_run_shell("echo gps read result:invalid param > /data/local/wifi/gps_get_result.txt");
         return PUB_ERR_PARAM;
     }
     const int32_t index = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_GPS_SATELLITE);

@@ -134,7 +134,7 @@ int start(int mode)
 {
     amt_process_end_begin(error_code);
     PUB_LOG(g_amt_main_log, "FATAL ERROR!!!");
-    pub_log_error(g_amt_main_log, error_code, "main", FATAL_LINE);
+    pub_log_error({g_amt_main_log, "main", FATAL_LINE}, error_code);
     amt_deinit_resource();
     amt_process_end_finish();
 }

@@ -8,7 +8,6 @@
 #include <unistd.h>
 
 #include "amt/amt-handle/channel/process-end.h"
-#include "amt/amt-handle/channel/service-process.h"
 #include "amt/amt-handle/startup.h"
 #include "amt/amt-log.h"
 #include "pub/util/signal-table.h"
@@ -20,8 +19,8 @@ namespace {
 constexpr time_t SLEEP_SECONDS = 0xFFFFFFF;
 constexpr uint32_t SETTLE_PAUSE_MS = 1;
 
-/* 12 is SIGUSR2 here; the number is what counts. */
-constexpr int treated_signal_a[] = {SIGINT, SIGTERM, SIGSEGV, SIGBUS, 12};
+constexpr int treated_signal_a[] = {SIGINT, SIGTERM, SIGSEGV, SIGBUS, SIGUSR2};
+static_assert(SIGUSR2 == 12); /* the number is what counts for who sends it */
 
 pthread_t g_main_thread;
 amt_worker_st *g_starter_ptr = nullptr;
@@ -37,22 +36,13 @@ bool is_fault(int signal_number)
 /* The signals that end the process and are no faults. */
 sigset_t get_terminating_set()
 {
-    sigset_t set;
-    sigemptyset(&set);
-    for (const int signal_number : treated_signal_a) {
-        if (!is_fault(signal_number)) {
-            sigaddset(&set, signal_number);
-        }
-    }
-    return set;
+    return pub_util_get_signal_set({SIGINT, SIGTERM, SIGUSR2});
 }
 
 /* What the main thread takes: those, and the starter's call. */
 sigset_t get_taken_set()
 {
-    sigset_t set = get_terminating_set();
-    sigaddset(&set, SIGUSR1);
-    return set;
+    return pub_util_get_signal_set({SIGINT, SIGTERM, SIGUSR2, SIGUSR1});
 }
 
 /* The end begins before its first record, which may find the log stuck. */

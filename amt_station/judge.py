@@ -68,6 +68,16 @@ def passed_on(request: Packet, channel: Channel) -> bool:
     return any(request.get_int(atom, 0) in values for atom, values in service.passes_on.items())
 
 
+def is_overtaken(request: Packet, channel: Channel) -> bool:
+    """Whether other answers of the handset may come before one to this request.
+
+    The modem takes its time, and so does the process that reports the outcome of a request with two
+    answers.
+    """
+    row = requests_by_id().get(request.command)
+    return passed_on(request, channel) or bool(row and row.answers > 1)
+
+
 def judge(exchange: Exchange) -> None:
     """Raise ``Refused`` unless every answer of the exchange says yes."""
     command = exchange.request.command

@@ -14,7 +14,7 @@ from typing import Callable, Iterator, TypeVar
 from amt_station import diagnosis, log
 from amt_station.errors import StationError, UsageProblem
 from amt_station.exchange import TimedItem, Transcript
-from amt_station.port import Port
+from amt_station.port import LastingPort, Port
 from amt_station.replug import reopened
 from amt_station.requests.model import Channel
 from amt_station.wire.decoder import BareDecoder, Decoder, EnvelopeDecoder, Item
@@ -52,8 +52,23 @@ class Line:
         self.observers: list[Observer] = [log.exchange]
         self._reopen = reopen
         self._turn = threading.RLock()
-        self._in_step = True
+        self._step = not self._left_out_of_step()
         self._forget()
+
+    def _left_out_of_step(self) -> bool:
+        return isinstance(self.port, LastingPort) and self.port.left_out_of_step()
+
+    @property
+    def _in_step(self) -> bool:
+        return self._step
+
+    @_in_step.setter
+    def _in_step(self, in_step: bool) -> None:
+        """The port learns it too: this process may be the next that ends without its answer."""
+        if in_step is not self._step:
+            self._step = in_step
+            if isinstance(self.port, LastingPort):
+                self.port.remember(not in_step)
 
     def _forget(self) -> None:
         pc = self.channel is Channel.PC

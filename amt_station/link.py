@@ -11,13 +11,14 @@ One link has one user at a time: threads that share one take turns, an exchange 
 from __future__ import annotations
 
 import time
-from dataclasses import dataclass
+from contextlib import contextmanager
+from typing import Callable, Iterator
 
 from amt_station import diagnosis, judge
-from amt_station.errors import BadFrame, OutOfStep, UsageProblem
+from amt_station.errors import BadFrame, OutOfStep, StationError, UsageProblem
 from amt_station.exchange import AtReply, Exchange, Purpose, ReplyReader, Transcript
 from amt_station.line import Deadline, Line, Observer, checked_seconds
-from amt_station.place import Place, Search, search
+from amt_station.place import Place, Recovery, Search, search
 from amt_station.port import Port, SerialPort
 from amt_station.requests.model import Channel
 from amt_station.requests.table import display_name, requests_by_id
@@ -40,23 +41,20 @@ _LONGEST_UNREST = 3.0
 _DOUBT_SECONDS = 0.5
 
 
-@dataclass(frozen=True)
-class Recovery:
-    """A cleared request buffer: how often it was flushed, and what came for held requests."""
-
-    attempts: int
-    late_answers: tuple[Packet, ...]
-
-
 class Link(Line):
     """A line to the handset; a context manager that closes its port.
 
     Threads that share a link take turns, an exchange being one turn.
     """
 
-    _lost_texts = 0
     _lost_searches = 0
     _searches = 0
+
+    def __init__(self, port: Port, channel: Channel = Channel.PC, timeout: float | None = None,
+                 reopen: Callable[[], Port] | None = None) -> None:
+        super().__init__(port, channel, timeout, reopen)
+        # What an earlier process still waited for may be anything.
+        self._others_are_due = not self._in_step
 
     @classmethod
     def open(cls, url: str, channel: Channel = Channel.PC, timeout: float | None = None,
@@ -99,9 +97,19 @@ class Link(Line):
             transcript = Transcript(Purpose.REQUEST, self.channel, display_name(packet.command),
                                     data)
             exchange = Exchange(self.channel, packet, data, transcript)
-            with self._conversation(transcript):
+            with self._conversation(transcript), self._overtaken_when_lost(
+                    judge.is_overtaken(packet, self.channel)):
                 self._converse(exchange, limit, wanted)
         return exchange
+
+    @contextmanager
+    def _overtaken_when_lost(self, may_be: bool) -> Iterator[None]:
+        """An answer that is not the handset's own may come behind that of a search."""
+        try:
+            yield
+        finally:
+            if may_be and not self._in_step:
+                self._others_are_due = True
 
     def _converse(self, exchange: Exchange, limit: float, wanted: int) -> None:
         reader = ReplyReader()
@@ -141,11 +149,8 @@ class Link(Line):
             self._get_in_step()
             transcript = Transcript(Purpose.TEXT, self.channel, printable(command), data)
             reply = AtReply(command, transcript)
-            with self._conversation(transcript):
-                try:
-                    self._hear(reply, limit)
-                finally:
-                    self._lost_texts += not self._in_step
+            with self._conversation(transcript), self._overtaken_when_lost(True):
+                self._hear(reply, limit)
         return reply
 
     def _hear(self, reply: AtReply, limit: float) -> None:
@@ -194,7 +199,7 @@ class Link(Line):
             dropped: list[Item] = []
             for attempt in (1, 2):
                 try:
-                    dropped += self._search(limit)
+                    items, problem = self._search(limit)
                 except OutOfStep as error:
                     # A held request that the handset now carries out swallows the question.
                     answers = [item for item in error.arrived if isinstance(item, Frame)]
@@ -202,12 +207,19 @@ class Link(Line):
                         raise
                     dropped += error.arrived
                     continue
-                self._in_step, self._lost_texts, self._lost_searches = True, 0, 0
+                dropped += items
+                if problem is not None and attempt == 1:
+                    # What was refused is late or held: when it is held it will be refused again.
+                    continue
+                if problem is not None:
+                    raise problem
+                self._others_are_due, self._lost_searches = False, 0
+                self._in_step = True
                 return Place(attempt, tuple(dropped))
         raise AssertionError("the second attempt returns or raises")
 
-    def _search(self, limit: float) -> list[Item]:
-        """One question and its answer; what came before that."""
+    def _search(self, limit: float) -> tuple[list[Item], StationError | None]:
+        """One question and its answer: what came before that, and what speaks against it."""
         self._searches += 1
         question = search(self.channel, self._searches)
         transcript = Transcript(Purpose.PLACE, self.channel, question.what, question.data)
@@ -220,7 +232,8 @@ class Link(Line):
                                 [timed.item for timed in transcript.items])
             answered = len(transcript.items)
             self._settle(question, transcript, limit)
-        return [*transcript.late, *(timed.item for timed in transcript.items[:answered])]
+        items = [*transcript.late, *(timed.item for timed in transcript.items[:answered])]
+        return items, question.doubt if question.held else None
 
     def _is_answered(self, question: Search, transcript: Transcript, limit: float) -> bool:
         deadline = Deadline(limit)
@@ -232,20 +245,24 @@ class Link(Line):
         return False
 
     def _settle(self, question: Search, transcript: Transcript, limit: float) -> None:
-        """Wait until the line is silent behind the answer to a search.
+        """Wait until nothing that is not wanted can come behind the answer to a search.
 
-        What was taken for the answer may have been a late one: of a lost text, or of an earlier
-        search. Until each of them has come there has to be a long silence.
+        What was taken for the answer may have been a late one, of a lost text or of an earlier
+        search, and what the handset asks others for comes in an order of its own. How many answers
+        have come says nothing: one may come twice. So time has to pass without any.
         """
-        awaited = 1 + self._lost_texts + self._lost_searches
-        patience = 2 * limit if self._lost_searches else limit if awaited > 1 else _QUIET
-        start = time.monotonic()
+        patience = 2 * limit if self._lost_searches else limit if self._others_are_due else 0.0
+        start = last = time.monotonic()
         while True:
-            piece = self.port.read(_QUIET if question.finals >= awaited else patience)
+            now = time.monotonic()
+            piece = self.port.read(max(last + patience - now, _QUIET))
+            known = question.answers
             for item in self._decode(piece):
                 question.take(item)
                 transcript.add(transcript.seconds + time.monotonic() - start, item)
-            if not piece and not self._decoder.pending:
+            if question.answers > known:
+                last = time.monotonic()
+            elif not piece and not self._decoder.pending:
                 return
             if time.monotonic() - start > patience + _LONGEST_UNREST:
                 self._lost_searches += 1

@@ -19,9 +19,10 @@ from amt_station.errors import IncompleteAnswer, Refused, StationError, UsagePro
 from amt_station.exchange import AtReply, Exchange
 from amt_station.link import Link
 from amt_station.requests.at_commands import known_read
-from amt_station.requests.model import Request
+from amt_station.requests.model import Channel
 from amt_station.requests.operations import (NamedValue, Prepared, Value, prepare, problems,
                                              read_answer)
+from amt_station.requests.table import operations
 from amt_station.text import printable
 
 
@@ -81,7 +82,7 @@ def _ask(link: Link, prepared: Prepared,
 def _say(link: Link, prepared: Prepared,
          timeout: float | None) -> tuple[tuple[NamedValue, ...], Exchange | AtReply]:
     reply = link.at(prepared.text, timeout)
-    problem = reply_problem(reply, _causes(prepared.row, prepared))
+    problem = reply_problem(reply)
     if problem is not None:
         if reply.ok:
             link.doubt()
@@ -91,14 +92,19 @@ def _say(link: Link, prepared: Prepared,
     return (_read_text(prepared, _read_lines(reply)[-1]),), reply
 
 
-def reply_problem(reply: AtReply, causes: tuple[str, ...] = ()) -> StationError | None:
+def reply_problem(reply: AtReply) -> StationError | None:
     """Why a reply is no pass: an error, or a read that brought nothing."""
     said = printable(reply.sent)
     if not reply.ok:
-        return Refused(f"{said} was answered with {printable(reply.final)}", causes=causes)
+        return Refused(f"{said} was answered with {printable(reply.final)}",
+                       causes=_causes(reply.sent))
     prefix = known_read(reply.sent)
-    if prefix and not any(line.strip('"') for line in _read_lines(reply)):
+    found = _read_lines(reply)
+    if prefix and not any(line.strip('"') for line in found):
         return IncompleteAnswer(f"{said}: the answer holds no {prefix} line with a value")
+    if len(found) > 1:
+        return IncompleteAnswer(f"{said}: the answer holds {len(found)} {prefix} lines: it is not "
+                                "sure which is its own")
     return None
 
 
@@ -124,9 +130,13 @@ def _read_text(prepared: Prepared, text: str) -> NamedValue:
     return NamedValue(name, value, field.word(value), field.unit, field)
 
 
-def _causes(row: Request | None, prepared: Prepared) -> tuple[str, ...]:
-    service = row.service(prepared.channel) if row is not None else None
-    return service.causes(None, row.use(prepared.asked or {})) if service and row else ()
+def _causes(text: str) -> tuple[str, ...]:
+    """The table's reasons for the refusal of a text that a typed command sends too."""
+    for row, operation in operations():
+        service = row.service(Channel.PC)
+        if operation.at is not None and operation.at.text == text and service is not None:
+            return service.causes(None, row.use(operation.fixed))
+    return ()
 
 
 def run_operation(link: Link, path: tuple[str, ...], values: Mapping[str, object] | None = None,

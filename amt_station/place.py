@@ -17,8 +17,9 @@ from amt_station.requests.at_commands import FLUSH_COMMAND
 from amt_station.requests.catalogue import command_names
 from amt_station.requests.model import Channel
 from amt_station.requests.table import display_name, requests_by_id
+from amt_station.text import printable
 from amt_station.wire.atoms import RESULT_ATOM
-from amt_station.wire.decoder import Frame, Item, Text
+from amt_station.wire.decoder import Acknowledgement, Frame, Item, Text
 from amt_station.wire.envelope import encode_request
 from amt_station.wire.packet import Packet
 
@@ -38,17 +39,27 @@ class Place:
         return tuple(item.packet for item in self.dropped if isinstance(item, Frame))
 
 
+@dataclass(frozen=True)
+class Recovery:
+    """A cleared request buffer: how often it was flushed, and what came for held requests."""
+
+    attempts: int
+    late_answers: tuple[Packet, ...]
+
+
 class Search(Protocol):
     """One question and the recognition of its answer.
 
     ``doubt`` will be the error unless the answer comes soon: something came that speaks against it.
-    ``finals`` counts what may have been its answer.
+    ``held`` says that a request was refused meanwhile, which the handset may still hold.
+    ``answers`` counts what came that answers anything.
     """
 
     what: str
     data: bytes
     doubt: StationError | None
-    finals: int
+    held: bool
+    answers: int
 
     def take(self, item: Item) -> bool:
         """Look at the next item; whether it completes the answer."""
@@ -65,12 +76,15 @@ class TextSearch:
     what: str = FLUSH_COMMAND
     data: bytes = FLUSH_COMMAND.encode() + b"\r"
     doubt: StationError | None = None
-    finals: int = 0
+    held: bool = False
+    answers: int = 0
     reader: ReplyReader = field(default_factory=lambda: ReplyReader(FLUSH_COMMAND))
 
     def take(self, item: Item) -> bool:
         """As in ``Search``."""
+        self.answers += isinstance(item, (Frame, Acknowledgement))
         if isinstance(item, Frame) and judge.is_refusal(item.packet, Channel.PC):
+            self.held = True
             self.doubt = judge.refusal_of_text(FLUSH_COMMAND, item.packet)
         return isinstance(item, Text) and self._take_text(item.text)
 
@@ -78,11 +92,11 @@ class TextSearch:
         answered = False
         while final := self.reader.feed(text):
             text, self.reader = self.reader.rest, ReplyReader(FLUSH_COMMAND)
-            self.finals += 1
+            self.answers += 1
             if final == "OK":
                 answered = True
             else:
-                self.doubt = Refused(f"{FLUSH_COMMAND} was answered with {final}")
+                self.doubt = Refused(f"{FLUSH_COMMAND} was answered with {printable(final)}")
         return answered
 
 
@@ -107,10 +121,12 @@ class PacketSearch:
         self.what = display_name(self._packet.command)
         self.data = encode_request(self._packet, enveloped=False)
         self.doubt: StationError | None = None
-        self.finals = 1
+        self.held = False
+        self.answers = 0
 
     def take(self, item: Item) -> bool:
         """As in ``Search``."""
+        self.answers += isinstance(item, Frame)
         return (isinstance(item, Frame) and item.packet.command == self._packet.command + 1
                 and item.packet.result == _REFUSED and len(item.packet.atoms) == 1
                 and item.packet.atoms[0].id == RESULT_ATOM)

@@ -8,7 +8,7 @@ import os
 import select
 import termios
 import time
-from typing import Any, Callable, Protocol
+from typing import Any, Callable, Protocol, runtime_checkable
 
 import serial
 
@@ -18,6 +18,11 @@ _CHUNK = 4096
 _BUSY = (errno.EBUSY, errno.EAGAIN, errno.EWOULDBLOCK)
 _POLL_SECONDS = 0.05
 _LONGEST_POLL = 0x7FFFFFFF
+
+# Linux gives this control character no meaning: what it holds outlives every process, however it
+# ends, and goes with the device.
+_CONTROLS, _MEMORY = 6, termios.VSWTC
+_OUT_OF_STEP, _NOTHING = b"\x01", b"\0"
 
 
 class Port(Protocol):
@@ -33,6 +38,17 @@ class Port(Protocol):
 
     def close(self) -> None:
         """Give the port back."""
+
+
+@runtime_checkable
+class LastingPort(Port, Protocol):
+    """A port that remembers, beyond the process, whether an answer is still to come on it."""
+
+    def left_out_of_step(self) -> bool:
+        """Whether whoever used the port last left it without an answer."""
+
+    def remember(self, out_of_step: bool) -> None:
+        """Keep it in mind; nothing happens where the port cannot."""
 
 
 def _ready(fd: int, event: int, timeout: float) -> bool:
@@ -192,6 +208,25 @@ class SerialPort(_Waiting):
             raise _not_taken(f"port {self.name}", timeout) from error
         except (OSError, serial.SerialException) as error:
             raise NoPort(f"port {self.name} went away: {_reason(error)}") from error
+
+    def left_out_of_step(self) -> bool:
+        """As in ``LastingPort``; the terminal remembers it."""
+        try:
+            return (self._fd is not None
+                    and termios.tcgetattr(self._fd)[_CONTROLS][_MEMORY] == _OUT_OF_STEP)
+        except termios.error:
+            return False
+
+    def remember(self, out_of_step: bool) -> None:
+        """As in ``LastingPort``."""
+        if self._fd is None:
+            return
+        try:
+            attributes = termios.tcgetattr(self._fd)
+            attributes[_CONTROLS][_MEMORY] = _OUT_OF_STEP if out_of_step else _NOTHING
+            termios.tcsetattr(self._fd, termios.TCSANOW, attributes)
+        except termios.error:
+            pass  # no terminal, or one that went away: a new one has no past
 
     def close(self) -> None:
         """As in ``Port``."""

@@ -7,7 +7,6 @@
 #include "amt/amt-atom.h"
 #include "amt/amt-cfg.h"
 #include "amt/amt-command.h"
-#include "amt/amt-device/device-fail.h"
 #include "amt/amt-device/device-request.h"
 #include "amt/amt-device/hal-library.h"
 #include "amt/amt-handle/channel/reply.h"
@@ -30,12 +29,12 @@ int check_player()
 {
     int status = PUB_ERR_NONE;
     if (access(PLAYER_PATH, F_OK) != 0) {
-        status = amt_device_fail({AUDIO_HANDLER}, PUB_ERR_FILE, "access(\"" PLAYER_PATH "\") fail: %d - %s",
-                                 errno, strerror(errno));
+        status = pub_log_fail({g_amt_device_log, AUDIO_HANDLER}, PUB_ERR_FILE,
+                              "access(\"" PLAYER_PATH "\") fail: %d - %s", errno, strerror(errno));
     }
     if (access(g_amt_cfg.m_audio_file_a, F_OK) != 0) {
-        status = amt_device_fail({AUDIO_HANDLER}, PUB_ERR_FILE, "access(\"%s\") fail: %d - %s",
-                                 g_amt_cfg.m_audio_file_a, errno, strerror(errno));
+        status = pub_log_fail({g_amt_device_log, AUDIO_HANDLER}, PUB_ERR_FILE, "access(\"%s\") fail: %d - %s",
+                              g_amt_cfg.m_audio_file_a, errno, strerror(errno));
     }
     return status;
 }
@@ -52,8 +51,8 @@ int start_player()
              static_cast<long>(g_amt_cfg.m_audio_frame_count), g_amt_cfg.m_audio_file_a);
     errno = 0;
     if (pub_util_run_shell(command_a) != 0) {
-        return amt_device_fail({AUDIO_HANDLER}, PUB_ERR_FILE, "system(%s) fail: %d - %s", command_a, errno,
-                               strerror(errno));
+        return pub_log_fail({g_amt_device_log, AUDIO_HANDLER}, PUB_ERR_FILE, "system(%s) fail: %d - %s",
+                            command_a, errno, strerror(errno));
     }
     return PUB_ERR_NONE;
 }

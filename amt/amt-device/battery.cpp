@@ -4,8 +4,6 @@
 
 #include "amt/amt-atom.h"
 #include "amt/amt-command.h"
-#include "amt/amt-device/command.h"
-#include "amt/amt-device/device-fail.h"
 #include "amt/amt-device/device-file.h"
 #include "amt/amt-device/device-request.h"
 #include "amt/amt-handle/channel/factory-file.h"
@@ -37,8 +35,7 @@ int build_adc_rsp(amt_buf_st *rsp_ptr)
 {
     amt_reply_start(rsp_ptr, AMT_READ_ADC_RSPCMD);
     uint32_t value = 0;
-    const int status = amt_read_adc(&value);
-    if (status != PUB_ERR_NONE) {
+    if (const int status = amt_read_adc(&value); status != PUB_ERR_NONE) {
         return status;
     }
     amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_BATTERY_ADC, static_cast<int32_t>(value));
@@ -53,8 +50,7 @@ void hand_to_driver(int32_t a, int32_t b, int32_t c, int32_t d)
     const int status = pub_util_run_shell(command_a);
     PUB_LOG(g_amt_device_log, "%s", command_a);
     if (status < 0) {
-        pub_log_sys_call(g_amt_device_log, "system");
-        pub_log_error(g_amt_device_log, PUB_ERR_SYS_CALL, CHECK_HANDLER);
+        pub_log_call_error({g_amt_device_log, CHECK_HANDLER}, "system", PUB_ERR_SYS_CALL);
     }
 }
 
@@ -65,8 +61,7 @@ int build_calibration_rsp(const amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
     const int32_t b = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_ADC_CALIBRATION_B);
     const int32_t c = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_ADC_CALIBRATION_C);
     const int32_t d = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_ADC_CALIBRATION_D);
-    const int status = amt_write_adc_diff_value(a, b, c, d);
-    if (status != PUB_ERR_NONE) {
+    if (const int status = amt_write_adc_diff_value(a, b, c, d); status != PUB_ERR_NONE) {
         return status;
     }
     hand_to_driver(a, b, c, d);
@@ -82,14 +77,15 @@ int build_check_rsp(const amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
     if (command_id == AMT_CALIBRATE_ADC_CMD) {
         return build_calibration_rsp(req_ptr, rsp_ptr);
     }
-    return amt_device_fail({CHECK_HANDLER}, PUB_ERR_FAIL, "Invalid command id[%d]", command_id);
+    return pub_log_fail({g_amt_device_log, CHECK_HANDLER}, PUB_ERR_FAIL, "Invalid command id[%d]",
+                        command_id);
 }
 } // namespace
 
 int amt_read_adc(uint32_t *value_ptr)
 {
     if (value_ptr == nullptr) {
-        return amt_device_fail({}, PUB_ERR_FAIL, "Null pointer.");
+        return pub_log_fail(g_amt_device_log, PUB_ERR_FAIL, "Null pointer.");
     }
     if (amt_device_do_command(MEASURE_COMMAND) != PUB_ERR_NONE) {
         /* On purpose: a driver that cannot measure gives a value of 0, not an error. */
@@ -98,13 +94,13 @@ int amt_read_adc(uint32_t *value_ptr)
     pub_util_sleep_ms(MEASURE_MS);
     const pub_file_st file(DRIVER_FILE, pub_file_mode_en::READ);
     if (!file.is_open()) {
-        return amt_device_fail_call({}, "fopen");
+        return pub_log_error_call(g_amt_device_log, PUB_ERR_FAIL, "fopen");
     }
     const bool is_read = pub_file_scan_unsigned(file, value_ptr) == 1;
     if (is_read) {
         PUB_LOG(g_amt_device_log, "ADC value: %u", *value_ptr);
     } else {
-        amt_device_fail_call({}, "fscanf");
+        pub_log_error_call(g_amt_device_log, PUB_ERR_FAIL, "fscanf");
     }
     return is_read ? PUB_ERR_NONE : PUB_ERR_FAIL;
 }
@@ -115,10 +111,11 @@ int amt_write_adc_diff_value(int32_t a, int32_t b, int32_t c, int32_t d)
     snprintf(text_a, sizeof(text_a), CALIBRATION_FORMAT, a, b, c, d);
     const pub_file_step_en step = amt_factory_file_write(CALIBRATION_FILE, text_a);
     if (step == pub_file_step_en::OPEN_FAILED) {
-        return amt_device_fail_call({}, "fopen");
+        return pub_log_error_call(g_amt_device_log, PUB_ERR_FAIL, "fopen");
     }
     PUB_LOG(g_amt_device_log, "SAVA ADC value: %d %d %d %d", a, b, c, d);
-    return step == pub_file_step_en::DONE ? PUB_ERR_NONE : amt_device_fail_call({}, "fprintf");
+    return step == pub_file_step_en::DONE ? PUB_ERR_NONE
+                                          : pub_log_error_call(g_amt_device_log, PUB_ERR_FAIL, "fprintf");
 }
 
 int amt_device_battery_voltage(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)

@@ -2,7 +2,6 @@
 
 #include "amt/amt-command.h"
 #include "amt/amt-device/child-reaper.h"
-#include "amt/amt-device/device-fail.h"
 #include "amt/amt-device/device-request.h"
 #include "amt/amt-device/radio-step.h"
 #include "amt/amt-handle/channel/reply.h"
@@ -27,7 +26,7 @@ int switch_on_in_child(uint32_t channel, amt_buf_st *rsp_ptr)
     amt_radio_step_start(START_STEP);
     const int32_t answer = ldt_btCtrl(1);
     if (amt_radio_step_end(START_STEP, answer) != PUB_ERR_NONE) {
-        return amt_device_fail({HANDLER}, PUB_ERR_FILE, START_FAILED_TEXT);
+        return pub_log_fail({g_amt_device_log, HANDLER}, PUB_ERR_FILE, START_FAILED_TEXT);
     }
     return amt_handle_send_rsp_ok(channel, rsp_ptr, AMT_BLUETOOTH_RSPCMD);
 }
@@ -42,7 +41,7 @@ int amt_device_bt(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
     const pid_t service_pid = getpid();
     const pid_t child_pid = fork();
     if (child_pid < 0) {
-        return amt_device_fail({HANDLER}, PUB_ERR_FILE, START_FAILED_TEXT);
+        return pub_log_fail({g_amt_device_log, HANDLER}, PUB_ERR_FILE, START_FAILED_TEXT);
     }
     if (child_pid == 0) {
         amt_child_die_with(service_pid);

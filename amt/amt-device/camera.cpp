@@ -5,7 +5,6 @@
 
 #include "amt/amt-atom.h"
 #include "amt/amt-command.h"
-#include "amt/amt-device/device-fail.h"
 #include "amt/amt-device/device-request.h"
 #include "amt/amt-handle/channel/reply.h"
 #include "amt/amt-packet.h"
@@ -37,13 +36,12 @@ int select_preview(int32_t camera)
 {
     const int fd = open_camera();
     if (fd < 0) {
-        pub_log_error(g_amt_device_log, PUB_ERR_FAIL, PREVIEW_HANDLER);
-        return PUB_ERR_FAIL;
+        return pub_log_error({g_amt_device_log, PREVIEW_HANDLER}, PUB_ERR_FAIL);
     }
     int32_t value = camera;
     int status = PUB_ERR_NONE;
     if (ioctl(fd, SARVOCAM_IOCTL_PREVIEW, &value) < 0) {
-        status = amt_device_fail_call({PREVIEW_HANDLER}, "ioctl");
+        status = pub_log_error_call({g_amt_device_log, PREVIEW_HANDLER}, PUB_ERR_FAIL, "ioctl");
     }
     close(fd);
     return status;
@@ -55,7 +53,7 @@ int run_test(int fd, int32_t control_id, int32_t *verdict_ptr)
     int32_t value = TEST_INPUT;
     if (ioctl(fd, VIDIOC_S_INPUT, &value) < 0) {
         if (errno != ENODEV) {
-            return amt_device_fail_call({CONTROL_HANDLER}, "ioctl");
+            return pub_log_error_call({g_amt_device_log, CONTROL_HANDLER}, PUB_ERR_FAIL, "ioctl");
         }
         /* A camera without this input is a finished test. */
         *verdict_ptr = RESULT_NO_INPUT;
@@ -65,7 +63,7 @@ int run_test(int fd, int32_t control_id, int32_t *verdict_ptr)
     value = control_id == CONTROL_FIRST ? 0 : 1;
     const int verdict = ioctl(fd, SARVOCAM_IOCTL_SELF_TEST, &value);
     if (verdict < 0) {
-        return amt_device_fail_call({CONTROL_HANDLER}, "ioctl");
+        return pub_log_error_call({g_amt_device_log, CONTROL_HANDLER}, PUB_ERR_FAIL, "ioctl");
     }
     *verdict_ptr = verdict;
     PUB_LOG(g_amt_device_log, "update result: %d", verdict);
@@ -76,7 +74,7 @@ int test_camera(int32_t control_id, int32_t *verdict_ptr)
 {
     const int fd = open_camera();
     if (fd < 0) {
-        return amt_device_fail_call({CONTROL_HANDLER}, "open");
+        return pub_log_error_call({g_amt_device_log, CONTROL_HANDLER}, PUB_ERR_FAIL, "open");
     }
     const int status = run_test(fd, control_id, verdict_ptr);
     close(fd);
@@ -102,8 +100,7 @@ int amt_device_camera(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr
     }
     const uint8_t command_id = amt_packet_get_cmd(req_ptr->m_buf_a);
     if (command_id != AMT_CAMERA_PREVIEW_CMD && command_id != AMT_SECOND_CAMERA_PREVIEW_CMD) {
-        pub_log_error(g_amt_device_log, PUB_ERR_FAIL);
-        return PUB_ERR_FAIL;
+        return pub_log_error(g_amt_device_log, PUB_ERR_FAIL);
     }
     const int status = select_preview(command_id == AMT_CAMERA_PREVIEW_CMD ? PREVIEW_MAIN : PREVIEW_SECOND);
     if (status != PUB_ERR_NONE) {
@@ -120,11 +117,10 @@ int amt_device_camera_control(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st 
     const int32_t control_id = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_CAMERA_CONTROL);
     log_control_id(control_id);
     if (control_id != CONTROL_FIRST && control_id != CONTROL_SECOND) {
-        return amt_device_fail({}, PUB_ERR_FAIL, "invalid control_id: %d", control_id);
+        return pub_log_fail(g_amt_device_log, PUB_ERR_FAIL, "invalid control_id: %d", control_id);
     }
     int32_t verdict = 0;
-    const int status = test_camera(control_id, &verdict);
-    if (status != PUB_ERR_NONE) {
+    if (const int status = test_camera(control_id, &verdict); status != PUB_ERR_NONE) {
         return status;
     }
     amt_reply_start(rsp_ptr, AMT_CAMERA_CONTROL_RSPCMD);

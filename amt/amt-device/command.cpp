@@ -1,9 +1,8 @@
-#include "amt/amt-device/command.h"
+#include "amt/amt-device/device-file.h"
 
 #include <errno.h>
 #include <string.h>
 
-#include "amt/amt-device/device-fail.h"
 #include "amt/amt-log.h"
 #include "pub/error.h"
 #include "pub/util/process.h"
@@ -23,14 +22,8 @@ int amt_device_do_command(const char *command)
             PUB_LOG(g_amt_device_log, "system(%s) OK", command);
             return PUB_ERR_NONE;
         }
-        amt_device_fail({}, PUB_ERR_FILE, "system(%s) FAIL[count = %d]: %d - %s", command, attempt, errno,
-                        strerror(errno));
+        pub_log_fail(g_amt_device_log, PUB_ERR_FILE, "system(%s) FAIL[count = %d]: %d - %s", command, attempt,
+                     errno, strerror(errno));
     }
     return PUB_ERR_FAIL;
-}
-
-void amt_device_run(const char *command)
-{
-    const int ignored = pub_util_run_shell(command);
-    static_cast<void>(ignored);
 }

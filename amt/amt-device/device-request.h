@@ -55,7 +55,7 @@ int amt_device_camera(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr
  * service acknowledges at once and returns; the child switches the chip on and acknowledges a second time,
  * or returns PUB_ERR_FILE, as the service does when there is no child to be had. BOTH return to the caller,
  * parent and child alike; the caller finishes the request in either, and whoever reads from the line next
- * ends the process that is not the service's own (see service-process.h).
+ * ends the process that is not the service's own (see process-end.h).
  */
 int amt_device_bt(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr);
 

@@ -6,11 +6,11 @@
 
 namespace {
 
-int fail_load(const amt_device_place_st &place)
+int fail_load(const pub_log_place_st &place)
 {
     const char *text = dlerror();
     const int status =
-        amt_device_fail(place, PUB_ERR_FILE, "call dlopen fail: - %s", text == nullptr ? "" : text);
+        pub_log_fail(place, PUB_ERR_FILE, "call dlopen fail: - %s", text == nullptr ? "" : text);
     /* Lets go of the text now: at the thread's end that would happen inside a signal handler. */
     dlerror();
     return status;
@@ -19,7 +19,7 @@ int fail_load(const amt_device_place_st &place)
 } // namespace
 
 int amt_hal_load(const char *path, const char *name, amt_hal_entry_st *entry_ptr,
-                 const amt_device_place_st &place)
+                 const pub_log_place_st &place)
 {
     entry_ptr->m_library_ptr = dlopen(path, RTLD_LAZY);
     if (entry_ptr->m_library_ptr == nullptr) {

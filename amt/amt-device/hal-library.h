@@ -1,6 +1,6 @@
 #pragma once
 
-#include "amt/amt-device/device-fail.h"
+#include "amt/amt-log.h"
 
 /* An entry of a hardware-abstraction library, loaded for one call. */
 struct amt_hal_entry_st
@@ -14,7 +14,7 @@ struct amt_hal_entry_st
  * of the place and the loader's error text. After a failed lookup the library stays loaded, on purpose.
  */
 int amt_hal_load(const char *path, const char *name, amt_hal_entry_st *entry_ptr,
-                 const amt_device_place_st &place = {});
+                 const pub_log_place_st &place = g_amt_device_log);
 
 /* Unloads what amt_hal_load has loaded. */
 void amt_hal_unload(amt_hal_entry_st *entry_ptr);

@@ -1,13 +1,10 @@
 #include "amt/amt-device/radio-address.h"
 
-#include <errno.h>
 #include <stdio.h>
 #include <string.h>
 
 #include "amt/amt-atom.h"
 #include "amt/amt-command.h"
-#include "amt/amt-device/command.h"
-#include "amt/amt-device/device-fail.h"
 #include "amt/amt-device/device-request.h"
 #include "amt/amt-device/radio-step.h"
 #include "amt/amt-handle/channel/factory-file.h"
@@ -17,6 +14,7 @@
 #include "platform/include/ldt.h"
 #include "pub/error.h"
 #include "pub/file/file.h"
+#include "pub/util/process.h"
 
 namespace {
 
@@ -32,26 +30,20 @@ void expose(const char *folder)
 {
     char command_a[COMMAND_SIZE];
     snprintf(command_a, sizeof(command_a), "chmod -R 555 %s", folder);
-    amt_device_run(command_a);
+    pub_util_run_shell(command_a);
     PUB_LOG(g_amt_device_log, "path = %s change to chmod -R 555", folder);
-}
-
-int fail_bt_open(const amt_device_place_st &place = {BT_HANDLER})
-{
-    return amt_device_fail(place, PUB_ERR_FILE, "open(\"%s\") fail: %d - %s", AMT_BT_ADDRESS_FILE, errno,
-                           strerror(errno));
 }
 
 int read_bt_address(char *address_a)
 {
     const pub_file_step_en step = pub_file_read_word(AMT_BT_ADDRESS_FILE, address_a, AMT_RADIO_ADDRESS_SIZE);
     if (step == pub_file_step_en::OPEN_FAILED) {
-        fail_bt_open();
+        amt_factory_file_fail_open(AMT_BT_ADDRESS_FILE, {g_amt_device_log, BT_HANDLER});
         /* On purpose: a missing file is reported as a bad request. */
         return PUB_ERR_PARAM;
     }
     if (step != pub_file_step_en::DONE) {
-        return amt_device_fail({BT_HANDLER}, PUB_ERR_FAIL, "read not completed");
+        return pub_log_fail({g_amt_device_log, BT_HANDLER}, PUB_ERR_FAIL, "read not completed");
     }
     PUB_LOG(g_amt_device_log, "read BT address: %s", address_a);
     return PUB_ERR_NONE;
@@ -61,10 +53,10 @@ int read_bt_address(char *address_a)
 int finish_bt_write(bool is_address, bool is_written, const char *address)
 {
     if (!is_address) {
-        return amt_device_fail({BT_HANDLER}, PUB_ERR_PARAM, "unknown BT address");
+        return pub_log_fail({g_amt_device_log, BT_HANDLER}, PUB_ERR_PARAM, "unknown BT address");
     }
     if (!is_written) {
-        return amt_device_fail({BT_HANDLER}, PUB_ERR_FILE, "fputs() fail");
+        return pub_log_fail({g_amt_device_log, BT_HANDLER}, PUB_ERR_FILE, "fputs() fail");
     }
     PUB_LOG(g_amt_device_log, "write BT address: %s", address);
     expose("/amt/BT");
@@ -78,7 +70,7 @@ int write_bt_address(const char *address, uint32_t length)
     const pub_file_step_en step =
         pub_file_write(AMT_BT_ADDRESS_FILE, is_address ? address : "", is_address ? "\n" : "");
     if (step == pub_file_step_en::OPEN_FAILED) {
-        return fail_bt_open();
+        return amt_factory_file_fail_open(AMT_BT_ADDRESS_FILE, {g_amt_device_log, BT_HANDLER});
     }
     const int status = finish_bt_write(is_address, step == pub_file_step_en::DONE, address);
     amt_factory_file_sync();
@@ -88,7 +80,7 @@ int write_bt_address(const char *address, uint32_t length)
 int read_wifi_address(char *address_a)
 {
     if (amt_read_wifi_address(address_a) != PUB_ERR_NONE) {
-        return amt_device_fail({WIFI_HANDLER}, PUB_ERR_FAIL, "read error");
+        return pub_log_fail({g_amt_device_log, WIFI_HANDLER}, PUB_ERR_FAIL, "read error");
     }
     PUB_LOG(g_amt_device_log, "read WIFI address: %s", address_a);
     return PUB_ERR_NONE;
@@ -97,7 +89,7 @@ int read_wifi_address(char *address_a)
 int write_wifi_address(const char *address, uint32_t)
 {
     if (amt_write_wifi_address(address) != PUB_ERR_NONE) {
-        return amt_device_fail({WIFI_HANDLER}, PUB_ERR_FAIL, "write error");
+        return pub_log_fail({g_amt_device_log, WIFI_HANDLER}, PUB_ERR_FAIL, "write error");
     }
     PUB_LOG(g_amt_device_log, "Write WIFI address: %s", address);
     expose("/amt/WIFI");
@@ -169,13 +161,17 @@ int operate(const radio_st &radio, int32_t operation, const amt_buf_st *req_ptr,
     case 2:
         return check(radio);
     default:
-        return amt_device_fail({radio.m_check_step.m_handler_ptr}, PUB_ERR_PARAM, "unknown operation: %d",
-                               operation);
+        return pub_log_fail({g_amt_device_log, radio.m_check_step.m_handler_ptr}, PUB_ERR_PARAM,
+                            "unknown operation: %d", operation);
     }
 }
 
-int serve(const radio_st &radio, uint32_t channel, const amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
+int serve(const radio_st &radio, uint32_t channel, const amt_buf_st *req_ptr, amt_buf_st *rsp_ptr,
+          const pub_log_place_st &place = g_amt_device_log)
 {
+    if (amt_reply_enter(place, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
+        return PUB_ERR_PARAM;
+    }
     amt_reply_start(rsp_ptr, radio.m_rsp_id);
     const int32_t operation = amt_packet_get_int(req_ptr->m_buf_a, radio.m_operation_atom);
     PUB_LOG(g_amt_device_log, "%s op_type:%d", radio.m_check_step.m_handler_ptr, operation);
@@ -201,16 +197,10 @@ uint32_t amt_radio_address_get(const amt_buf_st *req_ptr, uint8_t atom_id, char 
 
 int amt_device_bt_address(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    if (amt_reply_enter(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
-        return PUB_ERR_PARAM;
-    }
     return serve(BT_RADIO, channel, req_ptr, rsp_ptr);
 }
 
 int amt_device_wifi_address(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
-    if (amt_reply_enter(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
-        return PUB_ERR_PARAM;
-    }
     return serve(WIFI_RADIO, channel, req_ptr, rsp_ptr);
 }

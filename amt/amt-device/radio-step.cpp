@@ -18,7 +18,6 @@ int amt_radio_step_check(const amt_radio_step_st &step, int32_t answer, int line
     if (answer == 0) {
         return PUB_ERR_NONE;
     }
-    pub_log_error(*step.m_source_ptr, PUB_ERR_FAIL, step.m_handler_ptr, line);
-    PUB_LOG(*step.m_source_ptr, "%s error. call %s fail: %d", step.m_title_ptr, step.m_call_ptr, answer);
-    return PUB_ERR_FAIL;
+    return pub_log_fail({*step.m_source_ptr, step.m_handler_ptr, line}, PUB_ERR_FAIL,
+                        "%s error. call %s fail: %d", step.m_title_ptr, step.m_call_ptr, answer);
 }

@@ -4,7 +4,6 @@
 
 #include "amt/amt-atom.h"
 #include "amt/amt-command.h"
-#include "amt/amt-device/device-fail.h"
 #include "amt/amt-device/device-request.h"
 #include "amt/amt-device/hal-library.h"
 #include "amt/amt-handle/channel/reply.h"
@@ -24,7 +23,8 @@ constexpr uint32_t EMMC_INFO_SIZE = 100;
  * made, or PUB_ERR_FILE with *answer_ptr left alone.
  */
 template <typename entry_func, typename call_func>
-int call_hal(const char *name, int32_t *answer_ptr, call_func call, const amt_device_place_st &place = {})
+int call_hal(const char *name, int32_t *answer_ptr, call_func call,
+             const pub_log_place_st &place = g_amt_device_log)
 {
     amt_hal_entry_st entry = {};
     if (amt_hal_load(AMT_MISC_HAL_LIBRARY, name, &entry, place) != PUB_ERR_NONE) {
@@ -58,7 +58,7 @@ int amt_usb_charge_ctrl(int32_t mode)
 {
     PUB_LOG(g_amt_device_log, "will call amt_usb_charger_enable , type:%d.", mode);
     if (mode < 0) {
-        return amt_device_fail({}, PUB_ERR_PARAM, "parameter type(%d) is not valid.", mode);
+        return pub_log_fail(g_amt_device_log, PUB_ERR_PARAM, "parameter type(%d) is not valid.", mode);
     }
     int32_t answer = 0;
     const int status = call_hal<amt_misc_hal_usb_charger_enable_func>(
@@ -105,8 +105,7 @@ int amt_enter_idle(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
     if (amt_reply_enter(g_amt_device_log, channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
-    const int status = amt_make_ue_enter_idle();
-    if (status != PUB_ERR_NONE) {
+    if (const int status = amt_make_ue_enter_idle(); status != PUB_ERR_NONE) {
         return status;
     }
     PUB_LOG(g_amt_device_log, "enter_idle return OK.");
@@ -123,9 +122,7 @@ int amt_modem_boot_dl_fin_read(uint32_t channel, amt_buf_st *, amt_buf_st *rsp_p
     PUB_LOG(g_amt_handle_log, "amt_modem_boot_dl_fin_read finished. flag:%" PRId32 "; ret_val:%d.", flag,
             status);
     if (status != PUB_ERR_NONE) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
-        PUB_LOG(g_amt_handle_log, "read error");
-        return PUB_ERR_FAIL;
+        return pub_log_fail(g_amt_handle_log, PUB_ERR_FAIL, "read error");
     }
     amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_BOOT_DOWNLOAD, flag);
     return amt_reply_finish_ok(channel, rsp_ptr);
@@ -139,7 +136,7 @@ int amt_device_emmc_info(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_
     amt_reply_start(rsp_ptr, AMT_READ_EMMC_INFO_RSPCMD);
     char text_a[EMMC_INFO_SIZE] = {};
     if (amt_read_emmc_info(text_a) != PUB_ERR_NONE) {
-        return amt_device_fail({}, PUB_ERR_FAIL, "read error");
+        return pub_log_fail(g_amt_device_log, PUB_ERR_FAIL, "read error");
     }
     PUB_LOG(g_amt_device_log, "read emmc_info: %s", text_a);
     amt_packet_add_string(rsp_ptr->m_buf_a, AMT_ATOM_EMMC_INFO, text_a);

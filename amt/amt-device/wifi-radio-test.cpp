@@ -2,8 +2,6 @@
 
 #include "amt/amt-atom.h"
 #include "amt/amt-command.h"
-#include "amt/amt-device/command.h"
-#include "amt/amt-device/device-fail.h"
 #include "amt/amt-device/device-request.h"
 #include "amt/amt-device/embed/embedded-data.h"
 #include "amt/amt-device/radio-step.h"
@@ -11,6 +9,7 @@
 #include "amt/amt-packet.h"
 #include "platform/include/ldt.h"
 #include "pub/error.h"
+#include "pub/util/process.h"
 
 namespace {
 
@@ -33,30 +32,16 @@ constexpr amt_radio_step_st RX_STOP_STEP = {&g_amt_device_log, HANDLER, "WIFI-RX
 bool g_wifi_is_running = false;
 uint8_t g_wifi_rx_channel = 0;
 
-/* A number of the request, little-endian, of 1 or 2 bytes. Returns whether it is there. */
-bool get_number(const amt_buf_st *req_ptr, uint8_t atom_id, uint32_t size, uint16_t *value_ptr)
+/* A number of the request, little-endian, of 1 or 2 bytes. A missing one fails with the text. */
+int get_number(const amt_buf_st *req_ptr, uint8_t atom_id, uint32_t size, uint16_t *value_ptr,
+               const char *missing_text, const pub_log_place_st &place = {g_amt_device_log, HANDLER})
 {
     uint8_t byte_a[2] = {};
     if (amt_packet_get_bytes(req_ptr->m_buf_a, atom_id, byte_a, size) == 0) {
-        return false;
+        return pub_log_fail(place, PUB_ERR_FAIL, "%s", missing_text);
     }
     *value_ptr = static_cast<uint16_t>(byte_a[0] | byte_a[1] << 8);
-    return true;
-}
-
-bool get_channel(const amt_buf_st *req_ptr, uint16_t *value_ptr)
-{
-    return get_number(req_ptr, AMT_ATOM_WIFI_CHANNEL, 1, value_ptr);
-}
-
-bool get_rate(const amt_buf_st *req_ptr, uint16_t *value_ptr)
-{
-    return get_number(req_ptr, AMT_ATOM_WIFI_RATE, 2, value_ptr);
-}
-
-int fail(const char *text, const amt_device_place_st &place = {HANDLER})
-{
-    return amt_device_fail(place, PUB_ERR_FAIL, "%s", text);
+    return PUB_ERR_NONE;
 }
 
 int start_wifi(const amt_buf_st *, amt_buf_st *)
@@ -86,14 +71,11 @@ int start_tx(const amt_buf_st *req_ptr, amt_buf_st *)
     uint16_t channel = 0;
     uint16_t rate = 0;
     uint16_t power = 0;
-    if (!get_channel(req_ptr, &channel)) {
-        return fail("Tx get channel error");
-    }
-    if (!get_rate(req_ptr, &rate)) {
-        return fail("Tx get rate error");
-    }
-    if (!get_number(req_ptr, AMT_ATOM_WIFI_POWER, 2, &power)) {
-        return fail("Tx get power error");
+    if (get_number(req_ptr, AMT_ATOM_WIFI_CHANNEL, 1, &channel, "Tx get channel error") != PUB_ERR_NONE ||
+        get_number(req_ptr, AMT_ATOM_WIFI_RATE, 2, &rate, "Tx get rate error") != PUB_ERR_NONE ||
+        get_number(req_ptr, AMT_ATOM_WIFI_POWER, 2, &power, "Tx get power error") != PUB_ERR_NONE)
+    {
+        return PUB_ERR_FAIL;
     }
     PUB_LOG(g_amt_device_log, "WIFI-TX-start start. channel:%d; power:%d; rate:%d", channel, power, rate);
     return amt_radio_step_end(TX_START_STEP, ldt_TxTest(1, power, rate, channel));
@@ -109,11 +91,10 @@ int start_rx(const amt_buf_st *req_ptr, amt_buf_st *)
 {
     uint16_t channel = 0;
     uint16_t rate = 0;
-    if (!get_channel(req_ptr, &channel)) {
-        return fail("Rx get channel error");
-    }
-    if (!get_rate(req_ptr, &rate)) {
-        return fail("Rx get rate error");
+    if (get_number(req_ptr, AMT_ATOM_WIFI_CHANNEL, 1, &channel, "Rx get channel error") != PUB_ERR_NONE ||
+        get_number(req_ptr, AMT_ATOM_WIFI_RATE, 2, &rate, "Rx get rate error") != PUB_ERR_NONE)
+    {
+        return PUB_ERR_FAIL;
     }
     PUB_LOG(g_amt_device_log, "WIFI-RX-start start. channel:%d; rate:%d", channel, rate);
     const int status = amt_radio_step_end(RX_START_STEP, ldt_RxTest(1, channel, rate, nullptr));
@@ -153,13 +134,13 @@ constexpr uint8_t SUB_COMMAND_MAX = sizeof(SUB_COMMAND_A) / sizeof(SUB_COMMAND_A
 int operate(uint8_t sub_command, const amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
 {
     if (sub_command == 0 || sub_command > SUB_COMMAND_MAX) {
-        amt_device_fail({HANDLER}, PUB_ERR_PARAM, "unknown operation: %u", sub_command);
-        amt_device_run("echo the subcmd is invalid >> " TRACE_FILE);
+        pub_log_fail({g_amt_device_log, HANDLER}, PUB_ERR_PARAM, "unknown operation: %u", sub_command);
+        pub_util_run_shell("echo the subcmd is invalid >> " TRACE_FILE);
         return PUB_ERR_PARAM;
     }
     const sub_command_st &row = SUB_COMMAND_A[sub_command - 1];
     if (row.m_needs_wifi && !g_wifi_is_running) {
-        return fail("WIFI is not running");
+        return pub_log_fail({g_amt_device_log, HANDLER}, PUB_ERR_FAIL, "WIFI is not running");
     }
     return row.m_func(req_ptr, rsp_ptr);
 }
@@ -170,7 +151,7 @@ void trace_sub_command(uint8_t sub_command)
     char command_a[COMMAND_SIZE];
     snprintf(command_a, sizeof(command_a), " echo the cmd value received from pc is : %u >> " TRACE_FILE,
              sub_command);
-    amt_device_run(command_a);
+    pub_util_run_shell(command_a);
 }
 
 } // namespace
@@ -186,8 +167,5 @@ int amt_device_wifi_rtx_test(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *
     trace_sub_command(sub_command);
     amt_packet_add_bytes(rsp_ptr->m_buf_a, AMT_ATOM_WIFI_SUB_COMMAND, &sub_command, sizeof(sub_command));
     const int status = operate(sub_command, req_ptr, rsp_ptr);
-    if (status != PUB_ERR_NONE) {
-        return status;
-    }
-    return amt_reply_finish_ok(channel, rsp_ptr);
+    return status == PUB_ERR_NONE ? amt_reply_finish_ok(channel, rsp_ptr) : status;
 }

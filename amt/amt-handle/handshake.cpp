@@ -1,6 +1,7 @@
 #include "amt/amt-handle/handshake.h"
 
 #include <atomic>
+#include <mutex>
 #include <pthread.h>
 #include <signal.h>
 #include <string.h>
@@ -39,31 +40,20 @@ struct handshake_st
     amt_timer_st m_data_timer;
 };
 
-pthread_mutex_t g_mutex = PTHREAD_MUTEX_INITIALIZER;
+std::mutex g_mutex;
 handshake_st g_handshake; /* under g_mutex */
 
 std::atomic<bool> g_is_ac_power;     /* the start was refused because of AC power */
 std::atomic<bool> g_is_property_set; /* once a process */
 
-struct lock_st
-{
-    lock_st()
-    {
-        pthread_mutex_lock(&g_mutex);
-    }
-    ~lock_st()
-    {
-        pthread_mutex_unlock(&g_mutex);
-    }
-    lock_st(const lock_st &) = delete;
-    lock_st &operator=(const lock_st &) = delete;
-};
-
-/* The end may come by a fault on the very thread that holds the lock, and then goes on without. */
+/*
+ * The end may come by a fault on the very thread that holds the lock, and then goes on without. That thread may
+ * not call try_lock, but POSIX lets it ask.
+ */
 bool lock_for_the_end()
 {
     for (int i = 0; i < END_ATTEMPTS; i++) {
-        if (pthread_mutex_trylock(&g_mutex) == 0) {
+        if (pthread_mutex_trylock(g_mutex.native_handle()) == 0) {
             return true;
         }
         pub_util_sleep_ms(1);
@@ -104,7 +94,7 @@ bool is_waiting_for_data()
 /* A timer that was deleted when its call was on the way already has not run out. */
 bool has_run_out(const amt_timer_st &timer)
 {
-    const lock_st lock;
+    const std::lock_guard<std::mutex> lock(g_mutex);
     return is_armed(timer);
 }
 
@@ -183,7 +173,7 @@ void amt_set_handshake_property()
 
 bool is_ready()
 {
-    const lock_st lock;
+    const std::lock_guard<std::mutex> lock(g_mutex);
     return g_handshake.m_is_ready;
 }
 
@@ -214,7 +204,7 @@ int amt_handshake_ask_permission()
     }
     PUB_LOG(g_amt_handle_log, "will treat handshake.");
     {
-        const lock_st lock;
+        const std::lock_guard<std::mutex> lock(g_mutex);
         g_handshake.m_is_ready = false;
         g_handshake.m_is_done = false;
         g_handshake.m_is_over = false;
@@ -231,20 +221,20 @@ int amt_handshake_ask_permission()
 void amt_handshake_begin()
 {
     if (g_usb_activate != 0) {
-        const lock_st lock;
+        const std::lock_guard<std::mutex> lock(g_mutex);
         arm(&g_handshake.m_link_timer, handle_link_time_out, LINK_SECONDS);
     }
 }
 
 void amt_handshake_link_up()
 {
-    const lock_st lock;
+    const std::lock_guard<std::mutex> lock(g_mutex);
     set_ready();
 }
 
 void amt_handshake_link_down()
 {
-    const lock_st lock;
+    const std::lock_guard<std::mutex> lock(g_mutex);
     g_handshake.m_is_ready = false;
 }
 
@@ -257,7 +247,7 @@ void amt_handshake_modem_data()
     if (!is_ready() && read_shown(text_a, USB_STATE_FILE) && strstr(text_a, "CONFIGURED") != nullptr) {
         amt_handshake_link_up();
     }
-    const lock_st lock;
+    const std::lock_guard<std::mutex> lock(g_mutex);
     if (is_waiting_for_data() && !is_armed(g_handshake.m_data_timer)) {
         PUB_LOG(g_amt_handle_log, "will create timer.");
         arm(&g_handshake.m_data_timer, handle_data_time_out, DATA_SECONDS);
@@ -269,7 +259,7 @@ bool amt_handshake_pc_data()
     if (g_usb_activate == 0) {
         return false;
     }
-    const lock_st lock;
+    const std::lock_guard<std::mutex> lock(g_mutex);
     if (!g_handshake.m_is_ready) {
         set_ready();
     }
@@ -297,7 +287,7 @@ void amt_handle_exit_by_handshake()
     amt_set_handshake_property();
     g_is_property_set = true;
     {
-        const lock_st lock;
+        const std::lock_guard<std::mutex> lock(g_mutex);
         stop_timing();
     }
     kill(getpid(), SIGTERM);
@@ -308,7 +298,7 @@ void amt_handshake_end()
     const bool is_locked = lock_for_the_end();
     stop_timing();
     if (is_locked) {
-        pthread_mutex_unlock(&g_mutex);
+        g_mutex.unlock();
     }
     if (g_usb_activate != 0 && !g_is_property_set.exchange(true)) {
         amt_set_handshake_property();

@@ -9,7 +9,7 @@
 #include "amt/amt-cfg.h"
 #include "amt/amt-handle/channel/at-io.h"
 #include "amt/amt-handle/channel/context.h"
-#include "amt/amt-handle/channel/service-process.h"
+#include "amt/amt-handle/channel/process-end.h"
 #include "amt/amt-handle/channel/tty.h"
 #include "amt/amt-handle/handshake.h"
 #include "amt/amt-handle/reader/identity-write.h"
@@ -72,18 +72,14 @@ int set_serial_dev_attr(int fd)
 {
     termios attr = {};
     if (tcgetattr(fd, &attr) != 0) {
-        pub_log_sys_call(g_amt_handle_log, "tcgetattr");
-        pub_log_error(g_amt_handle_log, PUB_ERR_SYS_CALL);
-        return PUB_ERR_SYS_CALL;
+        return pub_log_call_error(g_amt_handle_log, "tcgetattr", PUB_ERR_SYS_CALL);
     }
     attr.c_cflag &= ~static_cast<tcflag_t>(CBAUD | CBAUDEX);
     attr.c_cflag |= B115200;
     attr.c_iflag &= ~static_cast<tcflag_t>(INLCR | ICRNL | IXON);
     attr.c_oflag &= ~static_cast<tcflag_t>(OPOST);
     if (tcsetattr(fd, TCSANOW, &attr) != 0) {
-        pub_log_sys_call(g_amt_handle_log, "tcsetattr");
-        pub_log_error(g_amt_handle_log, PUB_ERR_SYS_CALL);
-        return PUB_ERR_SYS_CALL;
+        return pub_log_call_error(g_amt_handle_log, "tcsetattr", PUB_ERR_SYS_CALL);
     }
     return PUB_ERR_NONE;
 }
@@ -100,16 +96,14 @@ int open_pc_tty()
 
 /* Starts a worker of the PC path, unless the path has failed already. */
 int start_pc_worker(int status, amt_worker_st *worker_ptr, void (*loop)(),
-                    const char *func = __builtin_FUNCTION(), int line = __builtin_LINE())
+                    const pub_log_place_st &place = g_amt_handle_log)
 {
     const int error = status == PUB_ERR_NONE ? amt_worker_start(worker_ptr, loop) : 0;
     if (error == 0) {
         return status;
     }
     errno = error;
-    pub_log_error(g_amt_handle_log, PUB_ERR_FILE, func, line);
-    PUB_LOG(g_amt_handle_log, "pthread_create(): %d - %s", error, strerror(error));
-    return PUB_ERR_FILE;
+    return pub_log_fail(place, PUB_ERR_FILE, "pthread_create(): %d - %s", error, strerror(error));
 }
 
 int init_for_amt_1_4()
@@ -150,16 +144,14 @@ void close_pty()
     }
 }
 
-int start_app_reader(const char *func = __builtin_FUNCTION(), int line = __builtin_LINE())
+int start_app_reader(const pub_log_place_st &place = g_amt_handle_log)
 {
     const int error = amt_worker_start(&g_handle_context.m_app_reader, amt_handle_read_app_loop);
     if (error == 0) {
         return PUB_ERR_NONE;
     }
     errno = error;
-    pub_log_error(g_amt_handle_log, PUB_ERR_FILE, func, line);
-    PUB_LOG(g_amt_handle_log, "pthread_create() fail: %d", error);
-    return PUB_ERR_FILE;
+    return pub_log_fail(place, PUB_ERR_FILE, "pthread_create() fail: %d", error);
 }
 
 int init_for_amt_2_3()

@@ -177,14 +177,14 @@ def _view(settings: Settings) -> Any:
 def _finish(settings: Settings, runner: Runner, document: Mapping[str, Any],
             files: Sequence[RecordFile], outputs: Outputs) -> int:
     status = runner.exit_status
-    if settings.json:
-        console.data_json(document)
     if runner.record_problem is not None:
-        # Rather here than nowhere.
+        # Rather here than nowhere, and before standard output: that may go to the same full disk.
         print(runner.record.text(), end="", file=sys.stderr, flush=True)
         console.complain(printable(str(runner.record_problem)))
     elif files:
         console.talk(f"record: {printable(str(files[0].path))}")
+    if settings.json:
+        console.data_json(document)
     try:
         outputs.write([document])
     except StationError as error:

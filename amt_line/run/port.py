@@ -5,7 +5,7 @@ from __future__ import annotations
 import time
 
 from amt_line.run.stop import SLICE, Stop
-from amt_station.port import Port
+from amt_station.port import LastingPort, Port
 
 
 class StoppablePort:
@@ -33,6 +33,15 @@ class StoppablePort:
         """As in ``Port``."""
         self._stop.check()
         self._port.write(data, timeout)
+
+    def left_out_of_step(self) -> bool:
+        """As in ``LastingPort``."""
+        return isinstance(self._port, LastingPort) and self._port.left_out_of_step()
+
+    def remember(self, out_of_step: bool) -> None:
+        """As in ``LastingPort``."""
+        if isinstance(self._port, LastingPort):
+            self._port.remember(out_of_step)
 
     def close(self) -> None:
         """As in ``Port``."""

@@ -55,6 +55,12 @@ class Record:
         self.steps.append(step)
         self._texts.append(json.dumps(step))
 
+    def replace_step(self, before: Document, step: Document) -> None:
+        """A step that had ended was carried out once more."""
+        place = self.steps.index(before)
+        self.steps[place] = step
+        self._texts[place] = json.dumps(step)
+
     def end(self, **values: Any) -> None:
         """Set what is known at the end only."""
         self._head.update(values)

@@ -13,7 +13,9 @@ import traceback
 from dataclasses import dataclass, field
 from typing import Any, Callable, Iterable, Mapping
 
-from amt_line.plan.model import Plan, Section, Step
+from amt_line.plan.filled import references
+from amt_line.plan.flow import VERDICT
+from amt_line.plan.model import Plan, Section, Step, When
 from amt_line.plan.references import Scalar
 from amt_line.run.advice import advice_for
 from amt_line.run.clock import utc_now
@@ -25,11 +27,13 @@ from amt_line.run.record import Document, Record, Where
 from amt_line.run.record_file import Keeper, NoRecord, RecordLost
 from amt_line.run.step_run import REPLUG_SECONDS, StepRun
 from amt_line.run.stop import Abort, Aborted, Ended, Stop
+from amt_line.run.taking_back import not_taken_back, told_again
 from amt_line.run.tally import EXIT_FAIL, RunVerdict, Tally, Verdict
 from amt_station.errors import Held, Refused, StationError
 from amt_station.replug import UNPLUG_NOW
 
 _LOG = logging.getLogger("amt_line")
+_PASSED, _FAILED = "pass", "fail"
 
 
 @dataclass(frozen=True)
@@ -62,6 +66,8 @@ class Runner:
                                       self._stop)
         self._variables: dict[str, Scalar] = dict(inputs)
         self._blocked = self._blocked_always = ""
+        self._told_pass: list[tuple[Step, Document]] = []
+        self._is_settled = False
         self._keeper: Keeper = NoRecord()
         self._start = time.monotonic()
 
@@ -92,6 +98,7 @@ class Runner:
         try:
             self._go_through(self._first_steps)
             self._go_through(self._last_steps)
+            self._go_through(self._settle)
         finally:
             self._connection.lose("the run has ended")
             self._end()
@@ -119,6 +126,27 @@ class Runner:
         for number, step in enumerate(self.plan.always, start=before + 1):
             self._do(step, number)
         self._note_abort()
+
+    def _settle(self) -> None:
+        """What the handset was told is what the run came to, and its record is safe."""
+        self._close_record()
+        self._note_abort()
+        if self.verdict is not RunVerdict.PASS:
+            self._take_back()
+        self._is_settled = self.verdict is RunVerdict.PASS
+
+    def _take_back(self) -> None:
+        """A pass that was told too early is told again, as a fail."""
+        for step, before in self._told_pass:
+            self._stop.begin_last_steps(hurry=True)
+            again = self._step_run(step, before["number"]).carry_out(self._known(step))
+            self._tally.count_again(Verdict(before["verdict"]), Verdict(again["verdict"]))
+            document = told_again(before, again)
+            if again["verdict"] != Verdict.PASS.value:
+                document["remarks"].append(not_taken_back(step.place))
+                self._tally.advice += f"; {document['remarks'][-1]}"
+            self.record.replace_step(before, document)
+            self._stream.send("step-ended", **_event(document))
 
     def _tell_begin(self) -> None:
         head = self.record.head
@@ -189,15 +217,20 @@ class Runner:
         self._note_abort()
         if step.section is Section.ALWAYS:
             self._stop.hurry()
-        work = StepRun(step, number, self._setting.operator, self._connection, self._stop,
-                       self._stream, self)
+        work = self._step_run(step, number)
         why_not = self._why_not(step)
         if why_not:
             document = work.skipped(why_not)
         else:
-            self._variables.update(self._verdict_variable(step))
-            document = work.carry_out(self._variables)
+            known = self._known(step)
+            document = work.carry_out(known)
+            if known.get(VERDICT) == _PASSED and VERDICT in references(step):
+                self._told_pass.append((step, document))
         self._finish(step, work, document)
+
+    def _step_run(self, step: Step, number: int) -> StepRun:
+        return StepRun(step, number, self._setting.operator, self._connection, self._stop,
+                       self._stream, self)
 
     def _why_not(self, step: Step) -> str:
         if step.section is Section.ALWAYS:
@@ -207,23 +240,31 @@ class Runner:
                 return self._blocked_always
         elif self._blocked:
             return self._blocked
-        if step.when is not None and step.when.value == "connected":
-            return "" if self._is_connected() else "the handset is not connected"
+        if step.when is When.CONNECTED:
+            return self._not_connected()
         if not self._tally.allows(step.when):
-            return "something has failed" if step.when and step.when.value == "passed" \
-                else "nothing has failed"
+            return ("something has failed" if step.when is When.PASSED
+                    else "nothing has failed")
         return ""
 
-    def _is_connected(self) -> bool:
+    def _not_connected(self) -> str:
+        """Why a step that needs the handset is skipped; a run that has lost it is no pass."""
         try:
-            return self._connection.connected()
+            if self._connection.connected():
+                return ""
         except Ended:
-            return False
+            return "the run ends"
+        reason = "the handset is not connected"
+        if not self._tally.failed:
+            self._tally.not_passed(Verdict.ERROR, 5, reason, advice_for(5, False))
+        return reason
 
-    def _verdict_variable(self, step: Step) -> dict[str, Scalar]:
+    def _known(self, step: Step) -> dict[str, Scalar]:
+        """The variables that the step may refer to."""
         if step.section is not Section.ALWAYS:
-            return {}
-        return {"verdict": "pass" if self.verdict is RunVerdict.PASS else "fail"}
+            return self._variables
+        passed = self.verdict is RunVerdict.PASS
+        return {**self._variables, VERDICT: _PASSED if passed else _FAILED}
 
     def _finish(self, step: Step, work: StepRun, document: Document) -> None:
         verdict = Verdict(document["verdict"])
@@ -268,12 +309,8 @@ class Runner:
                         "make room or mend the directory; the record stands on standard error")
 
     def _end(self) -> None:
-        self._close_record()
-        if self.record_problem is None:
-            self._keep()
-            self._make_safe()
-            if self.record_problem is not None:
-                self._close_record()
+        if not self._is_settled:
+            self._close_record()
         head = self.record.head
         self._stream.send("run-ended", verdict=head["verdict"], dut=head["dut"],
                           exit_status=head["exit_status"], reason=head["reason"],
@@ -281,6 +318,14 @@ class Runner:
                           counts=dict(self._tally.counts), plan=head["plan"])
 
     def _close_record(self) -> None:
+        self._write_end()
+        if self.record_problem is None:
+            self._keep()
+            self._make_safe()
+            if self.record_problem is not None:
+                self._write_end()
+
+    def _write_end(self) -> None:
         if not self._tally.reason and self.verdict is RunVerdict.ERROR:
             self._block(Verdict.ERROR, 7, "no step was carried out", "see to the plan")
         aborted = self.verdict is RunVerdict.ABORTED

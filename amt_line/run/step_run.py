@@ -3,6 +3,7 @@
 from __future__ import annotations
 
 import time
+from contextlib import suppress
 from typing import Any, Mapping, Protocol
 
 from amt_line.plan.filled import Filled, Unfit, filled
@@ -69,8 +70,8 @@ class StepRun:
         self._tell("step-began", name=self._step.name, kind=self._step.kind.value,
                    section=self._step.section.value)
         for number in range(1, self._step.retries + 2):
-            if number > 1 and not self._again(number):
-                break
+            if number > 1:
+                self._again(number)
             self._document["attempts"] = number
             self._try(variables)
             self._keep_exchanges(number)
@@ -82,17 +83,14 @@ class StepRun:
     def _tell(self, event: str, **values: Any) -> None:
         self._stream.send(event, number=self._document["number"], **values)
 
-    def _again(self, number: int) -> bool:
-        """Wait before the next attempt; False when the run ends meanwhile."""
-        try:
+    def _again(self, number: int) -> None:
+        """Wait before the next attempt, which tells it when the run ends meanwhile."""
+        with suppress(Ended):
             self._stop.sleep(self._step.retry_delay)
-        except Ended:
-            return False
         earlier = {"attempt": number - 1, "verdict": self._document["verdict"],
                    "reason": self._document["reason"]}
         self._document["earlier"].append(earlier)
         self._tell("step-again", attempt=number, reason=earlier["reason"])
-        return True
 
     def _try(self, variables: Mapping[str, Scalar]) -> None:
         """One attempt, whatever comes of it."""

@@ -47,6 +47,12 @@ class Tally:
         if verdict is Verdict.PASS and section is Section.STEP:
             self.passed_steps += 1
 
+    def count_again(self, before: Verdict, verdict: Verdict) -> None:
+        """A step that had ended was carried out once more."""
+        self.counts[before.value] -= 1
+        self.counts[verdict.value] = self.counts.get(verdict.value, 0) + 1
+        self.counts = {word: count for word, count in self.counts.items() if count}
+
     def not_passed(self, verdict: Verdict, status: int, reason: str, advice: str) -> None:
         """Something did not pass; the first one is what people are told."""
         if verdict is Verdict.ERROR and not self.error_status:

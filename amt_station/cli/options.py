@@ -9,6 +9,7 @@ from typing import TYPE_CHECKING, Any, Callable, TypeVar
 
 import click
 
+from amt_station.cli import console
 from amt_station.errors import NoPort, UsageProblem
 from amt_station.requests.model import Channel
 
@@ -121,7 +122,11 @@ class Settings:
         from amt_station.link import Link
 
         channel, timeout = self.chosen_channel, self.chosen_timeout
-        return Link(self.open_port(), channel, timeout, self.open_port)
+        link = Link(self.open_port(), channel, timeout, self.open_port)
+        if not link.in_step:
+            console.talk("the port was left out of step: what still comes is dropped first, which "
+                         "may take some seconds")
+        return link
 
 
 def seconds_of(text: str) -> float:

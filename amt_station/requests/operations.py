@@ -20,7 +20,7 @@ from amt_station.wire.errors import WireError
 from amt_station.wire.packet import Packet
 
 __all__ = ["NamedValue", "Prepared", "Shown", "Value", "build_packet", "check_channel",
-           "check_text", "check_value", "operation_packet", "prepare", "prepare_packet",
+           "check_text", "check_value", "misfits", "operation_packet", "prepare", "prepare_packet",
            "prepare_text", "problems", "read_answer"]
 
 
@@ -113,8 +113,10 @@ def check_value(row: Request, operation: Operation, name: str, value: object,
 def prepare_packet(packet: Packet, channel: Channel = Channel.PC) -> Prepared:
     """Any packet."""
     _check_size(packet, channel)
-    return Prepared(f"request {packet.command}", channel, packet,
-                    row=requests_by_id().get(packet.command))
+    row = requests_by_id().get(packet.command)
+    asked = {field.name: field.read(atom) for field in (row.fields if row else ())
+             if (atom := packet.find(field.atom)) is not None}
+    return Prepared(f"request {packet.command}", channel, packet, row=row, asked=asked)
 
 
 def prepare_text(text: str, channel: Channel = Channel.PC, force: bool = False) -> Prepared:
@@ -208,16 +210,22 @@ def problems(prepared: Prepared, answer: Packet) -> Sequence[str]:
     It has to hold its result code and the values that the command is there for, each of its type,
     and it has to be about the module or the index that was asked for.
     """
-    row, operation = prepared.row, prepared.operation
+    row = prepared.row
     if row is None:
         return ()
-    found = [f"the answer holds no {name}" for name in _wanted(row, operation)
-             if answer.find(_answer_field(row, name).atom) is None]
+    return [*(f"the answer holds no {name}" for name in _wanted(row, prepared.operation)
+              if answer.find(_answer_field(row, name).atom) is None),
+            *misfits(prepared, answer)]
+
+
+def misfits(prepared: Prepared, answer: Packet) -> Sequence[str]:
+    """What an answer that says yes holds, but of another type or for something else."""
+    found: list[str] = []
     for atom in answer.atoms:
-        field = row.answer_field(atom.id)
+        field = prepared.row.answer_field(atom.id) if prepared.row else None
         if field is not None and field.misfit(atom):
             found.append(f"the answer's {field.misfit(atom)}")
-        elif field is not None and field.echo and operation is not None:
+        elif field is not None and field.echo:
             found += _other_than_asked(field, field.read(atom), prepared.asked or {})
     return found
 

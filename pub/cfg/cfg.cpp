@@ -28,10 +28,8 @@ void cut_blanks(const char *start, char *end)
 int pub_cfg_get_line(FILE *stream, char *buf, uint32_t capacity, uint32_t *length_ptr, int *is_eof_ptr)
 {
     if (stream == nullptr || buf == nullptr || length_ptr == nullptr || is_eof_ptr == nullptr) {
-        pub_log_error(g_pub_cfg_log, PUB_ERR_PARAM);
-        pub_log_flags(g_pub_cfg_log,
-                      {stream == nullptr, buf == nullptr, length_ptr == nullptr, is_eof_ptr == nullptr});
-        return PUB_ERR_PARAM;
+        return pub_log_bad_param(
+            g_pub_cfg_log, {stream == nullptr, buf == nullptr, length_ptr == nullptr, is_eof_ptr == nullptr});
     }
     *is_eof_ptr = 0;
     memset(buf, 0, capacity);
@@ -58,9 +56,7 @@ int pub_cfg_get_line(FILE *stream, char *buf, uint32_t capacity, uint32_t *lengt
 int pub_cfg_get_param_and_value(char *line, char **key_ptr, char **value_ptr)
 {
     if (line == nullptr || key_ptr == nullptr || value_ptr == nullptr) {
-        pub_log_error(g_pub_cfg_log, PUB_ERR_PARAM);
-        pub_log_flags(g_pub_cfg_log, {line == nullptr, key_ptr == nullptr, value_ptr == nullptr});
-        return PUB_ERR_PARAM;
+        return pub_log_bad_param(g_pub_cfg_log, {line == nullptr, key_ptr == nullptr, value_ptr == nullptr});
     }
     char *key = skip_blanks(line);
     if (*key == '#') {

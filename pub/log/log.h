@@ -24,6 +24,23 @@ struct pub_log_source_st
     const char *m_name_ptr;
 };
 
+/*
+ * Where a failure is told from: the source, and what the error line names: by themselves the function and the
+ * line that call. {source, "func"} names another function, {source, func, line} what a helper was given.
+ */
+struct pub_log_place_st
+{
+    const pub_log_source_st &m_source;
+    const char *m_func_ptr;
+    int m_line;
+
+    constexpr pub_log_place_st(const pub_log_source_st &source, const char *func = __builtin_FUNCTION(),
+                               int line = __builtin_LINE())
+        : m_source(source), m_func_ptr(func), m_line(line)
+    {
+    }
+};
+
 /* A dump shows this many bytes, then "...". */
 constexpr uint32_t PUB_LOG_DUMP_SIZE = 250;
 
@@ -33,15 +50,28 @@ void pub_log_prepare_thread();
 /* The entry line of the calling function: "func()". */
 void pub_log_entry(const pub_log_source_st &source, const char *func = __builtin_FUNCTION());
 
-/* The error line, with the source's name, the calling line and function, the code and errno. */
-void pub_log_error(const pub_log_source_st &source, int error_code, const char *func = __builtin_FUNCTION(),
-                   int line = __builtin_LINE());
+/*
+ * The error line, with the source's name, the place's line and function, the code and errno. This and the
+ * next three return error_code, so that a function can return what it logs.
+ */
+int pub_log_error(const pub_log_place_st &place, int error_code);
+
+/* The error line, then a line of text, cut at 4351 characters. */
+int pub_log_fail(const pub_log_place_st &place, int error_code, const char *format, ...)
+    __attribute__((format(printf, 3, 4)));
+
+/* The error line and that of a failed system call, in the order of the names. */
+int pub_log_error_call(const pub_log_place_st &place, int error_code, const char *call);
+int pub_log_call_error(const pub_log_place_st &place, const char *call, int error_code);
 
 /* The line of a failed system call, with errno. */
 void pub_log_sys_call(const pub_log_source_st &source, const char *call);
 
 /* The line of tested arguments, separated by ", ": 1 where a test found a fault. At most 8 of them. */
 void pub_log_flags(const pub_log_source_st &source, std::initializer_list<bool> fault_list);
+
+/* A refused call: the error line with PUB_ERR_PARAM, then the line of flags. Returns PUB_ERR_PARAM. */
+int pub_log_bad_param(const pub_log_place_st &place, std::initializer_list<bool> fault_list);
 
 /* Channel traffic: title, length and the first PUB_LOG_DUMP_SIZE bytes in hexadecimal. */
 void pub_log_dump(const pub_log_source_st &source, const char *title, const uint8_t *data, uint32_t length);

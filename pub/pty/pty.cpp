@@ -104,8 +104,7 @@ const char *make_ptm_raw(int fd)
 int pub_pty_open(pub_pty_st *pty_ptr)
 {
     if (pty_ptr == nullptr) {
-        pub_log_error(g_pub_pty_log, PUB_ERR_PARAM);
-        return PUB_ERR_PARAM;
+        return pub_log_error(g_pub_pty_log, PUB_ERR_PARAM);
     }
     PUB_LOG(g_pub_pty_log, "pub_pty_open m_ptm_fd[%d]", pty_ptr->m_ptm_fd);
     if (pty_ptr->m_ptm_fd > 0 && pub_pty_close(pty_ptr) != PUB_ERR_NONE) {
@@ -116,8 +115,7 @@ int pub_pty_open(pub_pty_st *pty_ptr)
     pty_ptr->m_ptm_fd = open("/dev/ptmx", O_RDWR | O_NOCTTY | O_CLOEXEC);
     PUB_LOG(g_pub_pty_log, "pub_pty_open m_ptm_fd[%d]", pty_ptr->m_ptm_fd);
     if (pty_ptr->m_ptm_fd < 0) {
-        pub_log_sys_call(g_pub_pty_log, "open");
-        pub_log_error(g_pub_pty_log, PUB_ERR_SYS_CALL);
+        pub_log_call_error(g_pub_pty_log, "open", PUB_ERR_SYS_CALL);
         pub_pty_close(pty_ptr);
         return PUB_ERR_FILE;
     }
@@ -145,8 +143,7 @@ int pub_pty_open(pub_pty_st *pty_ptr)
 int pub_pty_close(pub_pty_st *pty_ptr)
 {
     if (pty_ptr == nullptr || pty_ptr->m_ptm_fd < 0) {
-        pub_log_error(g_pub_pty_log, PUB_ERR_PARAM);
-        pub_log_flags(g_pub_pty_log, {pty_ptr == nullptr, pty_ptr != nullptr});
+        pub_log_bad_param(g_pub_pty_log, {pty_ptr == nullptr, pty_ptr != nullptr});
         return PUB_ERR_SYS_CALL;
     }
     const int status = pub_pty_delete_mapping(pty_ptr);
@@ -160,9 +157,7 @@ int pub_pty_close(pub_pty_st *pty_ptr)
 int pub_pty_delete_mapping(pub_pty_st *pty_ptr)
 {
     if (pty_ptr == nullptr) {
-        pub_log_error(g_pub_pty_log, PUB_ERR_PARAM);
-        PUB_LOG(g_pub_pty_log, "[PTY]%d", 1);
-        return PUB_ERR_PARAM;
+        return pub_log_fail(g_pub_pty_log, PUB_ERR_PARAM, "[PTY]%d", 1);
     }
     const char *mapping = pty_ptr->m_pts_mapping_name_a;
     if (!is_present(mapping)) {
@@ -173,8 +168,7 @@ int pub_pty_delete_mapping(pub_pty_st *pty_ptr)
     const int unlink_result = unlink(mapping);
     PUB_LOG(g_pub_pty_log, "pub_pty_delete_mapping unlink(%s) ret_val[%d]", mapping, unlink_result);
     if (unlink_result != 0) {
-        pub_log_sys_call(g_pub_pty_log, "unlink");
-        pub_log_error(g_pub_pty_log, PUB_ERR_SYS_CALL);
+        pub_log_call_error(g_pub_pty_log, "unlink", PUB_ERR_SYS_CALL);
         return PUB_ERR_FILE;
     }
     return PUB_ERR_NONE;
@@ -186,13 +180,11 @@ int create_pts_mapping(pub_pty_st *pty_ptr)
     const bool is_closed = !is_absent && pty_ptr->m_ptm_fd < 0;
     const bool is_unnamed = !is_absent && pty_ptr->m_pts_mapping_name_a[0] == '\0';
     if (is_absent || is_closed || is_unnamed) {
-        pub_log_error(g_pub_pty_log, PUB_ERR_PARAM);
-        PUB_LOG(g_pub_pty_log, "[PTY]%d, %d, %d", is_absent, is_closed, is_unnamed);
-        return PUB_ERR_PARAM;
+        return pub_log_fail(g_pub_pty_log, PUB_ERR_PARAM, "[PTY]%d, %d, %d", is_absent, is_closed,
+                            is_unnamed);
     }
     if (!read_pts_name(pty_ptr)) {
-        pub_log_sys_call(g_pub_pty_log, "ptsname");
-        pub_log_error(g_pub_pty_log, PUB_ERR_SYS_CALL);
+        pub_log_call_error(g_pub_pty_log, "ptsname", PUB_ERR_SYS_CALL);
         return PUB_ERR_FILE;
     }
 
@@ -202,11 +194,8 @@ int create_pts_mapping(pub_pty_st *pty_ptr)
     const int symlink_result = symlink(slave, mapping);
     PUB_LOG(g_pub_pty_log, "create_pts_mapping symlink(%s, %s) ret_val[%d]", slave, mapping, symlink_result);
     if (symlink_result != 0) {
-        pub_log_sys_call(g_pub_pty_log, "symlink");
-        pub_log_error(g_pub_pty_log, PUB_ERR_SYS_CALL);
-        pub_log_error(g_pub_pty_log, PUB_ERR_FILE);
-        PUB_LOG(g_pub_pty_log, "[PTY]map %s -> %s failed", mapping, slave);
-        return PUB_ERR_FILE;
+        pub_log_call_error(g_pub_pty_log, "symlink", PUB_ERR_SYS_CALL);
+        return pub_log_fail(g_pub_pty_log, PUB_ERR_FILE, "[PTY]map %s -> %s failed", mapping, slave);
     }
 
     /* Both calls follow the link: the app needs the rights on the slave itself. */
@@ -214,8 +203,7 @@ int create_pts_mapping(pub_pty_st *pty_ptr)
     PUB_LOG(g_pub_pty_log, "create_pts_mapping chmod(%s, %d) ret_val[%d]", mapping,
             static_cast<int>(LINK_MODE), chmod_result);
     if (chmod_result != 0) {
-        pub_log_sys_call(g_pub_pty_log, "chmod");
-        pub_log_error(g_pub_pty_log, PUB_ERR_SYS_CALL);
+        pub_log_call_error(g_pub_pty_log, "chmod", PUB_ERR_SYS_CALL);
         return PUB_ERR_FILE;
     }
     /* Where the system allows no change of owner, the slave serves its owner all the same. */
@@ -233,8 +221,7 @@ int set_ptm_attr(int fd)
     const char *failed_call = make_ptm_raw(fd);
     const int status = failed_call == nullptr ? PUB_ERR_NONE : PUB_ERR_FILE;
     if (failed_call != nullptr) {
-        pub_log_sys_call(g_pub_pty_log, failed_call);
-        pub_log_error(g_pub_pty_log, PUB_ERR_SYS_CALL);
+        pub_log_call_error(g_pub_pty_log, failed_call, PUB_ERR_SYS_CALL);
     }
     PUB_LOG(g_pub_pty_log, "set_ptm_attr fd[%d] ret_val[%d]", fd, status);
     return status;

@@ -41,9 +41,8 @@ int pub_util_try_to_open_device(int *fd_ptr, const char *path, int flags, int32_
 {
     pub_log_entry(g_pub_util_log);
     if (fd_ptr == nullptr || path == nullptr || *path == '\0') {
-        pub_log_error(g_pub_util_log, PUB_ERR_PARAM);
-        pub_log_flags(g_pub_util_log, {fd_ptr == nullptr, path == nullptr, path != nullptr && *path == '\0'});
-        return PUB_ERR_PARAM;
+        return pub_log_bad_param(g_pub_util_log,
+                                 {fd_ptr == nullptr, path == nullptr, path != nullptr && *path == '\0'});
     }
     /*
      * O_CLOEXEC: shell commands, and players they leave behind, must not keep a port open that the daemon has
@@ -77,23 +76,20 @@ int pub_util_try_to_open_device(int *fd_ptr, const char *path, int flags, int32_
         PUB_LOG(g_pub_util_log, "(%ld/%ld)try to open device \"%s\"", static_cast<long>(attempt),
                 static_cast<long>(attempts), path);
     }
-    pub_log_error(g_pub_util_log, PUB_ERR_FILE);
-    PUB_LOG(g_pub_util_log, "open device \"%s\" fail: %d - %s", path, errno, strerror(errno));
-    return PUB_ERR_FILE;
+    return pub_log_fail(g_pub_util_log, PUB_ERR_FILE, "open device \"%s\" fail: %d - %s", path, errno,
+                        strerror(errno));
 }
 
 int pub_util_set_serial_dev_attr(int fd, int32_t speed)
 {
     pub_log_entry(g_pub_util_log);
     if (fd < 0) {
-        pub_log_error(g_pub_util_log, PUB_ERR_PARAM);
-        return PUB_ERR_PARAM;
+        return pub_log_error(g_pub_util_log, PUB_ERR_PARAM);
     }
     termios attr = {};
     const int get_result = tcgetattr(fd, &attr);
     if (get_result != 0) {
-        pub_log_sys_call(g_pub_util_log, "tcgetattr");
-        pub_log_error(g_pub_util_log, PUB_ERR_SYS_CALL);
+        pub_log_call_error(g_pub_util_log, "tcgetattr", PUB_ERR_SYS_CALL);
     }
     const serial_speed_st *row = find_speed(speed);
     PUB_LOG(g_pub_util_log, "convert speed %ld -> %s", static_cast<long>(speed), row->m_name_ptr);
@@ -108,9 +104,7 @@ int pub_util_set_serial_dev_attr(int fd, int32_t speed)
     attr.c_lflag = 0;
     attr.c_cflag |= CRTSCTS;
     if (tcsetattr(fd, TCSANOW, &attr) != 0) {
-        pub_log_sys_call(g_pub_util_log, "tcsetattr");
-        pub_log_error(g_pub_util_log, PUB_ERR_SYS_CALL);
-        return PUB_ERR_SYS_CALL;
+        return pub_log_call_error(g_pub_util_log, "tcsetattr", PUB_ERR_SYS_CALL);
     }
     return PUB_ERR_NONE;
 }
@@ -119,16 +113,13 @@ int pub_util_set_fd_mode(int fd, int is_nonblock)
 {
     pub_log_entry(g_pub_util_log);
     if (fd < 0) {
-        pub_log_error(g_pub_util_log, PUB_ERR_PARAM);
-        return PUB_ERR_PARAM;
+        return pub_log_error(g_pub_util_log, PUB_ERR_PARAM);
     }
     PUB_LOG(g_pub_util_log, "pub_util_set_fd_mode fd[%d] is_nonblock_mode[%d]", fd, is_nonblock);
     const int old_flags = fcntl(fd, F_GETFL);
     const int new_flags = is_nonblock != 0 ? old_flags | O_NONBLOCK : old_flags & ~O_NONBLOCK;
     if (old_flags < 0 || fcntl(fd, F_SETFL, new_flags) < 0) {
-        pub_log_sys_call(g_pub_util_log, "fcntl");
-        pub_log_error(g_pub_util_log, PUB_ERR_FILE);
-        return PUB_ERR_FILE;
+        return pub_log_call_error(g_pub_util_log, "fcntl", PUB_ERR_FILE);
     }
     PUB_LOG(g_pub_util_log, "pub_util_set_fd_mode return ERR_NONE");
     return PUB_ERR_NONE;

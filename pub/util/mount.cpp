@@ -42,10 +42,9 @@ int pub_util_get_mount_fs_info(const char *mount_point, uint32_t *total_ptr, uin
     pub_log_entry(g_pub_util_log);
     const bool has_no_output = total_ptr == nullptr && used_ptr == nullptr && available_ptr == nullptr;
     if (mount_point == nullptr || *mount_point == '\0' || has_no_output) {
-        pub_log_error(g_pub_util_log, PUB_ERR_PARAM);
-        pub_log_flags(g_pub_util_log, {mount_point == nullptr, mount_point != nullptr && *mount_point == '\0',
-                                       has_no_output});
-        return PUB_ERR_PARAM;
+        return pub_log_bad_param(
+            g_pub_util_log,
+            {mount_point == nullptr, mount_point != nullptr && *mount_point == '\0', has_no_output});
     }
 
     bool is_mounted = false;
@@ -53,19 +52,16 @@ int pub_util_get_mount_fs_info(const char *mount_point, uint32_t *total_ptr, uin
     if (mounts.is_open()) {
         is_mounted = is_listed(mounts, mount_point);
     } else {
-        pub_log_sys_call(g_pub_util_log, "fopen");
-        pub_log_error(g_pub_util_log, PUB_ERR_SYS_CALL);
+        pub_log_call_error(g_pub_util_log, "fopen", PUB_ERR_SYS_CALL);
     }
     if (!is_mounted) {
-        pub_log_error(g_pub_util_log, PUB_ERR_NOT_FOUND);
-        PUB_LOG(g_pub_util_log, "file system \"%s\" has not been mounted", mount_point);
-        return PUB_ERR_NOT_FOUND;
+        return pub_log_fail(g_pub_util_log, PUB_ERR_NOT_FOUND, "file system \"%s\" has not been mounted",
+                            mount_point);
     }
 
     struct statfs64 info = {};
     if (statfs64(mount_point, &info) != 0) {
-        pub_log_sys_call(g_pub_util_log, "statfs");
-        pub_log_error(g_pub_util_log, PUB_ERR_SYS_CALL);
+        pub_log_call_error(g_pub_util_log, "statfs", PUB_ERR_SYS_CALL);
         return PUB_ERR_FILE;
     }
     const uint64_t block_size = static_cast<uint64_t>(info.f_bsize);

@@ -12,6 +12,7 @@
 #include "pub/error.h"
 #include "pub/file/scan.h"
 #include "pub/pub-log.h"
+#include "pub/util/signal-table.h"
 
 namespace {
 
@@ -27,11 +28,10 @@ bool is_empty(const char *text)
     return text != nullptr && *text == '\0';
 }
 
-/* What a file that cannot be opened leaves in the log, in the name of the calling function. */
-void log_unopened(const char *path, const char *func = __builtin_FUNCTION(), int line = __builtin_LINE())
+/* What a file that cannot be opened leaves in the log. */
+int fail_open(const char *path, const pub_log_place_st &place = g_pub_util_log)
 {
-    pub_log_error(g_pub_util_log, PUB_ERR_FILE, func, line);
-    PUB_LOG(g_pub_util_log, "Open file \"%s\" fail: %d - %s", path, errno, strerror(errno));
+    return pub_log_fail(place, PUB_ERR_FILE, "Open file \"%s\" fail: %d - %s", path, errno, strerror(errno));
 }
 
 /* Whether the file holds a number, which goes to *pid_ptr. */
@@ -39,13 +39,13 @@ bool read_pid_file(const char *path, long *pid_ptr)
 {
     const pub_file_st file(path, pub_file_mode_en::READ);
     if (!file.is_open()) {
-        log_unopened(path, CHECK_RUN);
+        fail_open(path, {g_pub_util_log, CHECK_RUN});
         return false;
     }
     const int scanned = pub_file_scan_long(file, pid_ptr);
     if (scanned != 1) {
-        pub_log_error(g_pub_util_log, PUB_ERR_FILE, CHECK_RUN);
-        PUB_LOG(g_pub_util_log, "fscanf() return: %d; %d - %s", scanned, errno, strerror(errno));
+        pub_log_fail({g_pub_util_log, CHECK_RUN}, PUB_ERR_FILE, "fscanf() return: %d; %d - %s", scanned,
+                     errno, strerror(errno));
         return false;
     }
     PUB_LOG(g_pub_util_log, "pub_util_get_pid_and_check_run pid[%d]", static_cast<int>(*pid_ptr));
@@ -60,7 +60,7 @@ bool is_program(long pid, const char *name)
     PUB_LOG(g_pub_util_log, "pub_util_get_pid_and_check_run fopen buf_a[%s]", buf_a);
     const pub_file_st file(buf_a, pub_file_mode_en::READ);
     if (!file.is_open()) {
-        log_unopened(buf_a, CHECK_RUN);
+        fail_open(buf_a, {g_pub_util_log, CHECK_RUN});
         return false;
     }
     const int scanned = pub_file_scan_word(file, buf_a, sizeof(buf_a));
@@ -75,11 +75,9 @@ bool is_program(long pid, const char *name)
 void let_interrupt_pass()
 {
     const int saved_errno = errno;
-    sigset_t interrupt;
+    const sigset_t interrupt = pub_util_get_signal_set({SIGINT});
     sigset_t own_mask;
     sigset_t pending;
-    sigemptyset(&interrupt);
-    sigaddset(&interrupt, SIGINT);
     pthread_sigmask(SIG_BLOCK, &interrupt, &own_mask); /* only what is blocked is shown as pending */
     for (uint32_t i = 0; i < INTERRUPT_PATIENCE_MS; i++) {
         if (sigpending(&pending) != 0 || sigismember(&pending, SIGINT) != 1) {
@@ -100,10 +98,8 @@ int pub_util_get_pid_and_check_run(const char *pid_file, const char *name, int32
     if (pid_file == nullptr || is_empty(pid_file) || name == nullptr || is_empty(name) ||
         is_run_ptr == nullptr || pid_ptr == nullptr)
     {
-        pub_log_error(g_pub_util_log, PUB_ERR_PARAM);
-        pub_log_flags(g_pub_util_log, {pid_file == nullptr, is_empty(pid_file), name == nullptr,
-                                       is_empty(name), is_run_ptr == nullptr, pid_ptr == nullptr});
-        return PUB_ERR_PARAM;
+        return pub_log_bad_param(g_pub_util_log, {pid_file == nullptr, is_empty(pid_file), name == nullptr,
+                                                  is_empty(name), is_run_ptr == nullptr, pid_ptr == nullptr});
     }
     PUB_LOG(g_pub_util_log, "pub_util_get_pid_and_check_run pid_file_ptr[%s] name_ptr[%s]", pid_file, name);
     *is_run_ptr = 0;
@@ -122,16 +118,13 @@ int pub_util_create_pid_file(const char *name)
 {
     pub_log_entry(g_pub_util_log);
     if (name == nullptr) {
-        pub_log_error(g_pub_util_log, PUB_ERR_PARAM);
-        pub_log_flags(g_pub_util_log, {true});
-        return PUB_ERR_PARAM;
+        return pub_log_bad_param(g_pub_util_log, {true});
     }
     const int pid = static_cast<int>(getpid());
     char command_a[SHELL_COMMAND_SIZE];
     snprintf(command_a, sizeof(command_a), "echo %d > /tmp/%s.pid", pid, name);
     /* A process without a pid file serves all the same. */
-    const int ignored = pub_util_run_shell(command_a);
-    static_cast<void>(ignored);
+    pub_util_run_shell(command_a);
     PUB_LOG(g_pub_util_log, "PID of %s: %d", name, pid);
     return PUB_ERR_NONE;
 }
@@ -140,21 +133,17 @@ int pub_util_get_cmd_line(int32_t pid, char *buf, uint32_t capacity)
 {
     pub_log_entry(g_pub_util_log);
     if (buf == nullptr || capacity == 0) {
-        pub_log_error(g_pub_util_log, PUB_ERR_PARAM);
-        pub_log_flags(g_pub_util_log, {buf == nullptr, capacity == 0});
-        return PUB_ERR_PARAM;
+        return pub_log_bad_param(g_pub_util_log, {buf == nullptr, capacity == 0});
     }
     memset(buf, 0, capacity);
     char path_a[PROC_PATH_SIZE];
     snprintf(path_a, sizeof(path_a), "/proc/%ld/cmdline", static_cast<long>(pid));
     const pub_file_st file(path_a, pub_file_mode_en::READ);
     if (!file.is_open()) {
-        log_unopened(path_a);
-        return PUB_ERR_FILE;
+        return fail_open(path_a);
     }
     if (pub_file_scan_word(file, buf, capacity) != 1) {
-        pub_log_sys_call(g_pub_util_log, "fscanf");
-        pub_log_error(g_pub_util_log, PUB_ERR_SYS_CALL);
+        pub_log_call_error(g_pub_util_log, "fscanf", PUB_ERR_SYS_CALL);
         return PUB_ERR_FILE;
     }
     return PUB_ERR_NONE;
@@ -164,9 +153,7 @@ int pub_util_get_process_path(char *buf, uint32_t capacity)
 {
     pub_log_entry(g_pub_util_log);
     if (buf == nullptr || capacity == 0) {
-        pub_log_error(g_pub_util_log, PUB_ERR_PARAM);
-        pub_log_flags(g_pub_util_log, {buf == nullptr, capacity == 0});
-        return PUB_ERR_PARAM;
+        return pub_log_bad_param(g_pub_util_log, {buf == nullptr, capacity == 0});
     }
     const int ret_val = pub_util_get_cmd_line(static_cast<int32_t>(getpid()), buf, capacity);
     if (ret_val != PUB_ERR_NONE) {
@@ -184,18 +171,14 @@ int pub_util_raise_process_priority()
     pub_log_entry(g_pub_util_log);
     const int maximum = sched_get_priority_max(SCHED_FIFO);
     if (maximum < 0) {
-        pub_log_sys_call(g_pub_util_log, "sched_get_priority_max");
-        pub_log_error(g_pub_util_log, PUB_ERR_SYS_CALL);
-        return PUB_ERR_SYS_CALL;
+        return pub_log_call_error(g_pub_util_log, "sched_get_priority_max", PUB_ERR_SYS_CALL);
     }
     sched_param param = {};
     param.sched_priority = maximum - PRIORITY_BELOW_MAXIMUM;
     /* The kernel takes a process for its first thread; threads inherit from the one that creates them. */
     if (sched_setscheduler(getpid(), SCHED_FIFO, &param) < 0 || sched_setscheduler(0, SCHED_FIFO, &param) < 0)
     {
-        pub_log_sys_call(g_pub_util_log, "sched_setscheduler");
-        pub_log_error(g_pub_util_log, PUB_ERR_SYS_CALL);
-        return PUB_ERR_SYS_CALL;
+        return pub_log_call_error(g_pub_util_log, "sched_setscheduler", PUB_ERR_SYS_CALL);
     }
     return PUB_ERR_NONE;
 }

@@ -46,3 +46,13 @@ const char *pub_util_get_signal_name(int signal_number)
     }
     return "";
 }
+
+sigset_t pub_util_get_signal_set(std::initializer_list<int> signal_list)
+{
+    sigset_t set;
+    sigemptyset(&set);
+    for (const int signal_number : signal_list) {
+        sigaddset(&set, signal_number);
+    }
+    return set;
+}

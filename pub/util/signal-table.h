@@ -1,5 +1,7 @@
 #pragma once
 
+#include <initializer_list>
+#include <signal.h>
 #include <stdint.h>
 
 /*
@@ -19,3 +21,6 @@ extern const pub_util_signal_st pub_util_signal_table[];
 
 /* The usual name of the signal, "" for a number not in the table. Logs nothing; fit for signal handlers. */
 const char *pub_util_get_signal_name(int signal_number);
+
+/* The set of the signals. Fit for signal handlers. */
+sigset_t pub_util_get_signal_set(std::initializer_list<int> signal_list);

@@ -1,5 +1,6 @@
 #include "pub/util/thread-end.h"
 
+#include <algorithm>
 #include <errno.h>
 #include <poll.h>
 #include <pthread.h>
@@ -14,8 +15,8 @@
 namespace {
 
 constexpr uint32_t END_WAIT_MS = 10;
-constexpr long NS_PER_MS = 1000000;
-constexpr long NS_PER_SECOND = 1000000000;
+constexpr int64_t NS_PER_MS = 1000000;
+constexpr int64_t NS_PER_SECOND = 1000000000;
 
 /*
  * Each thread's own, so that a handler on that thread is the only one that interferes. One record: where
@@ -48,37 +49,27 @@ void load_unwinder()
     }
 }
 
-timespec get_deadline(uint32_t ms)
-{
-    timespec time = {};
-    clock_gettime(CLOCK_MONOTONIC, &time);
-    time.tv_sec += static_cast<time_t>(ms / 1000);
-    time.tv_nsec += static_cast<long>(ms % 1000) * NS_PER_MS;
-    if (time.tv_nsec >= NS_PER_SECOND) {
-        time.tv_sec++;
-        time.tv_nsec -= NS_PER_SECOND;
-    }
-    return time;
-}
-
-timespec get_left(const timespec &deadline)
+/* The monotonic clock, in nanoseconds. */
+int64_t get_now()
 {
     timespec now = {};
     clock_gettime(CLOCK_MONOTONIC, &now);
-    timespec left = {deadline.tv_sec - now.tv_sec, deadline.tv_nsec - now.tv_nsec};
-    if (left.tv_nsec < 0) {
-        left.tv_sec--;
-        left.tv_nsec += NS_PER_SECOND;
-    }
-    return left.tv_sec < 0 ? timespec{} : left;
+    return int64_t{now.tv_sec} * NS_PER_SECOND + now.tv_nsec;
+}
+
+int64_t get_deadline(uint32_t ms)
+{
+    return get_now() + ms * NS_PER_MS;
 }
 
 /* What poll says of the descriptor, or of none, until the time is over. */
-int poll_until(const timespec &deadline, pollfd *fd_ptr)
+int poll_until(int64_t deadline, pollfd *fd_ptr)
 {
     for (;;) {
-        const timespec left = get_left(deadline);
-        const int ready = ppoll(fd_ptr, fd_ptr != nullptr ? 1 : 0, &left, nullptr);
+        const int64_t left = std::max<int64_t>(deadline - get_now(), 0);
+        const timespec time = {static_cast<time_t>(left / NS_PER_SECOND),
+                               static_cast<long>(left % NS_PER_SECOND)};
+        const int ready = ppoll(fd_ptr, fd_ptr != nullptr ? 1 : 0, &time, nullptr);
         if (ready >= 0 || errno != EINTR) {
             return ready;
         }
@@ -86,7 +77,7 @@ int poll_until(const timespec &deadline, pollfd *fd_ptr)
 }
 
 /* The same, with the thread's end allowed. */
-int poll_open_to_end(const timespec &deadline, pollfd *fd_ptr)
+int poll_open_to_end(int64_t deadline, pollfd *fd_ptr)
 {
     const bool was_deferred = pub_util_is_thread_end_deferred();
     pub_util_allow_thread_end();
@@ -153,9 +144,7 @@ int pub_util_kill_thread(pthread_t *thread_ptr)
 {
     pub_log_entry(g_pub_util_log);
     if (thread_ptr == nullptr) {
-        pub_log_error(g_pub_util_log, PUB_ERR_PARAM);
-        pub_log_flags(g_pub_util_log, {true});
-        return PUB_ERR_PARAM;
+        return pub_log_bad_param(g_pub_util_log, {true});
     }
     if (*thread_ptr == 0 || pthread_kill(*thread_ptr, 0) == ESRCH) {
         return PUB_ERR_NONE;

@@ -6,7 +6,7 @@
 #include "amt/amt-handle/channel/context.h"
 #include "amt/amt-handle/request/modem-tunnel.h"
 #include "amt/amt-handle/request/modem-value.h"
-#include "amt/amt-handle/request/modem-version.h"
+#include "amt/amt-handle/request/version.h"
 #include "amt/amt-packet.h"
 #include "tests/fuzz/support/input.h"
 

@@ -84,6 +84,22 @@ def test_a_full_disk_leaves_the_record_on_standard_error(tmp_path: Path, peer: P
     assert load_record(path)["state"] == "running", "the last whole one stays"
 
 
+def test_a_lost_record_is_told_though_the_output_is_lost_too(tmp_path: Path, peer: Peer) -> None:
+    peer.script = battery()
+    plan = write_plan(tmp_path, ADC * 30)
+    with open("/dev/full", "w", encoding="utf-8") as full:
+        result = subprocess.run(
+            station_command("-p", peer.path, "run", str(plan), "--json", "--records",
+                            str(tmp_path / "records")), cwd=ROOT, stdout=full,
+            env=station_environment(PYTHONDONTWRITEBYTECODE="1"), stdin=subprocess.DEVNULL,
+            stderr=subprocess.PIPE, text=True, timeout=300, check=False,
+            preexec_fn=lambda: resource.setrlimit(resource.RLIMIT_FSIZE, (8192, 8192)))
+    assert result.returncode == 7, result.stderr
+    begin = result.stderr.index("{\n")
+    record, _ = json.JSONDecoder().raw_decode(result.stderr[begin:])
+    assert record["verdict"] == "ERROR" and len(record["steps"]) == 30
+
+
 @pytest.mark.parametrize("dut, name", [
     ("KEL 1/..", "KEL_1_-20261121T190000Z-12345678.json"),
     ("", "unnamed-20261121T190000Z-12345678"),

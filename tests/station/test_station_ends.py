@@ -21,6 +21,7 @@ from station_peer import (PATIENCE, ROOT, Peer, Run, error_packet, ok, replying,
 
 from amt_station.cli import console, main
 from amt_station.cli.options import Settings
+from amt_station.wire.atoms import Atom
 from amt_station.wire.decoder import EnvelopeDecoder, Text
 from amt_station.wire.envelope import ACKNOWLEDGEMENT, encode_envelope
 from amt_station.wire.packet import Packet
@@ -62,6 +63,13 @@ def test_send_takes_another_type_with_raw(peer: Peer, run_station: Run) -> None:
     assert run_station("-p", peer.path, "send", "--raw", "45", "19=str:x").returncode == 0
     assert peer.raw == encode_envelope(Packet.decode(
         bytes.fromhex("0C 00 BB 2D 06 00 EE 13 02 01 00 78")))
+
+
+def test_send_is_answered_for_what_it_asked(peer: Peer, run_station: Run) -> None:
+    peer.script = sequence([ACKNOWLEDGEMENT, ok(46, Atom.integer(19, 17), Atom.raw(18, b"1"))])
+    result = run_station("-p", peer.path, "--json", "send", "45", "module=software")
+    assert result.returncode == 1 and "holds no module 16" in result.stderr
+    assert json.loads(result.stdout)["error"]["kind"] == "incomplete-answer"
 
 
 def test_force_is_said(peer: Peer, run_station: Run) -> None:

@@ -3,10 +3,14 @@
 What is more than three seconds late, the time that a link gives a search, is beyond it: a text's
 answer says nothing of the text. The handset is a port without any time of its own: what it says
 becomes readable when the link waits long enough, so that hundreds of lines are played in a second.
+
+The handset and its modem answer in two orders: what the modem takes its time for is overtaken by
+what the handset knows itself. A process that is killed leaves all this to the next one.
 """
 
 from __future__ import annotations
 
+import contextlib
 from dataclasses import dataclass, field
 from typing import Iterator, Sequence
 
@@ -29,6 +33,8 @@ from amt_station.wire.packet import Packet
 ON_TIME, LATE, LATER, MISSING, DAMAGED, DOUBLED = range(6)
 HOW = st.sampled_from([ON_TIME] * 3 + [LATE, LATER, MISSING, DAMAGED, DOUBLED])
 LIMIT = 1.0
+HANDSET, MODEM = range(2)
+KILLED, NEXT_PROCESS = "killed in the middle", "another process"
 
 
 class Clock:
@@ -45,7 +51,7 @@ class Clock:
 
 @dataclass
 class ScriptedPort:
-    """A handset that answers in order, each answer in its own way."""
+    """A handset and its modem, each answering in order, each answer in its own way."""
 
     clock: Clock
     channel: Channel
@@ -53,10 +59,23 @@ class ScriptedPort:
     name: str = "scripted"
     sent: int = 0
     waiting: list[tuple[float, bytes]] = field(default_factory=list)
-    ready: float = 0.0
+    ready: list[float] = field(default_factory=lambda: [0.0, 0.0])
+    killing: bool = False
+    marked: bool = False
+
+    def left_out_of_step(self) -> bool:
+        """As a terminal remembers it."""
+        return self.marked
+
+    def remember(self, out_of_step: bool) -> None:
+        """As a terminal remembers it."""
+        self.marked = out_of_step
 
     def read(self, timeout: float) -> bytes:
         """What has become readable within ``timeout``."""
+        if self.killing and timeout:
+            self.killing = False
+            raise KeyboardInterrupt
         end = self.clock.now + timeout
         if not self.waiting or self.waiting[0][0] > end:
             self.clock.now = end
@@ -72,34 +91,36 @@ class ScriptedPort:
         for item in [*decoder.feed(data), *decoder.give_up()]:
             self.sent += 1
             how = self.ways.pop(0) if self.ways else ON_TIME
-            self.answer(how, self.reply(item))
+            self.answer(how, *self.reply(item))
 
-    def answer(self, how: int, data: bytes) -> None:
+    def answer(self, how: int, who: int, data: bytes) -> None:
         """Answers leave the handset in the order of the requests, however long one takes."""
         delay = {LATE: LIMIT + 0.3, LATER: 3 * LIMIT}.get(how, 0.01)
         if how == MISSING:
             return
         if how == DAMAGED:
             data = data[:-3] + bytes([data[-3] ^ 0x55]) + data[-2:]
-        self.ready = max(self.ready, self.clock.now + delay)
-        self.waiting.append((self.ready, data))
-        if how == DOUBLED:
-            self.waiting.append((self.ready, data))
+        self.ready[who] = max(self.ready[who], self.clock.now + delay)
+        self.waiting += [(self.ready[who], data)] * (2 if how == DOUBLED else 1)
+        self.waiting.sort(key=lambda one: one[0])
 
-    def reply(self, item: Item) -> bytes:
-        """An answer that tells which sending it belongs to, as far as it can hold that."""
+    def reply(self, item: Item) -> tuple[int, bytes]:
+        """Who answers, and an answer that tells which sending it belongs to, if it can."""
         if isinstance(item, Text):
             if b"DBTADDR=?" in item.raw:
-                return b"\r\nOK\r\n"
-            return b"\r\n+N: %d\r\n\r\nOK\r\n" % self.sent
+                return HANDSET, b"\r\nOK\r\n"
+            return MODEM, b"\r\n+N: %d\r\n\r\nOK\r\n" % self.sent
         assert isinstance(item, Frame)
         number = item.packet.command
-        if number in (9, 224):
-            atom = Atom.integer(5 if number == 9 else 151, self.sent)
-            answer = Packet(number + 1, (atom, Atom.integer(1, 0)))
+        atoms = {9: Atom.integer(5, self.sent), 224: Atom.integer(151, self.sent),
+                 85: Atom.string(38, str(self.sent))}
+        if number in atoms:
+            answer = Packet(number + 1, (atoms[number], Atom.integer(1, 0)))
         else:
             answer = Packet(number + 1, (Atom.integer(1, 1),))
-        return encode_envelope(answer) if self.channel is Channel.PC else answer.encode()
+        pc = self.channel is Channel.PC
+        return (MODEM if pc and number == 85 else HANDSET,
+                encode_envelope(answer) if pc else answer.encode())
 
     def close(self) -> None:
         """Nothing to give back."""
@@ -123,6 +144,10 @@ def played(clock: Clock, channel: Channel, steps: Sequence[str],
     link = Link(port, channel)
     passed = []
     for step in steps:
+        if step in (NEXT_PROCESS, KILLED):
+            _end_process(port, link, step)
+            link = Link(port, channel)
+            continue
         prepared = prepare_text(step) if step.startswith("AT") else prepare(step, {}, channel)
         try:
             outcome = perform(link, prepared, LIMIT)
@@ -131,10 +156,18 @@ def played(clock: Clock, channel: Channel, steps: Sequence[str],
             continue
         asked = port.sent
         value = outcome.values[0].value
-        taken = int(str(value).rpartition(" ")[2] or -1) if prepared.packet is None else value
-        assert isinstance(taken, int)
-        passed.append((asked, taken))
+        passed.append((asked, int(str(value).rpartition(" ")[2] or -1)))
     return passed
+
+
+def _end_process(port: ScriptedPort, link: Link, how: str) -> None:
+    """The link is left as it is; whoever opens the port drops what lies in it."""
+    if how == KILLED:
+        port.killing = True
+        with contextlib.suppress(KeyboardInterrupt, StationError):
+            link.at("AT+K") if link.channel is Channel.PC else link.request(Packet(9))
+        port.killing = False
+    port.waiting = [one for one in port.waiting if one[0] > port.clock.now]
 
 
 @settings(max_examples=300)
@@ -158,6 +191,34 @@ def test_packets_and_texts_on_the_pc_line(clock: Clock, steps: list[str],
                                           ways: list[int]) -> None:
     for asked, taken in played(clock, Channel.PC, steps, ways):
         assert asked == taken
+
+
+@settings(max_examples=300)
+@given(st.lists(st.sampled_from(["board read", "battery adc", "AT+N"]), min_size=1, max_size=8),
+       st.lists(HOW, max_size=24))
+def test_what_the_modem_answers_in_an_order_of_its_own(clock: Clock, steps: list[str],
+                                                       ways: list[int]) -> None:
+    for asked, taken in played(clock, Channel.PC, steps, ways):
+        assert asked == taken
+
+
+@settings(max_examples=300)
+@given(st.sampled_from(Channel), st.data(), st.lists(HOW, max_size=24))
+def test_what_earlier_processes_left_behind(clock: Clock, channel: Channel, data: st.DataObject,
+                                            ways: list[int]) -> None:
+    asked_for = (["board read", "AT+N"] if channel is Channel.PC else ["battery voltage"])
+    steps = data.draw(st.lists(st.sampled_from([*asked_for, KILLED, NEXT_PROCESS]), min_size=1,
+                               max_size=8))
+    for asked, taken in played(clock, channel, steps, ways):
+        assert asked == taken
+
+
+@pytest.mark.parametrize("step", ["board read", "AT+N"])
+@pytest.mark.parametrize("ways", [[LATE, ON_TIME], [LATE, DOUBLED], [LATER, DOUBLED]])
+def test_the_modem_is_overtaken_by_the_answer_to_the_search(clock: Clock, step: str,
+                                                            ways: list[int]) -> None:
+    assert played(clock, Channel.PC, [step] * 2, ways) == [(3, 3)]
+    assert played(clock, Channel.PC, [KILLED, step], ways) == [(3, 3)]
 
 
 def test_the_script_can_pass_at_all(clock: Clock) -> None:

@@ -14,7 +14,7 @@ from amt_station.exchange import Purpose
 from amt_station.link import Link
 from amt_station.perform import perform
 from amt_station.requests.model import Channel
-from amt_station.requests.operations import prepare
+from amt_station.requests.operations import prepare, prepare_packet, prepare_text
 from amt_station.requests.table import requests_by_id
 from amt_station.wire.atoms import Atom
 from amt_station.wire.decoder import Frame, Item, Text
@@ -282,3 +282,29 @@ def test_a_value_is_shown_in_its_unit(app_peer: Peer, app_link: Link) -> None:
                                                 Atom.integer(1, 0))).encode()]
     voltage = perform(app_link, prepare("battery voltage", channel=Channel.APP))["voltage"]
     assert (voltage.value, voltage.shown, voltage.unit) == (4012345, 4.012345, "V")
+
+
+def test_two_lines_with_a_value_are_no_value(peer: Peer, link: Link) -> None:
+    peer.script = sequence([b'\r\n^DBTADDR: "00:11:22:33:44:55"\r\n\r\nO?\r\n'
+                            b'\r\n^DBTADDR: "00:11:22:33:44:66"\r\n\r\nOK\r\n'])
+    with pytest.raises(IncompleteAnswer, match="holds 2 .DBTADDR: lines"):
+        perform(link, prepare("bt-address read"))
+    assert not link.in_step
+
+
+@pytest.mark.parametrize("atoms, words", [
+    ([Atom.integer(19, 17), Atom.raw(18, b"1"), Atom.integer(1, 0)], "holds no module 16"),
+    ([Atom.integer(19, 16), Atom.raw(18, b"1")], "holds no result"),
+    ([Atom.integer(19, 16), Atom.integer(18, 1), Atom.integer(1, 0)], "of type int, not bytes")])
+def test_any_request_has_to_be_answered_as_asked(atoms: list[Atom], words: str, peer: Peer,
+                                                 link: Link) -> None:
+    peer.script = sequence([ACKNOWLEDGEMENT, encode_envelope(Packet(46, tuple(atoms)))])
+    with pytest.raises(IncompleteAnswer, match=words):
+        perform(link, prepare_packet(VERSION))
+    assert not link.in_step
+
+
+def test_a_text_says_why_it_was_refused(peer: Peer, link: Link) -> None:
+    peer.script = sequence([b"\r\nERROR\r\n"])
+    with pytest.raises(Refused, match="read: the file is missing or empty"):
+        perform(link, prepare_text("AT^DPCBACTRL=1"))

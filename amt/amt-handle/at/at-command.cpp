@@ -34,8 +34,7 @@ constexpr at_command_st g_at_command_a[] = {
 int handle_amt_pc_req_at()
 {
     if (g_handle_context.m_req.m_buf_len == 0) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
-        return PUB_ERR_PARAM;
+        return pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
     }
     const std::string_view request = amt_handle_get_text(g_handle_context.m_req);
     for (const at_command_st &command : g_at_command_a) {

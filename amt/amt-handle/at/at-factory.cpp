@@ -1,13 +1,10 @@
 #include "amt/amt-handle/at/at-handler.h"
 
-#include <errno.h>
 #include <stdint.h>
 #include <stdio.h>
 #include <stdlib.h>
-#include <string.h>
 
 #include "amt/amt-handle/at/at-operand.h"
-#include "amt/amt-handle/at/at-reply.h"
 #include "amt/amt-handle/channel/factory-file.h"
 #include "amt/amt-handle/request/handshake-permission.h"
 #include "amt/amt-handle/request/identity-store.h"
@@ -22,13 +19,6 @@ constexpr uint32_t LINE_SIZE = 100;
 constexpr int PCBA_READ = 1;
 constexpr int PCBA_WRITE = 2;
 
-int fail_param(const char *text, const char *func = __builtin_FUNCTION(), int line = __builtin_LINE())
-{
-    pub_log_error(g_amt_handle_log, PUB_ERR_PARAM, func, line);
-    PUB_LOG(g_amt_handle_log, "%s", text);
-    return PUB_ERR_PARAM;
-}
-
 /* Reads one word of the Bluetooth address file into word (LINE_SIZE bytes). */
 int read_bt_address(char *word)
 {
@@ -38,14 +28,10 @@ int read_bt_address(char *word)
     }
     const pub_file_step_en step = pub_file_read_word(path, word, LINE_SIZE);
     if (step == pub_file_step_en::OPEN_FAILED) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_FILE);
-        PUB_LOG(g_amt_handle_log, "open(\"%s\") fail: %d - %s", path, errno, strerror(errno));
-        return PUB_ERR_FILE;
+        return amt_factory_file_fail_open(path);
     }
     if (step != pub_file_step_en::DONE) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
-        PUB_LOG(g_amt_handle_log, "read not completed");
-        return PUB_ERR_FAIL;
+        return pub_log_fail(g_amt_handle_log, PUB_ERR_FAIL, "read not completed");
     }
     return PUB_ERR_NONE;
 }
@@ -56,25 +42,21 @@ int write_bt_address(const char *address)
     const char *const known_path = get_bt_addr_file();
     const char *const path = known_path != nullptr ? known_path : AMT_BT_ADDRESS_FILE;
     const pub_file_step_en step = amt_factory_file_write(path, address, "\n");
-    if (step == pub_file_step_en::DONE) {
-        PUB_LOG(g_amt_handle_log, "write BT address: %s", address);
-        return PUB_ERR_NONE;
-    }
-    pub_log_error(g_amt_handle_log, PUB_ERR_FILE);
     if (step == pub_file_step_en::OPEN_FAILED) {
-        PUB_LOG(g_amt_handle_log, "open(\"%s\") fail: %d - %s", path, errno, strerror(errno));
-        return PUB_ERR_FILE;
+        return amt_factory_file_fail_open(path);
     }
-    PUB_LOG(g_amt_handle_log, "fputs() fail");
-    return PUB_ERR_INCOMPLETE;
+    if (step != pub_file_step_en::DONE) {
+        return pub_log_fail(g_amt_handle_log, PUB_ERR_FILE, "fputs() fail");
+    }
+    PUB_LOG(g_amt_handle_log, "write BT address: %s", address);
+    return PUB_ERR_NONE;
 }
 
 int reply_pcba_sn()
 {
     char sn_a[AMT_PCBA_SN_SIZE] = {};
     if (amt_read_pcba_sn(sn_a) != PUB_ERR_NONE) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
-        PUB_LOG(g_amt_handle_log, "read error.");
+        pub_log_fail(g_amt_handle_log, PUB_ERR_FAIL, "read error.");
         return amt_at_reply_error();
     }
     return amt_at_reply("\r\n^DPCBACTRL: %s\r\n\r\nOK\r\n", sn_a);
@@ -85,8 +67,7 @@ int write_pcba_sn(const char *sn)
     char sn_a[AMT_PCBA_SN_SIZE];
     snprintf(sn_a, sizeof(sn_a), "%s", sn);
     if (amt_write_pcba_sn(sn_a, AMT_PCBA_SN_FILE) != PUB_ERR_NONE) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
-        PUB_LOG(g_amt_handle_log, "write error.");
+        pub_log_fail(g_amt_handle_log, PUB_ERR_FAIL, "write error.");
         return amt_at_reply_error();
     }
     return amt_at_reply_ok();
@@ -108,8 +89,7 @@ int amt_at_write_bt_address(const char *operands)
     char address_a[ADDRESS_SIZE];
     amt_at_copy_quoted(operands, address_a, sizeof(address_a));
     if (address_a[0] == '\0') {
-        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
-        return PUB_ERR_PARAM;
+        return pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
     }
     return write_bt_address(address_a) == PUB_ERR_NONE ? amt_at_reply_ok() : amt_at_reply_cme();
 }
@@ -136,7 +116,7 @@ int amt_at_control_pcba(const char *operands)
     amt_at_operands_init(&list, operands);
     const char *const type_ptr = amt_at_operands_next(&list);
     if (type_ptr == nullptr) {
-        return fail_param("type is null!!!");
+        return pub_log_fail(g_amt_handle_log, PUB_ERR_PARAM, "type is null!!!");
     }
     const int type = atoi(type_ptr);
     if (type == PCBA_READ) {
@@ -144,10 +124,10 @@ int amt_at_control_pcba(const char *operands)
     }
     if (type == PCBA_WRITE) {
         const char *const sn = amt_at_operands_next(&list);
-        return sn != nullptr ? write_pcba_sn(sn) : fail_param("pcba-sn is null!!!");
+        return sn != nullptr ? write_pcba_sn(sn)
+                             : pub_log_fail(g_amt_handle_log, PUB_ERR_PARAM, "pcba-sn is null!!!");
     }
-    pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
-    PUB_LOG(g_amt_handle_log, "unknown operation type: %u", static_cast<unsigned>(type));
+    pub_log_fail(g_amt_handle_log, PUB_ERR_PARAM, "unknown operation type: %u", static_cast<unsigned>(type));
     return amt_at_reply_error();
 }
 
@@ -157,7 +137,7 @@ int amt_at_control_permission(const char *operands)
     amt_at_operands_init(&list, operands);
     const char *const type_ptr = amt_at_operands_next(&list);
     if (type_ptr == nullptr) {
-        return fail_param("type is null!!!");
+        return pub_log_fail(g_amt_handle_log, PUB_ERR_PARAM, "type is null!!!");
     }
     const int type = atoi(type_ptr);
     int flag = 0;

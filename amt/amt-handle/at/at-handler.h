@@ -28,3 +28,16 @@ int amt_at_control_bt(const char *operands);              /* 0: stop; 1: start *
 int amt_at_control_gps(const char *operands);             /* 0: stop; 2,index: start and read one satellite */
 int handle_amt_device_wifi_tx_ctrl(const char *operands); /* 0: stop; 1,channel,rate,power: start */
 int handle_amt_device_wifi_rx_ctrl(const char *operands); /* 0: stop; 1,channel,rate: start */
+
+/*
+ * Replies to AT text on the PC port. Each is sent at once and returns the sender's status
+ * (amt_handle_send_rsp).
+ */
+int amt_at_reply_ok();    /* "OK" */
+int amt_at_reply_error(); /* "ERROR": the command failed, or its operand means nothing */
+int amt_at_reply_cme();   /* "+CME ERROR: 100": a file or a property could not be read or written */
+
+/*
+ * A reply of the given text, cut at 4095 characters: with its line ends, as the station sees it.
+ */
+int amt_at_reply(const char *format, ...) __attribute__((format(printf, 1, 2)));

@@ -3,7 +3,6 @@
 #include <stdint.h>
 
 #include "amt/amt-device/test-hal.h"
-#include "amt/amt-handle/at/at-reply.h"
 #include "amt/amt-handle/request/ap-version.h"
 #include "amt/amt-handle/request/mode-switch.h"
 #include "pub/error.h"

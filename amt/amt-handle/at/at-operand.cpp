@@ -19,17 +19,15 @@ constexpr std::string_view LINE_OR_TEXT_END{"\r\n\0", 3};
 int handle_amt_get_at_para(const char *prefix, char *out, uint32_t *length_ptr)
 {
     if (prefix == nullptr || out == nullptr || length_ptr == nullptr) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
-        pub_log_flags(g_amt_handle_log, {prefix == nullptr, out == nullptr, length_ptr == nullptr});
-        return PUB_ERR_PARAM;
+        return pub_log_bad_param(g_amt_handle_log,
+                                 {prefix == nullptr, out == nullptr, length_ptr == nullptr});
     }
     *length_ptr = 0;
     const std::string_view text = amt_handle_get_text(g_handle_context.m_req);
     const size_t found = text.find(prefix);
     if (found == std::string_view::npos) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
-        PUB_LOG(g_amt_handle_log, "at cmd[%s] do not include (%s).", text.data(), prefix);
-        return PUB_ERR_FAIL;
+        return pub_log_fail(g_amt_handle_log, PUB_ERR_FAIL, "at cmd[%s] do not include (%s).", text.data(),
+                            prefix);
     }
     const size_t start = std::min(text.find_first_not_of(' ', found + strlen(prefix)), text.size());
     const size_t end = std::min(text.find('\r'), text.size());

@@ -4,7 +4,6 @@
 #include <stdlib.h>
 
 #include "amt/amt-handle/at/at-operand.h"
-#include "amt/amt-handle/at/at-reply.h"
 #include "amt/amt-log.h"
 #include "platform/include/ldt.h"
 #include "pub/error.h"
@@ -40,8 +39,7 @@ bool take_number(amt_at_operands_st *list_ptr, const char *name, const char *fun
 {
     const char *const text = amt_at_operands_next(list_ptr);
     if (text == nullptr) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM, func);
-        PUB_LOG(g_amt_handle_log, "%s is null!!!", name);
+        pub_log_fail({g_amt_handle_log, func}, PUB_ERR_PARAM, "%s is null!!!", name);
         return false;
     }
     *number_ptr = atoi(text);

@@ -113,7 +113,7 @@ int amt_at_exchange(const amt_at_exchange_st &exchange, void *context, int line)
         status = wait_final(exchange, context);
     }
     if (status != PUB_ERR_NONE) {
-        pub_log_error(g_amt_handle_log, status, exchange.m_name_ptr, line);
+        pub_log_error({g_amt_handle_log, exchange.m_name_ptr, line}, status);
     }
     return status;
 }

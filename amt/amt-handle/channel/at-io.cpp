@@ -86,8 +86,7 @@ ssize_t read_once(char *buf, uint32_t length)
 
 int rewrite_after_reopen(const char *text, uint32_t length)
 {
-    const int status = amt_at_open();
-    if (status != PUB_ERR_NONE) {
+    if (const int status = amt_at_open(); status != PUB_ERR_NONE) {
         return status;
     }
     errno = 0; /* a short write has no errno, and shows none of the reopening */
@@ -96,8 +95,7 @@ int rewrite_after_reopen(const char *text, uint32_t length)
 
 int reread_after_reopen(char *buf, uint32_t length, ssize_t *count_ptr)
 {
-    const int status = amt_at_open();
-    if (status != PUB_ERR_NONE) {
+    if (const int status = amt_at_open(); status != PUB_ERR_NONE) {
         return status;
     }
     errno = 0;
@@ -105,35 +103,28 @@ int reread_after_reopen(char *buf, uint32_t length, ssize_t *count_ptr)
     return *count_ptr > 0 ? PUB_ERR_NONE : PUB_ERR_FAIL;
 }
 
-/* The error line of the switch-off, which always names the public operation. */
-int fail_switch_off(int line, int error_code)
-{
-    pub_log_error(g_amt_handle_log, error_code, "disable_unsolicited_code", line);
-    return error_code;
-}
+/* The error lines of the switch-off name the public operation, whichever part has failed. */
+constexpr char SWITCH_OFF[] = "disable_unsolicited_code";
 
 int send_switch_off(int fd)
 {
     const int ready = amt_wait_writable(fd, WAIT_SECONDS * 1000);
     if (ready == 0) {
-        const int status = fail_switch_off(__LINE__, PUB_ERR_TIMEOUT);
-        PUB_LOG(g_amt_handle_log, "wait %d seconds to write time out", WAIT_SECONDS);
-        return status;
+        return pub_log_fail({g_amt_handle_log, SWITCH_OFF}, PUB_ERR_TIMEOUT,
+                            "wait %d seconds to write time out", WAIT_SECONDS);
     }
     if (ready < 0) {
-        pub_log_sys_call(g_amt_handle_log, "select");
-        return fail_switch_off(__LINE__, PUB_ERR_FILE);
+        return pub_log_call_error({g_amt_handle_log, SWITCH_OFF}, "select", PUB_ERR_FILE);
     }
     const ssize_t written = write(fd, UNSOLICITED_OFF, sizeof(UNSOLICITED_OFF) - 1);
     if (written < 0) {
-        pub_log_sys_call(g_amt_handle_log, "write");
-        return fail_switch_off(__LINE__, PUB_ERR_FILE);
+        return pub_log_call_error({g_amt_handle_log, SWITCH_OFF}, "write", PUB_ERR_FILE);
     }
     if (written != static_cast<ssize_t>(sizeof(UNSOLICITED_OFF) - 1)) {
         PUB_LOG(g_amt_handle_log, "WARNING !");
         PUB_LOG(g_amt_handle_log, "write not completed: to write(%zu) != written(%zd)",
                 sizeof(UNSOLICITED_OFF) - 1, written);
-        return fail_switch_off(__LINE__, PUB_ERR_INCOMPLETE);
+        return pub_log_error({g_amt_handle_log, SWITCH_OFF}, PUB_ERR_INCOMPLETE);
     }
     return PUB_ERR_NONE;
 }
@@ -161,8 +152,7 @@ void read_answer_piece(int fd, answer_st *answer_ptr)
     }
     if (count < 0) {
         answer_ptr->m_is_line_lost = errno == EIO;
-        pub_log_sys_call(g_amt_handle_log, "read");
-        answer_ptr->m_status = fail_switch_off(__LINE__, PUB_ERR_FILE);
+        answer_ptr->m_status = pub_log_call_error({g_amt_handle_log, SWITCH_OFF}, "read", PUB_ERR_FILE);
         pub_util_sleep_ms(FAILED_TTY_PAUSE_MS);
     }
 }
@@ -176,7 +166,7 @@ int report_time_out(const timespec &start)
     }
     PUB_LOG(g_amt_handle_log, "read time out: %ld:%ld -> %ld:%ld", static_cast<long>(start.tv_sec),
             start.tv_nsec, static_cast<long>(end.tv_sec), end.tv_nsec);
-    return fail_switch_off(__LINE__, PUB_ERR_FILE);
+    return pub_log_error({g_amt_handle_log, SWITCH_OFF}, PUB_ERR_FILE);
 }
 
 /* Waits for one piece of the answer. Each piece replaces the one before it. */
@@ -191,8 +181,7 @@ answer_st wait_for_answer_piece(int fd)
     } else if (ready == 0) {
         answer.m_status = report_time_out(start);
     } else {
-        pub_log_sys_call(g_amt_handle_log, "select");
-        answer.m_status = fail_switch_off(__LINE__, PUB_ERR_FILE);
+        answer.m_status = pub_log_call_error({g_amt_handle_log, SWITCH_OFF}, "select", PUB_ERR_FILE);
         pub_util_sleep_ms(FAILED_TTY_PAUSE_MS);
     }
     return answer;
@@ -209,9 +198,7 @@ bool holds_error_result(const answer_st &answer)
 int write_at(const char *text, uint32_t length)
 {
     if (text == nullptr || length == 0) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
-        pub_log_flags(g_amt_handle_log, {text == nullptr, length == 0});
-        return PUB_ERR_PARAM;
+        return pub_log_bad_param(g_amt_handle_log, {text == nullptr, length == 0});
     }
     pub_log_entry(g_amt_handle_log);
     pub_print("[%s:L%d]write_at: %s\n", PROGRAM, WRITE_AT_LINE, text);
@@ -224,8 +211,7 @@ int write_at(const char *text, uint32_t length)
         status = rewrite_after_reopen(text, length);
     }
     if (status != PUB_ERR_NONE) {
-        pub_log_error(g_amt_handle_log, status);
-        return status;
+        return pub_log_error(g_amt_handle_log, status);
     }
     PUB_LOG(g_amt_handle_log, "send ==> %.1023s", text);
     return PUB_ERR_NONE;
@@ -234,9 +220,7 @@ int write_at(const char *text, uint32_t length)
 int read_at(char *buf, uint32_t length, int32_t *count_ptr)
 {
     if (buf == nullptr || length == 0 || count_ptr == nullptr) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
-        pub_log_flags(g_amt_handle_log, {buf == nullptr, length == 0, count_ptr == nullptr});
-        return PUB_ERR_PARAM;
+        return pub_log_bad_param(g_amt_handle_log, {buf == nullptr, length == 0, count_ptr == nullptr});
     }
     pub_print("[%s]read_at\n", PROGRAM);
     ssize_t count = read_once(buf, length);
@@ -254,8 +238,7 @@ int read_at(char *buf, uint32_t length, int32_t *count_ptr)
         *count_ptr = static_cast<int32_t>(count);
     }
     if (status != PUB_ERR_NONE) {
-        pub_log_error(g_amt_handle_log, status);
-        return status;
+        return pub_log_error(g_amt_handle_log, status);
     }
     PUB_LOG(g_amt_handle_log, "receive <== %.1023s", buf);
     return PUB_ERR_NONE;
@@ -264,10 +247,9 @@ int read_at(char *buf, uint32_t length, int32_t *count_ptr)
 int disable_unsolicited_code(int fd)
 {
     if (fd <= 0) {
-        return fail_switch_off(__LINE__, PUB_ERR_PARAM);
+        return pub_log_error({g_amt_handle_log, SWITCH_OFF}, PUB_ERR_PARAM);
     }
-    const int status = send_switch_off(fd);
-    if (status != PUB_ERR_NONE) {
+    if (const int status = send_switch_off(fd); status != PUB_ERR_NONE) {
         return status;
     }
     /* A silent modem is waited for without limit: without its answer nothing that follows could be told
@@ -278,7 +260,7 @@ int disable_unsolicited_code(int fd)
             return answer.m_status;
         }
         if (holds_error_result(answer)) {
-            return fail_switch_off(__LINE__, PUB_ERR_FAIL);
+            return pub_log_error({g_amt_handle_log, SWITCH_OFF}, PUB_ERR_FAIL);
         }
     }
 }
@@ -286,8 +268,7 @@ int disable_unsolicited_code(int fd)
 int amt_at_open()
 {
     for (int32_t i = 0; i < AMT_TTY_AT_ATTEMPTS; i++) {
-        const int status = amt_tty_open_at();
-        if (status != PUB_ERR_NONE) {
+        if (const int status = amt_tty_open_at(); status != PUB_ERR_NONE) {
             return status;
         }
         disable_unsolicited_code(g_handle_context.m_fd_at);

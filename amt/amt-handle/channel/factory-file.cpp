@@ -1,7 +1,9 @@
 #include "amt/amt-handle/channel/factory-file.h"
 
 #include <errno.h>
+#include <string.h>
 
+#include "pub/error.h"
 #include "pub/util/process.h"
 #include "pub/util/thread-end.h"
 
@@ -22,13 +24,28 @@ pub_file_step_en amt_factory_file_write(const char *path, const char *text, cons
     return step;
 }
 
+int amt_factory_file_store(const char *path, const char *text, const pub_log_place_st &place)
+{
+    const pub_file_step_en step = amt_factory_file_write(path, text);
+    if (step == pub_file_step_en::OPEN_FAILED) {
+        return amt_factory_file_fail_open(path, place);
+    }
+    return step == pub_file_step_en::DONE
+               ? PUB_ERR_NONE
+               : pub_log_fail(place, PUB_ERR_FILE, "fputs fail: %d - %s", errno, strerror(errno));
+}
+
+int amt_factory_file_fail_open(const char *path, const pub_log_place_st &place)
+{
+    return pub_log_fail(place, PUB_ERR_FILE, "open(\"%s\") fail: %d - %s", path, errno, strerror(errno));
+}
+
 void amt_factory_file_sync()
 {
     const int saved_errno = errno;
     for (int i = 0; i < FLUSH_COUNT; i++) {
         pub_util_sleep_ms(FLUSH_PAUSE_MS);
-        const int ignored_status = pub_util_run_shell(SYNC_COMMAND);
-        static_cast<void>(ignored_status);
+        pub_util_run_shell(SYNC_COMMAND);
     }
     errno = saved_errno;
 }

@@ -5,9 +5,10 @@
 #include <pthread.h>
 #include <signal.h>
 #include <sys/time.h>
+#include <sys/types.h>
 #include <unistd.h>
 
-#include "amt/amt-handle/channel/service-process.h"
+#include "pub/util/signal-table.h"
 #include "pub/util/thread-end.h"
 
 namespace {
@@ -15,6 +16,7 @@ namespace {
 /* A shut-down takes some 50 ms; what is not done after this is stuck. In microseconds. */
 constexpr long WATCHDOG_US = 800000;
 
+std::atomic<pid_t> g_service_pid;
 std::atomic<pthread_t> g_ender;
 std::atomic<int> g_exit_status;
 std::atomic<int (*)()> g_shut_down;
@@ -39,18 +41,9 @@ void start_watchdog()
  */
 void set_enders_mask()
 {
-    sigset_t terminating;
-    sigemptyset(&terminating);
-    sigaddset(&terminating, SIGINT);
-    sigaddset(&terminating, SIGTERM);
-    sigaddset(&terminating, SIGUSR2);
+    const sigset_t terminating = pub_util_get_signal_set({SIGINT, SIGTERM, SIGUSR2});
+    const sigset_t needed = pub_util_get_signal_set({SIGALRM, SIGBUS, SIGSEGV});
     pthread_sigmask(SIG_BLOCK, &terminating, nullptr);
-
-    sigset_t needed;
-    sigemptyset(&needed);
-    sigaddset(&needed, SIGALRM);
-    sigaddset(&needed, SIGBUS);
-    sigaddset(&needed, SIGSEGV);
     pthread_sigmask(SIG_UNBLOCK, &needed, nullptr);
 }
 
@@ -114,4 +107,15 @@ void amt_process_end()
         shut_down();
     }
     amt_process_end_finish();
+}
+
+void amt_service_process_mark()
+{
+    g_service_pid = getpid();
+}
+
+bool amt_service_process_is_own()
+{
+    const pid_t service_pid = g_service_pid;
+    return service_pid == 0 || service_pid == getpid();
 }

@@ -30,19 +30,21 @@ int get_fd(uint32_t channel)
 }
 
 /* The faults that each sender looks for first, in the calling sender's name. */
-int check_sender(uint32_t channel, const amt_buf_st *rsp_ptr, const char *func = __builtin_FUNCTION(),
-                 int line = __builtin_LINE())
+int check_sender(uint32_t channel, const amt_buf_st *rsp_ptr,
+                 const pub_log_place_st &place = g_amt_handle_log)
 {
     if (!is_no_channel(channel) && rsp_ptr != nullptr) {
         return PUB_ERR_NONE;
     }
-    pub_log_error(g_amt_handle_log, PUB_ERR_PARAM, func, line);
-    pub_log_flags(g_amt_handle_log, {is_no_channel(channel), rsp_ptr == nullptr});
-    return PUB_ERR_PARAM;
+    return pub_log_bad_param(place, {is_no_channel(channel), rsp_ptr == nullptr});
 }
 
-int send_result(uint32_t channel, amt_buf_st *rsp_ptr, uint8_t rsp_id, int32_t code)
+int send_result(uint32_t channel, amt_buf_st *rsp_ptr, uint8_t rsp_id, int32_t code,
+                const pub_log_place_st &place = g_amt_handle_log)
 {
+    if (check_sender(channel, rsp_ptr, place) != PUB_ERR_NONE) {
+        return PUB_ERR_PARAM;
+    }
     amt_reply_start(rsp_ptr, rsp_id);
     amt_packet_add_int(rsp_ptr->m_buf_a, AMT_ATOM_RESULT, code);
     return amt_reply_finish(channel, rsp_ptr);
@@ -52,13 +54,10 @@ int write_rsp(int fd, const amt_buf_st *rsp_ptr)
 {
     const ssize_t written = write(fd, rsp_ptr->m_buf_a, rsp_ptr->m_buf_len);
     if (written < 0) {
-        pub_log_sys_call(g_amt_handle_log, "write");
-        pub_log_error(g_amt_handle_log, PUB_ERR_FILE, "amt_handle_send_rsp");
-        return PUB_ERR_FILE;
+        return pub_log_call_error({g_amt_handle_log, "amt_handle_send_rsp"}, "write", PUB_ERR_FILE);
     }
     if (written != static_cast<ssize_t>(rsp_ptr->m_buf_len)) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_INCOMPLETE, "amt_handle_send_rsp");
-        PUB_LOG(g_amt_handle_log, "WARNING !");
+        pub_log_fail({g_amt_handle_log, "amt_handle_send_rsp"}, PUB_ERR_INCOMPLETE, "WARNING !");
         PUB_LOG(g_amt_handle_log, "write not completed: to write(%u) != written(%zd)", rsp_ptr->m_buf_len,
                 written);
         return PUB_ERR_INCOMPLETE;
@@ -68,41 +67,38 @@ int write_rsp(int fd, const amt_buf_st *rsp_ptr)
 
 } // namespace
 
-int amt_reply_check(const pub_log_source_st &source, uint32_t channel, const amt_buf_st *req_ptr,
-                    const amt_buf_st *rsp_ptr, const char *func, int line)
+int amt_reply_check(const pub_log_place_st &place, uint32_t channel, const amt_buf_st *req_ptr,
+                    const amt_buf_st *rsp_ptr)
 {
     const bool is_channel_none = channel == AMT_CHANNEL_NONE;
     const bool is_req_empty = req_ptr != nullptr && req_ptr->m_buf_len == 0;
     if (!is_channel_none && req_ptr != nullptr && !is_req_empty && rsp_ptr != nullptr) {
         return PUB_ERR_NONE;
     }
-    pub_log_error(source, PUB_ERR_PARAM, func, line);
-    pub_log_flags(source, {is_channel_none, req_ptr == nullptr, is_req_empty, rsp_ptr == nullptr});
-    return PUB_ERR_PARAM;
+    return pub_log_bad_param(place, {is_channel_none, req_ptr == nullptr, is_req_empty, rsp_ptr == nullptr});
 }
 
-int amt_reply_enter(const pub_log_source_st &source, uint32_t channel, const amt_buf_st *req_ptr,
-                    const amt_buf_st *rsp_ptr, const char *func, int line)
+int amt_reply_enter(const pub_log_place_st &place, uint32_t channel, const amt_buf_st *req_ptr,
+                    const amt_buf_st *rsp_ptr)
 {
-    pub_log_entry(source, func);
-    return amt_reply_check(source, channel, req_ptr, rsp_ptr, func, line);
+    pub_log_entry(place.m_source, place.m_func_ptr);
+    return amt_reply_check(place, channel, req_ptr, rsp_ptr);
 }
 
-int amt_reply_enter_modem(const pub_log_source_st &source, uint32_t channel, const amt_buf_st *req_ptr,
-                          const amt_buf_st *rsp_ptr, const char *func, int line)
+int amt_reply_enter_modem(const pub_log_place_st &place, uint32_t channel, const amt_buf_st *req_ptr,
+                          const amt_buf_st *rsp_ptr)
 {
-    const int status = amt_reply_enter(source, channel, req_ptr, rsp_ptr, func, line);
-    return status == PUB_ERR_NONE ? amt_reply_check_modem(source, func, line) : status;
+    const int status = amt_reply_enter(place, channel, req_ptr, rsp_ptr);
+    return status == PUB_ERR_NONE ? amt_reply_check_modem(place) : status;
 }
 
-int amt_reply_check_modem(const pub_log_source_st &source, const char *func, int line)
+int amt_reply_check_modem(const pub_log_place_st &place)
 {
     if (g_handle_state.m_is_no_modem == 0) {
         return PUB_ERR_NONE;
     }
-    pub_log_error(source, PUB_ERR_NO_MODEM, func, line);
-    PUB_LOG(source, "WARNING !");
-    PUB_LOG(source, "no CP.");
+    pub_log_fail(place, PUB_ERR_NO_MODEM, "WARNING !");
+    PUB_LOG(place.m_source, "no CP.");
     return PUB_ERR_NO_MODEM;
 }
 
@@ -138,17 +134,13 @@ int amt_handle_send_rsp(uint32_t channel, amt_buf_st *rsp_ptr)
         rsp_ptr->m_buf_len = amt_packet_get_length(rsp_ptr->m_buf_a);
     }
     if (rsp_ptr->m_buf_len == 0 || rsp_ptr->m_buf_len > sizeof(rsp_ptr->m_buf_a)) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
-        return PUB_ERR_PARAM;
+        return pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
     }
     const int fd = get_fd(channel);
     if (fd <= 0) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
-        PUB_LOG(g_amt_handle_log, "invalid fd");
-        return PUB_ERR_FAIL;
+        return pub_log_fail(g_amt_handle_log, PUB_ERR_FAIL, "invalid fd");
     }
-    const int status = write_rsp(fd, rsp_ptr);
-    if (status != PUB_ERR_NONE) {
+    if (const int status = write_rsp(fd, rsp_ptr); status != PUB_ERR_NONE) {
         return status;
     }
     pub_log_dump(g_amt_handle_log,
@@ -160,26 +152,18 @@ int amt_handle_send_rsp(uint32_t channel, amt_buf_st *rsp_ptr)
 
 int amt_handle_send_rsp_ok(uint32_t channel, amt_buf_st *rsp_ptr, uint8_t rsp_id)
 {
-    if (check_sender(channel, rsp_ptr) != PUB_ERR_NONE) {
-        return PUB_ERR_PARAM;
-    }
     return send_result(channel, rsp_ptr, rsp_id, 0);
 }
 
 int amt_handle_send_rsp_err(uint32_t channel, amt_buf_st *rsp_ptr, uint8_t rsp_id, int32_t code)
 {
-    if (check_sender(channel, rsp_ptr) != PUB_ERR_NONE) {
-        return PUB_ERR_PARAM;
-    }
     return send_result(channel, rsp_ptr, rsp_id, code);
 }
 
 int amt_handle_send_pre_rsp_for_pc(uint32_t channel, amt_buf_st *rsp_ptr)
 {
     if (channel != AMT_CHANNEL_PC || rsp_ptr == nullptr) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
-        pub_log_flags(g_amt_handle_log, {channel != AMT_CHANNEL_PC, rsp_ptr == nullptr});
-        return PUB_ERR_PARAM;
+        return pub_log_bad_param(g_amt_handle_log, {channel != AMT_CHANNEL_PC, rsp_ptr == nullptr});
     }
     amt_handle_clear_buf(rsp_ptr);
     memcpy(rsp_ptr->m_buf_a, g_pre_rsp_a, sizeof(g_pre_rsp_a));

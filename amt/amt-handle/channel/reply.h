@@ -21,26 +21,22 @@ constexpr int32_t AMT_RESULT_NOT_SERVED = 1;
  * channel not AMT_CHANNEL_NONE, request present and not empty, response present. Returns 0, or PUB_ERR_PARAM
  * after the caller's error line and a flag for each of the four.
  */
-int amt_reply_enter(const pub_log_source_st &source, uint32_t channel, const amt_buf_st *req_ptr,
-                    const amt_buf_st *rsp_ptr, const char *func = __builtin_FUNCTION(),
-                    int line = __builtin_LINE());
+int amt_reply_enter(const pub_log_place_st &place, uint32_t channel, const amt_buf_st *req_ptr,
+                    const amt_buf_st *rsp_ptr);
 
 /* The check alone, for a handler that logs no entry line. */
-int amt_reply_check(const pub_log_source_st &source, uint32_t channel, const amt_buf_st *req_ptr,
-                    const amt_buf_st *rsp_ptr, const char *func = __builtin_FUNCTION(),
-                    int line = __builtin_LINE());
+int amt_reply_check(const pub_log_place_st &place, uint32_t channel, const amt_buf_st *req_ptr,
+                    const amt_buf_st *rsp_ptr);
 
 /* As amt_reply_enter, for a handler that needs the modem: PUB_ERR_NO_MODEM when there is none. */
-int amt_reply_enter_modem(const pub_log_source_st &source, uint32_t channel, const amt_buf_st *req_ptr,
-                          const amt_buf_st *rsp_ptr, const char *func = __builtin_FUNCTION(),
-                          int line = __builtin_LINE());
+int amt_reply_enter_modem(const pub_log_place_st &place, uint32_t channel, const amt_buf_st *req_ptr,
+                          const amt_buf_st *rsp_ptr);
 
 /*
  * Whether the modem's AT device could be opened at start-up: 0, or PUB_ERR_NO_MODEM after the caller's error
  * line and two more. For a handler that does not check its arguments.
  */
-int amt_reply_check_modem(const pub_log_source_st &source, const char *func = __builtin_FUNCTION(),
-                          int line = __builtin_LINE());
+int amt_reply_check_modem(const pub_log_place_st &place);
 
 /* Clears the whole response and starts the packet rsp_id in it. */
 void amt_reply_start(amt_buf_st *rsp_ptr, uint8_t rsp_id);

@@ -3,6 +3,7 @@
 #include <signal.h>
 
 #include "pub/log/log.h"
+#include "pub/util/signal-table.h"
 #include "pub/util/thread-end.h"
 
 namespace {
@@ -33,22 +34,13 @@ void create_end_key()
     pthread_key_create(&g_end_key, clear_record);
 }
 
-sigset_t get_end_signal()
-{
-    sigset_t set;
-    sigemptyset(&set);
-    sigaddset(&set, SIGUSR1);
-    return set;
-}
-
 void *run(void *argument)
 {
     auto *const worker_ptr = static_cast<amt_worker_st *>(argument);
     pub_log_prepare_thread();
     pub_util_defer_thread_end();
     pthread_setspecific(g_end_key, worker_ptr);
-    sigset_t none;
-    sigemptyset(&none);
+    const sigset_t none = pub_util_get_signal_set({});
     pthread_sigmask(SIG_SETMASK, &none, nullptr);
     worker_ptr->m_loop();
     return nullptr;
@@ -89,7 +81,7 @@ int amt_worker_start(amt_worker_st *worker_ptr, void (*loop)())
     pthread_once(&g_end_key_once, create_end_key);
     signal(SIGUSR1, pub_util_handle_thread_signal);
     worker_ptr->m_loop = loop;
-    const sigset_t end_signal = get_end_signal();
+    const sigset_t end_signal = pub_util_get_signal_set({SIGUSR1});
     sigset_t own_mask;
     pthread_sigmask(SIG_BLOCK, &end_signal, &own_mask);
     const int error = create_detached(worker_ptr);

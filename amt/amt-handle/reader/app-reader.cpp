@@ -5,9 +5,8 @@
 #include <unistd.h>
 
 #include "amt/amt-handle/channel/context.h"
-#include "amt/amt-handle/channel/service-process.h"
+#include "amt/amt-handle/channel/process-end.h"
 #include "amt/amt-handle/reader/dispatch.h"
-#include "amt/amt-handle/reader/line-reader.h"
 #include "amt/amt-log.h"
 #include "pub/error.h"
 
@@ -32,8 +31,7 @@ bool reopen_pty()
 void give_up_pty()
 {
     pub_pty_st *const pty_ptr = &g_handle_context.m_pty;
-    pub_log_sys_call(g_amt_handle_log, "read");
-    pub_log_error(g_amt_handle_log, PUB_ERR_SYS_CALL, "amt_handle_read_app_loop");
+    pub_log_call_error({g_amt_handle_log, "amt_handle_read_app_loop"}, "read", PUB_ERR_SYS_CALL);
     PUB_LOG(g_amt_handle_log, "pty disconnect: pts name(%s), pts mapping name(%s), thread id(%d), PTM fd(%d)",
             pty_ptr->m_pts_name_a, pty_ptr->m_pts_mapping_name_a, static_cast<int>(gettid()),
             pty_ptr->m_ptm_fd);

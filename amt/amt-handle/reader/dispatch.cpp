@@ -26,15 +26,13 @@ int call_handler(amt_handle_func handler, uint32_t channel, amt_buf_st *req_ptr,
 int call_app_handler(uint32_t id)
 {
     if (id >= AMT_HANDLE_FUNC_COUNT) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL, "handle_amt_app_req");
-        PUB_LOG(g_amt_handle_log, "unknown AMT request id: %u", id);
-        return PUB_ERR_FAIL;
+        return pub_log_fail({g_amt_handle_log, "handle_amt_app_req"}, PUB_ERR_FAIL,
+                            "unknown AMT request id: %u", id);
     }
     const amt_handle_func handler = g_handle_context.m_handle_app_func_a[id];
     if (handler == nullptr) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL, "handle_amt_app_req");
-        PUB_LOG(g_amt_handle_log, "unregistered AMT request id: %u", id);
-        return PUB_ERR_FAIL;
+        return pub_log_fail({g_amt_handle_log, "handle_amt_app_req"}, PUB_ERR_FAIL,
+                            "unregistered AMT request id: %u", id);
     }
     return call_handler(handler, AMT_CHANNEL_APP, &g_handle_context.m_req, &g_handle_context.m_rsp_app);
 }
@@ -63,8 +61,7 @@ void handle_amt_app_req()
 {
     pub_log_entry(g_amt_handle_log);
     if (g_handle_context.m_req.m_buf_len == 0) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
-        pub_log_flags(g_amt_handle_log, {false, false, true, false});
+        pub_log_bad_param(g_amt_handle_log, {false, false, true, false});
         return;
     }
     const uint32_t id = read_command_id(&g_handle_context.m_req);

@@ -179,9 +179,7 @@ int handle_amt_imei_and_sn_save_file(const identity_st &identity, const pending_
     PUB_LOG(g_amt_handle_log, "save %s to file. channel:%d; content:%s;", identity.m_name_ptr,
             write.m_channel, write.m_text_a);
     if (status != PUB_ERR_NONE) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
-        PUB_LOG(g_amt_handle_log, "write %s error.", identity.m_name_ptr);
-        return PUB_ERR_FAIL;
+        return pub_log_fail(g_amt_handle_log, PUB_ERR_FAIL, "write %s error.", identity.m_name_ptr);
     }
     PUB_LOG(g_amt_handle_log, "Writed %s to file success.", identity.m_name_ptr);
     return PUB_ERR_NONE;

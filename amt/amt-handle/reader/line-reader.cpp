@@ -1,4 +1,4 @@
-#include "amt/amt-handle/reader/line-reader.h"
+#include "amt/amt-handle/reader/reader.h"
 
 #include "amt/amt-handle/channel/context.h"
 #include "amt/amt-handle/channel/process-end.h"

@@ -6,7 +6,6 @@
 #include "amt/amt-handle/channel/context.h"
 #include "amt/amt-handle/handshake.h"
 #include "amt/amt-handle/reader/identity-write.h"
-#include "amt/amt-handle/reader/line-reader.h"
 #include "amt/amt-log.h"
 
 namespace {

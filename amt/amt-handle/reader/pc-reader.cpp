@@ -4,12 +4,11 @@
 
 #include "amt/amt-handle/at/at-command.h"
 #include "amt/amt-handle/channel/context.h"
+#include "amt/amt-handle/channel/process-end.h"
 #include "amt/amt-handle/channel/reply.h"
-#include "amt/amt-handle/channel/service-process.h"
 #include "amt/amt-handle/handshake.h"
 #include "amt/amt-handle/reader/dispatch.h"
 #include "amt/amt-handle/reader/identity-write.h"
-#include "amt/amt-handle/reader/line-reader.h"
 #include "amt/amt-log.h"
 #include "pub/error.h"
 
@@ -22,7 +21,7 @@ bool serve_request()
 {
     amt_buf_st *const req_ptr = &g_handle_context.m_req;
     if (req_ptr->m_buf_len == 0) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM, "amt_handle_read_pc_loop");
+        pub_log_error({g_amt_handle_log, "amt_handle_read_pc_loop"}, PUB_ERR_PARAM);
         return false;
     }
     uint32_t id = AMT_ID_NO_PACKET;

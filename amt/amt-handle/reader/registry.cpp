@@ -167,8 +167,7 @@ void register_table(int table, const registration_st *row_ptr, const registratio
 int amt_handle_reg_handle_func(int table, uint32_t id, amt_handle_func handler, amt_ack_en ack)
 {
     if (id >= AMT_HANDLE_FUNC_COUNT) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
-        return PUB_ERR_PARAM;
+        return pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
     }
     const bool is_pc = table == AMT_TABLE_PC;
     amt_handle_func *const slot_ptr =

@@ -63,11 +63,9 @@ bool read_property(const char *key, char *value, const char *unset)
 }
 
 /* The failure of a property that the text starts with. */
-int fail_property(const char *key, int line = __builtin_LINE())
+int fail_property(const char *key, const pub_log_place_st &place = {g_amt_handle_log, "get_ap_sw_version"})
 {
-    pub_log_error(g_amt_handle_log, PUB_ERR_FAIL, "get_ap_sw_version", line);
-    PUB_LOG(g_amt_handle_log, "read %s error", key);
-    return PUB_ERR_FAIL;
+    return pub_log_fail(place, PUB_ERR_FAIL, "read %s error", key);
 }
 
 bool is_own_brand()
@@ -158,9 +156,8 @@ int get_ap_sw_version(char *buf, uint32_t *length_ptr)
 {
     pub_log_entry(g_amt_handle_log);
     if (buf == nullptr || length_ptr == nullptr) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
-        PUB_LOG(g_amt_handle_log, " %d, %d", buf == nullptr, length_ptr == nullptr);
-        return PUB_ERR_PARAM;
+        return pub_log_fail(g_amt_handle_log, PUB_ERR_PARAM, " %d, %d", buf == nullptr,
+                            length_ptr == nullptr);
     }
     *length_ptr = 0;
     version_text_st version = {};
@@ -178,24 +175,7 @@ int get_ap_sw_version(char *buf, uint32_t *length_ptr)
 
 int amt_read_emmc_info(char *buf)
 {
-    pub_log_entry(g_amt_handle_log);
-    const pub_file_step_en step = pub_file_read_line(EMMC_INFO_FILE, buf, LINE_SIZE);
-    if (step == pub_file_step_en::OPEN_FAILED) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
-        PUB_LOG(g_amt_handle_log, "open %s fail", EMMC_INFO_FILE);
-        return PUB_ERR_FAIL;
-    }
-    if (step != pub_file_step_en::DONE) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
-        PUB_LOG(g_amt_handle_log, "read fail");
-        return PUB_ERR_FAIL;
-    }
-    const size_t length = strlen(buf);
-    PUB_LOG(g_amt_handle_log, "emmc_info_len: %d", static_cast<int>(length));
-    if (length > 0) {
-        buf[length - 1] = '\0';
-    }
-    return PUB_ERR_NONE;
+    return amt_read_cut_line(EMMC_INFO_FILE, buf, LINE_SIZE, "emmc_info_len");
 }
 
 int amt_read_cm_info(char *buf)
@@ -204,15 +184,12 @@ int amt_read_cm_info(char *buf)
     buf[0] = '\0';
     const pub_file_st file(CARRIER_FILE, pub_file_mode_en::READ);
     if (!file.is_open()) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
-        PUB_LOG(g_amt_handle_log, "open cm file %s fail", CARRIER_FILE);
-        return PUB_ERR_FAIL;
+        return pub_log_fail(g_amt_handle_log, PUB_ERR_FAIL, "open cm file %s fail", CARRIER_FILE);
     }
     char line_a[LINE_SIZE] = {};
     while (strstr(line_a, CARRIER_KEY) == nullptr) {
         if (pub_file_get_line(file, line_a, sizeof(line_a)) == 0) {
-            pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
-            return PUB_ERR_FAIL;
+            return pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
         }
     }
     /* The path in this line is not the file's; log readers know it so. */

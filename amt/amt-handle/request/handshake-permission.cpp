@@ -1,8 +1,6 @@
 #include "amt/amt-handle/request/handshake-permission.h"
 
-#include <errno.h>
 #include <stdlib.h>
-#include <string.h>
 
 #include "amt/amt-handle/channel/factory-file.h"
 #include "amt/amt-handle/request/identity-store.h"
@@ -14,16 +12,8 @@ namespace {
 /* Makes the digit durable. The log says which step failed. */
 int amt_write_content_to_file_sync(const char *digit)
 {
-    const pub_file_step_en step = amt_factory_file_write(AMT_PERMISSION_FILE, digit);
-    if (step == pub_file_step_en::OPEN_FAILED) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_FILE);
-        PUB_LOG(g_amt_handle_log, "open(\"%s\") fail: %d - %s", AMT_PERMISSION_FILE, errno, strerror(errno));
-        return PUB_ERR_FILE;
-    }
-    if (step != pub_file_step_en::DONE) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_FILE);
-        PUB_LOG(g_amt_handle_log, "fputs fail: %d - %s", errno, strerror(errno));
-        return PUB_ERR_FILE;
+    if (const int status = amt_factory_file_store(AMT_PERMISSION_FILE, digit); status != PUB_ERR_NONE) {
+        return status;
     }
     PUB_LOG(g_amt_handle_log, "Writed to file(%s) success.flag: %s.", AMT_PERMISSION_FILE, digit);
     return PUB_ERR_NONE;
@@ -39,9 +29,8 @@ int handle_amt_damt1_operation(int operation, int *flag_ptr)
     case amt_permission_en::FORBID:
     case amt_permission_en::PERMIT:
         if (amt_write_content_to_file_sync(operation == 0 ? "0" : "1") != PUB_ERR_NONE) {
-            pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
-            PUB_LOG(g_amt_handle_log, "write error to do-not-permit-handshake file.");
-            return PUB_ERR_FAIL;
+            return pub_log_fail(g_amt_handle_log, PUB_ERR_FAIL,
+                                "write error to do-not-permit-handshake file.");
         }
         *flag_ptr = operation;
         return PUB_ERR_NONE;
@@ -49,9 +38,8 @@ int handle_amt_damt1_operation(int operation, int *flag_ptr)
         *flag_ptr = amt_permission_read(text_a, &is_read);
         return PUB_ERR_NONE;
     }
-    pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
-    PUB_LOG(g_amt_handle_log, "unknown operation type: %u", static_cast<unsigned>(operation));
-    return PUB_ERR_PARAM;
+    return pub_log_fail(g_amt_handle_log, PUB_ERR_PARAM, "unknown operation type: %u",
+                        static_cast<unsigned>(operation));
 }
 
 int amt_permission_read(char *text_ptr, bool *is_read_ptr)

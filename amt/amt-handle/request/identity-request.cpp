@@ -19,24 +19,16 @@ constexpr int32_t ADB_LENGTH_MAX = 99;
 constexpr const char *ADB_FILE = "/amt/usb_serial";
 constexpr const char *ADB_HANDLER = "amt_handle_adb_serial_no";
 
-/* The last lines of a failed request: they name the handler, not the step that failed. */
-int fail_request(const char *text, const char *func = __builtin_FUNCTION(), int line = __builtin_LINE())
-{
-    pub_log_error(g_amt_handle_log, PUB_ERR_FAIL, func, line);
-    PUB_LOG(g_amt_handle_log, "%s", text);
-    return PUB_ERR_FAIL;
-}
-
 /* Adds the first word of the file to the response. */
 int read_adb_serial(amt_buf_st *rsp_ptr)
 {
     char serial_a[ADB_LENGTH_MAX + 1];
     const pub_file_step_en step = pub_file_read_word(ADB_FILE, serial_a, sizeof(serial_a));
     if (step == pub_file_step_en::OPEN_FAILED) {
-        return fail_request("fopen error", ADB_HANDLER);
+        return pub_log_fail({g_amt_handle_log, ADB_HANDLER}, PUB_ERR_FAIL, "fopen error");
     }
     if (step != pub_file_step_en::DONE) {
-        return fail_request("fscanf error", ADB_HANDLER);
+        return pub_log_fail({g_amt_handle_log, ADB_HANDLER}, PUB_ERR_FAIL, "fscanf error");
     }
     PUB_LOG(g_amt_handle_log, "read adb serial no. ok, it is : %s", serial_a);
     amt_packet_add_string(rsp_ptr->m_buf_a, AMT_ATOM_ADB_SERIAL, serial_a);
@@ -47,7 +39,8 @@ int write_adb_serial(const amt_buf_st *req_ptr)
 {
     const int32_t length = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_ADB_LENGTH);
     if (length < 1 || length > ADB_LENGTH_MAX) {
-        return fail_request("Invalid adb serial number length!", ADB_HANDLER);
+        return pub_log_fail({g_amt_handle_log, ADB_HANDLER}, PUB_ERR_FAIL,
+                            "Invalid adb serial number length!");
     }
     char serial_a[ADB_LENGTH_MAX + 1] = {};
     const uint32_t capacity = static_cast<uint32_t>(length) + 1;
@@ -56,11 +49,11 @@ int write_adb_serial(const amt_buf_st *req_ptr)
 
     const pub_file_step_en step = amt_factory_file_write(ADB_FILE, serial_a);
     if (step == pub_file_step_en::OPEN_FAILED) {
-        return fail_request("fopen error", ADB_HANDLER);
+        return pub_log_fail({g_amt_handle_log, ADB_HANDLER}, PUB_ERR_FAIL, "fopen error");
     }
     PUB_LOG(g_amt_handle_log, "open file \"%s\" ok", ADB_FILE);
     if (step != pub_file_step_en::DONE) {
-        return fail_request("fprintf error", ADB_HANDLER);
+        return pub_log_fail({g_amt_handle_log, ADB_HANDLER}, PUB_ERR_FAIL, "fprintf error");
     }
     PUB_LOG(g_amt_handle_log, "write adb serial no.[%s] ok", serial_a);
     return PUB_ERR_NONE;
@@ -82,7 +75,7 @@ int amt_handle_board_pcba_ctrl(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st
     switch (operation) {
     case PCBA_READ:
         if (amt_read_pcba_sn(sn_a) != PUB_ERR_NONE) {
-            return fail_request("read error.");
+            return pub_log_fail(g_amt_handle_log, PUB_ERR_FAIL, "read error.");
         }
         PUB_LOG(g_amt_handle_log, "readed pcba-sn: %s.", sn_a);
         amt_packet_add_string(rsp_ptr->m_buf_a, AMT_ATOM_PCBA_SN, sn_a);
@@ -92,14 +85,12 @@ int amt_handle_board_pcba_ctrl(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st
         sn_a[sizeof(sn_a) - 1] = '\0'; /* a text of exactly this size comes without its terminator */
         PUB_LOG(g_amt_handle_log, "getted pcba-sn: %s.", sn_a);
         if (amt_write_pcba_sn(sn_a, AMT_PCBA_SN_FILE) != PUB_ERR_NONE) {
-            return fail_request("write error.");
+            return pub_log_fail(g_amt_handle_log, PUB_ERR_FAIL, "write error.");
         }
         PUB_LOG(g_amt_handle_log, "Writed to file success.pcba-sn: %s.", sn_a);
         break;
     default:
-        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
-        PUB_LOG(g_amt_handle_log, "unknown operation type: %u", operation);
-        return PUB_ERR_PARAM;
+        return pub_log_fail(g_amt_handle_log, PUB_ERR_PARAM, "unknown operation type: %u", operation);
     }
     return amt_reply_finish_ok(channel, rsp_ptr);
 }
@@ -111,18 +102,9 @@ int amt_handle_adb_serial_no(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *
     }
     amt_reply_start(rsp_ptr, AMT_ADB_SERIAL_NO_RSPCMD);
     const int32_t operation = amt_packet_get_int(req_ptr->m_buf_a, AMT_ATOM_ADB_OPERATION);
-    int status = PUB_ERR_PARAM;
-    switch (operation) {
-    case ADB_READ:
-        status = read_adb_serial(rsp_ptr);
-        break;
-    case ADB_WRITE:
-        status = write_adb_serial(req_ptr);
-        break;
-    default:
-        pub_log_error(g_amt_handle_log, status);
-        PUB_LOG(g_amt_handle_log, "unknown operation: %d", operation);
-        break;
+    if (operation != ADB_READ && operation != ADB_WRITE) {
+        return pub_log_fail(g_amt_handle_log, PUB_ERR_PARAM, "unknown operation: %d", operation);
     }
+    const int status = operation == ADB_READ ? read_adb_serial(rsp_ptr) : write_adb_serial(req_ptr);
     return status == PUB_ERR_NONE ? amt_reply_finish_ok(channel, rsp_ptr) : status;
 }

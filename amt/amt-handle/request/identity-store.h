@@ -3,6 +3,7 @@
 #include <stdint.h>
 
 #include "amt/amt-handle/request/nvram-file.h"
+#include "amt/amt-log.h"
 
 /*
  * The handset's identity, kept as small text files under "/amt": IMEI and serial number of each modem
@@ -52,6 +53,14 @@ const char *get_bt_addr_file();
  * made).
  */
 int amt_make_folder(const char *path);
+
+/*
+ * Reads the first line of a file into buf (size bytes), terminated, less its last character, which is the line
+ * feed; the log calls its length length_name. Returns 0, or PUB_ERR_FAIL with buf empty, after the two lines of
+ * the failure. The place's function has its entry line here.
+ */
+int amt_read_cut_line(const char *path, char *buf, uint32_t size, const char *length_name,
+                      const pub_log_place_st &place = g_amt_handle_log);
 
 /*
  * Reads the Wi-Fi address into buf (AMT_WIFI_ADDRESS_SIZE bytes), less the last character of its line, which

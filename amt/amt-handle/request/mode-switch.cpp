@@ -67,15 +67,13 @@ void end_program()
 
 /* As amt_reply_enter, for the handlers that accept an empty request. */
 int enter_with_any_request(uint32_t channel, const amt_buf_st *req_ptr, const amt_buf_st *rsp_ptr,
-                           const char *func = __builtin_FUNCTION(), int line = __builtin_LINE())
+                           const pub_log_place_st &place = g_amt_handle_log)
 {
-    pub_log_entry(g_amt_handle_log, func);
+    pub_log_entry(place.m_source, place.m_func_ptr);
     if (channel != AMT_CHANNEL_NONE && req_ptr != nullptr && rsp_ptr != nullptr) {
         return PUB_ERR_NONE;
     }
-    pub_log_error(g_amt_handle_log, PUB_ERR_PARAM, func, line);
-    pub_log_flags(g_amt_handle_log, {channel == AMT_CHANNEL_NONE, req_ptr == nullptr, rsp_ptr == nullptr});
-    return PUB_ERR_PARAM;
+    return pub_log_bad_param(place, {channel == AMT_CHANNEL_NONE, req_ptr == nullptr, rsp_ptr == nullptr});
 }
 
 } // namespace
@@ -157,7 +155,6 @@ void amt_power_off_handset()
 {
     pub_util_sleep_ms(PC_PAUSE_MS);
     if (reboot(RB_POWER_OFF) != 0) {
-        pub_log_sys_call(g_amt_handle_log, "reboot");
-        pub_log_error(g_amt_handle_log, PUB_ERR_SYS_CALL);
+        pub_log_call_error(g_amt_handle_log, "reboot", PUB_ERR_SYS_CALL);
     }
 }

@@ -105,15 +105,13 @@ int amt_modem_handle_req(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_
     status = amt_convert_req_amt_data_2_at_data(req_ptr->m_buf_a, g_raw.m_buf_a, AMT_PACKET_SIZE,
                                                 &g_raw.m_buf_len);
     if (status != PUB_ERR_NONE) {
-        pub_log_error(g_amt_handle_log, status);
-        return status;
+        return pub_log_error(g_amt_handle_log, status);
     }
     const uint32_t needed = static_cast<uint32_t>(COMMAND.size()) + 2 + 2 * g_raw.m_buf_len;
     if (needed > AMT_AT_AREA_SIZE - 1) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
-        PUB_LOG(g_amt_handle_log, "(%ld + %ld * 2 + 2) < %d", static_cast<long>(COMMAND.size()),
-                static_cast<long>(g_raw.m_buf_len), static_cast<int>(AMT_AT_AREA_SIZE));
-        return PUB_ERR_FAIL;
+        return pub_log_fail(g_amt_handle_log, PUB_ERR_FAIL, "(%ld + %ld * 2 + 2) < %d",
+                            static_cast<long>(COMMAND.size()), static_cast<long>(g_raw.m_buf_len),
+                            static_cast<int>(AMT_AT_AREA_SIZE));
     }
     encode_request();
     tunnel_context_st tunnel = {channel, rsp_ptr};

@@ -1,4 +1,4 @@
-#include "amt/amt-handle/request/modem-version.h"
+#include "amt/amt-handle/request/version.h"
 
 #include <string.h>
 #include <string_view>
@@ -83,18 +83,14 @@ int get_l1_hls_version(int32_t type, uint8_t *version, uint32_t *length_ptr)
     uint32_t length = 0;
     if (const int status = amt_at_get_value("\r\n^DCMR:", VALUE_LIMIT, value_a, &length);
         status != PUB_ERR_NONE) {
-        pub_log_error(g_amt_handle_log, status);
-        return status;
+        return pub_log_error(g_amt_handle_log, status);
     }
     if (length == 0) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
-        return PUB_ERR_PARAM;
+        return pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
     }
     const std::string_view value(value_a, length);
     if (value.find(',') == std::string_view::npos) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
-        PUB_LOG(g_amt_handle_log, "DCMR-query's result[%s] is invalid", value_a);
-        return PUB_ERR_FAIL;
+        return pub_log_fail(g_amt_handle_log, PUB_ERR_FAIL, "DCMR-query's result[%s] is invalid", value_a);
     }
     *length_ptr = decode_hex(cut_hex_text(value), version);
     return PUB_ERR_NONE;

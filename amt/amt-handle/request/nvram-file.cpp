@@ -28,17 +28,10 @@ constexpr uint32_t LINE_COUNT_MAX = 99;
 /* Every failure here is one of this operation, and is logged under its name. */
 constexpr char OPERATION[] = "amt_write_wifi_to_nvram_file";
 
-int fail(int line = __builtin_LINE())
+int fail_on(const char *action, const char *path,
+            const pub_log_place_st &place = {g_amt_handle_log, OPERATION})
 {
-    pub_log_error(g_amt_handle_log, PUB_ERR_FAIL, OPERATION, line);
-    return PUB_ERR_FAIL;
-}
-
-int fail_on(const char *action, const char *path, int line = __builtin_LINE())
-{
-    fail(line);
-    PUB_LOG(g_amt_handle_log, "%s  %s fail", action, path);
-    return PUB_ERR_FAIL;
+    return pub_log_fail(place, PUB_ERR_FAIL, "%s  %s fail", action, path);
 }
 
 /* The text behind the address key of a line that sets the address; null for any other line. */
@@ -75,13 +68,12 @@ void open_driver_file_to_all()
 {
     const pub_file_st file(DRIVER_FILE, pub_file_mode_en::READ);
     if (!file.is_open()) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_FILE, OPERATION);
-        PUB_LOG(g_amt_handle_log, "open %s failed", DRIVER_FILE);
+        pub_log_fail({g_amt_handle_log, OPERATION}, PUB_ERR_FILE, "open %s failed", DRIVER_FILE);
         return;
     }
     if (fchmod(fileno(file.m_stream_ptr), DRIVER_FILE_MODE) != 0) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_FILE, OPERATION);
-        PUB_LOG(g_amt_handle_log, "fchmod  %s failed, %s", DRIVER_FILE, strerror(errno));
+        pub_log_fail({g_amt_handle_log, OPERATION}, PUB_ERR_FILE, "fchmod  %s failed, %s", DRIVER_FILE,
+                     strerror(errno));
         return;
     }
     PUB_LOG(g_amt_handle_log, "fchmod  %s successfully", DRIVER_FILE);
@@ -114,11 +106,10 @@ int amt_nvram_copy(const pub_file_st &source, const pub_file_st &destination, co
         PUB_LOG(g_amt_handle_log, "new wifi_addr_nvram: %s", address);
     }
     if (fflush(out) != 0 || ferror(out) != 0) {
-        fail();
-        pub_log_sys_call(g_amt_handle_log, "fputs");
-        return PUB_ERR_FAIL;
+        return pub_log_error_call({g_amt_handle_log, OPERATION}, PUB_ERR_FAIL, "fputs");
     }
-    return line_count > LINE_COUNT_MAX ? fail() : PUB_ERR_NONE;
+    return line_count > LINE_COUNT_MAX ? pub_log_error({g_amt_handle_log, OPERATION}, PUB_ERR_FAIL)
+                                       : PUB_ERR_NONE;
 }
 
 int amt_write_wifi_to_nvram_file()

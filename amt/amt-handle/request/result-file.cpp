@@ -23,10 +23,9 @@ void log_failure(const char *call, const char *path)
     PUB_LOG(g_amt_handle_log, "%s(%s) failure. errorr: %d - %s", call, path, errno, strerror(errno));
 }
 
-int fail_access(const char *call, const char *path, const char *func = __builtin_FUNCTION(),
-                int line = __builtin_LINE())
+int fail_access(const char *call, const char *path, const pub_log_place_st &place = g_amt_handle_log)
 {
-    pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_ACCESS, func, line);
+    pub_log_error(place, AMT_RESULT_FILE_ERR_ACCESS);
     log_failure(call, path);
     return AMT_RESULT_FILE_ERR_ACCESS;
 }
@@ -46,15 +45,12 @@ const char *get_digit(int32_t verdict)
     return verdict == VERDICT_FAIL ? "2" : "0";
 }
 
-int check_index(int32_t index, int32_t count, const char *func = __builtin_FUNCTION(),
-                int line = __builtin_LINE())
+int check_index(int32_t index, int32_t count, const pub_log_place_st &place = g_amt_handle_log)
 {
     if (index < count) {
         return PUB_ERR_NONE;
     }
-    pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_ITEM, func, line);
-    PUB_LOG(g_amt_handle_log, "item index error: %d\n", index);
-    return AMT_RESULT_FILE_ERR_ITEM;
+    return pub_log_fail(place, AMT_RESULT_FILE_ERR_ITEM, "item index error: %d\n", index);
 }
 
 /* Stores a verdict for the operation that calls this. */
@@ -62,23 +58,20 @@ int save_result(const char *path, int32_t count, int32_t index, int32_t verdict,
                 const char *func = __builtin_FUNCTION())
 {
     pub_log_entry(g_amt_handle_log, func);
-    if (check_index(index, count, func) != PUB_ERR_NONE) {
+    if (check_index(index, count, {g_amt_handle_log, func}) != PUB_ERR_NONE) {
         return AMT_RESULT_FILE_ERR_ITEM;
     }
     if (access(FOLDER, R_OK | W_OK) != 0) {
-        pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_ACCESS, func);
-        PUB_LOG(g_amt_handle_log, "Save fail: Directory access deny\n");
-        return AMT_RESULT_FILE_ERR_ACCESS;
+        return pub_log_fail({g_amt_handle_log, func}, AMT_RESULT_FILE_ERR_ACCESS,
+                            "Save fail: Directory access deny\n");
     }
     if (access(path, F_OK) != 0 && initTestFile(path, count) != PUB_ERR_NONE) {
-        pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_WRITE, func);
-        PUB_LOG(g_amt_handle_log, "Save fail: init result file error\n");
-        return AMT_RESULT_FILE_ERR_WRITE;
+        return pub_log_fail({g_amt_handle_log, func}, AMT_RESULT_FILE_ERR_WRITE,
+                            "Save fail: init result file error\n");
     }
     if (updateTestItem(path, index, verdict) != PUB_ERR_NONE) {
-        pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_ITEM, func);
-        PUB_LOG(g_amt_handle_log, "Save fail: update result error\n");
-        return AMT_RESULT_FILE_ERR_ITEM;
+        return pub_log_fail({g_amt_handle_log, func}, AMT_RESULT_FILE_ERR_ITEM,
+                            "Save fail: update result error\n");
     }
     return PUB_ERR_NONE;
 }
@@ -89,9 +82,7 @@ int initTestFile(const char *path, int32_t count)
 {
     pub_log_entry(g_amt_handle_log);
     if (count > COUNT_MAX) {
-        pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_ACCESS);
-        PUB_LOG(g_amt_handle_log, "test item error: %d\n", count);
-        return AMT_RESULT_FILE_ERR_ACCESS;
+        return pub_log_fail(g_amt_handle_log, AMT_RESULT_FILE_ERR_ACCESS, "test item error: %d\n", count);
     }
     PUB_LOG(g_amt_handle_log, "initTestFile . path:%s; count: %d\n", path, count);
     const pub_file_st file(path, pub_file_mode_en::WRITE);
@@ -114,8 +105,7 @@ int updateTestItem(const char *path, int32_t index, int32_t verdict)
     seek_item(file, index);
     const char *const digit = get_digit(verdict);
     if (!pub_file_put(file, digit)) {
-        pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_WRITE);
-        return AMT_RESULT_FILE_ERR_WRITE;
+        return pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_WRITE);
     }
     PUB_LOG(g_amt_handle_log, "write item [%d], result= %s\n", index, digit);
     return PUB_ERR_NONE;
@@ -143,9 +133,8 @@ int readProductResult(int32_t index)
     if (access(AMT_PRODUCT_FILE, F_OK) != 0) {
         log_failure("access file", AMT_PRODUCT_FILE);
         if (initTestFile(AMT_PRODUCT_FILE, AMT_PRODUCT_COUNT) != PUB_ERR_NONE) {
-            pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_WRITE);
-            PUB_LOG(g_amt_handle_log, "initTestFile fail: init result file error\n");
-            return AMT_RESULT_FILE_ERR_WRITE;
+            return pub_log_fail(g_amt_handle_log, AMT_RESULT_FILE_ERR_WRITE,
+                                "initTestFile fail: init result file error\n");
         }
     }
     const pub_file_st file(AMT_PRODUCT_FILE, pub_file_mode_en::READ);
@@ -153,9 +142,8 @@ int readProductResult(int32_t index)
         return fail_access("open file", AMT_PRODUCT_FILE);
     }
     if (seek_item(file, index) != 0) {
-        pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_ACCESS);
-        PUB_LOG(g_amt_handle_log, "call fseek failure. errorr: %d - %s", errno, strerror(errno));
-        return AMT_RESULT_FILE_ERR_ACCESS;
+        return pub_log_fail(g_amt_handle_log, AMT_RESULT_FILE_ERR_ACCESS,
+                            "call fseek failure. errorr: %d - %s", errno, strerror(errno));
     }
     char text_a[2] = {};
     if (pub_file_get_line(file, text_a, sizeof(text_a)) > 0) {
@@ -163,9 +151,8 @@ int readProductResult(int32_t index)
         return atoi(text_a);
     }
     if (ferror(file.m_stream_ptr) != 0) {
-        pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_ACCESS);
-        PUB_LOG(g_amt_handle_log, "call fgets error. errorr: %d - %s", errno, strerror(errno));
-        return AMT_RESULT_FILE_ERR_ACCESS;
+        return pub_log_fail(g_amt_handle_log, AMT_RESULT_FILE_ERR_ACCESS, "call fgets error. errorr: %d - %s",
+                            errno, strerror(errno));
     }
     return 0;
 }

@@ -91,11 +91,8 @@ int amt_modem_write_test_result(uint32_t channel, amt_buf_st *req_ptr, amt_buf_s
     log_command();
     status = amt_at_exchange(g_write_exchange, nullptr);
     PUB_LOG(g_amt_handle_log, "amt_modem_write_test_result\tret_val[%d]", status);
-    if (status != PUB_ERR_NONE) {
-        return amt_reply_fail(channel, rsp_ptr, AMT_WRITE_TEST_RESULT_RSPCMD);
-    }
-    amt_reply_start(rsp_ptr, AMT_WRITE_TEST_RESULT_RSPCMD);
-    return amt_reply_finish_ok(channel, rsp_ptr);
+    return status == PUB_ERR_NONE ? amt_handle_send_rsp_ok(channel, rsp_ptr, AMT_WRITE_TEST_RESULT_RSPCMD)
+                                  : amt_reply_fail(channel, rsp_ptr, AMT_WRITE_TEST_RESULT_RSPCMD);
 }
 
 int amt_modem_read_test_result(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)
@@ -153,11 +150,8 @@ int amt_item_write_test_result(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st
                   verdict);
     }
     PUB_LOG(g_amt_handle_log, "amt_item_write_test_result write_item ret_val[%d]", status);
-    if (status != PUB_ERR_NONE) {
-        return amt_reply_fail(channel, rsp_ptr, AMT_WRITE_ITEM_RESULT_RSPCMD);
-    }
-    amt_reply_start(rsp_ptr, AMT_WRITE_ITEM_RESULT_RSPCMD);
-    return amt_reply_finish_ok(channel, rsp_ptr);
+    return status == PUB_ERR_NONE ? amt_handle_send_rsp_ok(channel, rsp_ptr, AMT_WRITE_ITEM_RESULT_RSPCMD)
+                                  : amt_reply_fail(channel, rsp_ptr, AMT_WRITE_ITEM_RESULT_RSPCMD);
 }
 
 int amt_item_read_test_result(uint32_t channel, amt_buf_st *req_ptr, amt_buf_st *rsp_ptr)

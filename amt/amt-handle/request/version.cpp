@@ -4,7 +4,6 @@
 #include "amt/amt-command.h"
 #include "amt/amt-handle/channel/reply.h"
 #include "amt/amt-handle/request/ap-version.h"
-#include "amt/amt-handle/request/modem-version.h"
 #include "amt/amt-packet.h"
 #include "pub/error.h"
 
@@ -78,11 +77,9 @@ void add_version(amt_buf_st *rsp_ptr, const void *version, uint32_t length)
                          static_cast<uint16_t>(length));
 }
 
-int fail_unknown_type(int32_t type, const char *func = __builtin_FUNCTION(), int line = __builtin_LINE())
+int fail_unknown_type(int32_t type, const pub_log_place_st &place = g_amt_handle_log)
 {
-    pub_log_error(g_amt_handle_log, PUB_ERR_FAIL, func, line);
-    PUB_LOG(g_amt_handle_log, "unknown version type: 0x%02x", static_cast<unsigned int>(type));
-    return PUB_ERR_FAIL;
+    return pub_log_fail(place, PUB_ERR_FAIL, "unknown version type: 0x%02x", static_cast<unsigned int>(type));
 }
 
 } // namespace
@@ -118,17 +115,14 @@ int handle_amt_req_l1_hls_version(uint32_t channel, int32_t type, amt_buf_st *re
     const bool is_type_bad = type != AMT_L1_MODULE && type != AMT_HLS_MODULE;
     const bool is_req_empty = req_ptr != nullptr && req_ptr->m_buf_len == 0;
     if (is_none || is_type_bad || req_ptr == nullptr || is_req_empty || rsp_ptr == nullptr) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
-        PUB_LOG(g_amt_handle_log, "%d, module_en:%d, %d, %d, %d", is_none, type, req_ptr == nullptr,
-                is_req_empty, rsp_ptr == nullptr);
-        return PUB_ERR_PARAM;
+        return pub_log_fail(g_amt_handle_log, PUB_ERR_PARAM, "%d, module_en:%d, %d, %d, %d", is_none, type,
+                            req_ptr == nullptr, is_req_empty, rsp_ptr == nullptr);
     }
     uint8_t version_a[AMT_MODEM_VERSION_SIZE];
     uint32_t length = 0;
     if (get_l1_hls_version(type, version_a, &length) != PUB_ERR_NONE) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_FAIL);
-        PUB_LOG(g_amt_handle_log, "get version failure for type: 0x%02x", static_cast<unsigned int>(type));
-        return PUB_ERR_FAIL;
+        return pub_log_fail(g_amt_handle_log, PUB_ERR_FAIL, "get version failure for type: 0x%02x",
+                            static_cast<unsigned int>(type));
     }
     PUB_LOG(g_amt_handle_log, "get version success.type:%d, version:[len:%u content:%s]", type, length,
             reinterpret_cast<const char *>(version_a));
@@ -166,15 +160,12 @@ int set_ap_sw_version_rsp(amt_buf_st *rsp_ptr)
 {
     pub_log_entry(g_amt_handle_log);
     if (rsp_ptr == nullptr) {
-        pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
-        return PUB_ERR_PARAM;
+        return pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
     }
     char version_a[AMT_AP_VERSION_SIZE] = {};
     uint32_t length = 0;
     if (const int status = get_ap_sw_version(version_a, &length); status != PUB_ERR_NONE) {
-        pub_log_error(g_amt_handle_log, status);
-        PUB_LOG(g_amt_handle_log, "failed to get ap's sw version");
-        return status;
+        return pub_log_fail(g_amt_handle_log, status, "failed to get ap's sw version");
     }
     add_version(rsp_ptr, version_a, length);
     return PUB_ERR_NONE;

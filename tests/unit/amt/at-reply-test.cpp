@@ -1,4 +1,4 @@
-#include "amt/amt-handle/at/at-reply.h"
+#include "amt/amt-handle/at/at-handler.h"
 
 #include <string>
 #include <vector>

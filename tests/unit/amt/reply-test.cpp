@@ -300,7 +300,7 @@ TEST(request, needs_the_modem_after_its_arguments)
     EXPECT_EQ(enter(1, &req, &empty), PUB_ERR_NONE);
     EXPECT_EQ(enter_modem(1, &req, &empty), PUB_ERR_NO_MODEM);
     EXPECT_EQ(enter_modem(255, &req, &empty), PUB_ERR_PARAM);
-    EXPECT_EQ(amt_reply_check_modem(g_amt_handle_log, "somebody", 12), PUB_ERR_NO_MODEM);
+    EXPECT_EQ(amt_reply_check_modem({g_amt_handle_log, "somebody", 12}), PUB_ERR_NO_MODEM);
     EXPECT_EQ(without_line_numbers(capture),
               (texts_t{"enter()", "enter_modem()", error_line("amt/amt-gps", "enter_modem", -111),
                        "WARNING !", "no CP.", "enter_modem()", error_line("amt/amt-gps", "enter_modem", -101),

@@ -11,6 +11,7 @@
 #include <gtest/gtest.h>
 
 #include "platform/include/android/log.h"
+#include "pub/error.h"
 #include "tests/unit/support/log-capture.h"
 
 namespace {
@@ -32,6 +33,18 @@ std::string dump_text(uint32_t length)
     const log_capture_c capture;
     pub_log_dump(g_test_log, "title", data.data(), length);
     return capture.texts().at(0);
+}
+
+/* The error line that the given function and line of this file are told in. */
+std::string error_line_of(const std::string &func, int line, int code, int error_number)
+{
+    return "FILE-some/source, LINE-" + std::to_string(line) + ", FUNC-" + func +
+           "(), error_code=" + std::to_string(code) + ", errno=" + std::to_string(error_number);
+}
+
+int fail_for_caller(const pub_log_place_st &place = g_test_log)
+{
+    return pub_log_fail(place, -118, "open(%s) fail: %d", "some file", errno);
 }
 
 } // namespace
@@ -89,6 +102,53 @@ TEST(log, system_call_line)
     errno = ENOENT;
     pub_log_sys_call(g_test_log, "fopen");
     EXPECT_THAT(capture.texts(), testing::ElementsAre("sys call: fopen() failed! errno = 2"));
+}
+
+TEST(log, a_failure_is_the_callers_error_line_and_the_text)
+{
+    const log_capture_c capture;
+    errno = EIO;
+    EXPECT_EQ(pub_log_fail(g_test_log, -111, "100 %% of %d", 7), -111);
+    const int line = __LINE__ - 1;
+    EXPECT_EQ(fail_for_caller(), -118);
+    EXPECT_EQ(fail_for_caller({g_test_log, "other", 5}), -118);
+    EXPECT_EQ(errno, EIO);
+    EXPECT_THAT(capture.texts(),
+                testing::ElementsAre(error_line_of("TestBody", line, -111, EIO), "100 % of 7",
+                                     error_line_of("TestBody", line + 2, -118, EIO),
+                                     "open(some file) fail: 5", error_line_of("other", 5, -118, EIO),
+                                     "open(some file) fail: 5"));
+}
+
+TEST(log, the_text_of_a_failure_holds_a_whole_command)
+{
+    const log_capture_c capture;
+    const std::string command(4096, 'x');
+    pub_log_fail(g_test_log, -1, "system(%s)", command.c_str());
+    EXPECT_EQ(capture.texts()[1], "system(" + command + ")");
+}
+
+TEST(log, the_lines_of_a_failed_call_come_in_the_order_of_the_name)
+{
+    const log_capture_c capture;
+    errno = ENOENT;
+    EXPECT_EQ(pub_log_error_call(g_test_log, -1, "read"), -1);
+    const int line = __LINE__ - 1;
+    EXPECT_EQ(pub_log_call_error(g_test_log, "write", -118), -118);
+    EXPECT_EQ(errno, ENOENT);
+    EXPECT_THAT(capture.texts(), testing::ElementsAre(error_line_of("TestBody", line, -1, ENOENT),
+                                                      "sys call: read() failed! errno = 2",
+                                                      "sys call: write() failed! errno = 2",
+                                                      error_line_of("TestBody", line + 2, -118, ENOENT)));
+}
+
+TEST(log, a_refused_call_shows_what_was_at_fault)
+{
+    const log_capture_c capture;
+    errno = 0;
+    EXPECT_EQ(pub_log_bad_param(g_test_log, {false, true}), PUB_ERR_PARAM);
+    EXPECT_THAT(capture.texts(),
+                testing::ElementsAre(error_line_of("TestBody", __LINE__ - 2, PUB_ERR_PARAM, 0), "0, 1"));
 }
 
 TEST(log, flags_line)

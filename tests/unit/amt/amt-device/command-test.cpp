@@ -1,10 +1,11 @@
-#include "amt/amt-device/command.h"
+#include "amt/amt-device/device-file.h"
 
 #include <string>
 
 #include <gtest/gtest.h>
 
 #include "pub/error.h"
+#include "pub/util/process.h"
 #include "tests/unit/amt/amt-device/shell-record.h"
 #include "tests/unit/support/log-lines.h"
 #include "tests/unit/support/temp-folder.h"
@@ -73,7 +74,7 @@ TEST(run, runs_once_whatever_comes_of_it)
 {
     const temp_folder_c folder;
     const log_capture_c capture;
-    amt_device_run(counting_command(folder.path("count"), 6).c_str());
+    pub_util_run_shell(counting_command(folder.path("count"), 6).c_str());
     EXPECT_EQ(read_whole_file(folder.path("count")), "x");
     EXPECT_TRUE(capture.texts().empty());
 }
