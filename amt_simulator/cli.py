@@ -204,11 +204,14 @@ def run(count: int, path: str, build: str, scenario: str | None, command: Sequen
     from amt_simulator import visit
 
     options = _in_scenario(scenario, {"path": path, "ports": True})
-    with ExitStack() as stack:
-        handsets = visit.bring_up(stack, options.pop("path"), _place(build), options, count)
-        for made in handsets:
-            _announce(made, build)
-        status = visit.run(command, visit.environment(handsets))
+    try:
+        with ExitStack() as stack:
+            handsets = visit.bring_up(stack, options.pop("path"), _place(build), options, count)
+            for made in handsets:
+                _announce(made, build)
+            status = visit.run(command, visit.environment(handsets))
+    except KeyboardInterrupt:
+        status = visit.SIGNALLED + signal.SIGINT
     click.get_current_context().exit(status)
 
 

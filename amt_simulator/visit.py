@@ -46,15 +46,23 @@ def bring_up(stack: ExitStack, path: str, build: Any, options: dict[str, Any],
 def run(command: Sequence[str], env: dict[str, str]) -> int:
     """Run a command to its end, pass signals on to it; its exit status."""
     child: list[subprocess.Popen[bytes]] = []
+    early: list[int] = []
 
     def forward(number: int, _frame: object) -> None:
         # At a terminal, Ctrl-C reaches the command by itself.
-        if child and not (number == signal.SIGINT and _has_terminal()):
+        if number == signal.SIGINT and _has_terminal():
+            return
+        if child:
             child[0].send_signal(number)
+        else:
+            early.append(number)
 
     before = {number: signal.signal(number, forward) for number in FORWARDED}
     try:
         child.append(subprocess.Popen(command, env=env))
+        # The command may run before this process has learnt its id.
+        for number in early:
+            child[0].send_signal(number)
         status = child[0].wait()
     except OSError as error:
         raise click.UsageError(f"{command[0]}: {error.strerror}") from None

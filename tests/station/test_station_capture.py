@@ -116,10 +116,10 @@ def _decoded(item: wire.Item) -> list[str]:
                 ",".join(str(len(atom.content)) for atom in packet.atoms), "", "", ""]
     if isinstance(item, wire.Acknowledgement):
         return ["", "", "", "", "1", "", ""]
-    is_marked = isinstance(item, wire.Skipped)
-    if is_marked and isinstance(item.error, wire.ChecksumError):
-        return ["", "", "", "", "", "", "1"]
-    return ["", "", "", "", "", "1" if is_marked else "", ""]
+    if isinstance(item, wire.Text):
+        return [""] * 7
+    is_summed_wrongly = isinstance(item.error, wire.ChecksumError)
+    return ["", "", "", "", "", "" if is_summed_wrongly else "1", "1" if is_summed_wrongly else ""]
 
 
 # what is damaged

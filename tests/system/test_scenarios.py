@@ -6,11 +6,11 @@ import signal
 import subprocess
 import sys
 from pathlib import Path
-from typing import Callable
+from typing import Any, Callable
 
 import pytest
 
-from amt_simulator import scenarios
+from amt_simulator import scenarios, visit
 from amt_simulator.errors import HandsetError
 from conftest import HandsetFactory
 from support.command import COMMAND, PATIENCE, PROJECT, handset, output
@@ -19,7 +19,7 @@ STATION = [sys.executable, "-m", "amt_station"]
 APP = ["--path", "packet"]
 
 # What is asked of a handset in a scenario, on which path; the exit status, and words of what comes.
-SEEN = {
+SEEN: dict[str, list[tuple[list[str], list[str], int, str]]] = {
     "slow-modem": [([], ["--json", "at", "AT^DMSN"], 0, "^DMSN: KEL0000000000001"),
                    (APP, ["board", "read"], 0, "board: KEL0000000000001")],
     "silent-modem": [([], ["--timeout", "1", "at", "AT^DMSN"], 5, "no final result for AT^DMSN")],
@@ -162,10 +162,26 @@ def test_signals_reach_the_command(number: int, base: Path, handset_build: "str 
     shell = f"trap 'exit 5' TERM INT; echo > {begun}; while :; do sleep 0.1; done"
     with subprocess.Popen([*COMMAND, "run", "--build", str(handset_build), "--", "sh", "-c", shell],
                           cwd=PROJECT, stdin=subprocess.DEVNULL) as process:
-        begun.read_text("utf-8")
-        process.send_signal(number)
-        assert process.wait(PATIENCE) == 5
+        try:
+            begun.read_text("utf-8")
+            process.send_signal(number)
+            assert process.wait(PATIENCE) == 5
+        finally:
+            process.kill()
     assert not list(base.iterdir())
+
+
+def test_a_signal_before_the_command_is_known_reaches_it(monkeypatch: pytest.MonkeyPatch) -> None:
+    """The command may tell that it runs before the process that has started it knows its id."""
+    real = subprocess.Popen
+
+    class Early(real):  # type: ignore[type-arg, valid-type, misc]
+        def __init__(self, *words: Any, **options: Any) -> None:
+            os.kill(os.getpid(), signal.SIGTERM)
+            super().__init__(*words, **options)
+
+    monkeypatch.setattr(subprocess, "Popen", Early)
+    assert visit.run(["sleep", str(10 * PATIENCE)], dict(os.environ)) == 128 + signal.SIGTERM
 
 
 # up --json
