@@ -10,8 +10,8 @@
 
 from __future__ import annotations
 
-import importlib
-from typing import TYPE_CHECKING
+# Like the one of ``typing``, whose import would keep a command's handlers of signals waiting.
+TYPE_CHECKING = False
 
 if TYPE_CHECKING:
     from amt_station.errors import (BadFrame, IncompleteAnswer, NoAnswer, NoPort, OutOfStep,
@@ -38,4 +38,6 @@ def __getattr__(name: str) -> object:
     """Import what a script asks for; the codec alone needs nothing of it."""
     if name not in __all__:
         raise AttributeError(f"module {__name__!r} has no attribute {name!r}")
+    import importlib
+
     return getattr(importlib.import_module(_PLACES.get(name, "amt_station.errors")), name)

@@ -1,24 +1,24 @@
 """``amt-station`` begins here, also as ``python3 -m amt_station``.
 
-What takes time is imported behind the handlers of the signals that end it.
+What takes time is imported behind the handlers of the signals that end it; even ``typing`` does.
 """
 
 import os
 import signal
-from types import FrameType
-from typing import NoReturn, Optional
 
-_WORDS = {signal.SIGINT: b"amt-station: interrupted\n",
-          signal.SIGTERM: b"amt-station: terminated\n"}
+_WORDS = {int(signal.SIGINT): b"amt-station: interrupted\n",
+          int(signal.SIGTERM): b"amt-station: terminated\n"}
 
 
-def _leave(number: int, frame: Optional[FrameType]) -> NoReturn:
-    os.write(2, _WORDS[signal.Signals(number)])
-    os._exit(128 + number)
+def _leave(number: int, frame: object) -> None:
+    try:
+        os.write(2, _WORDS[number])
+    finally:
+        os._exit(128 + number)
 
 
-def main() -> NoReturn:
-    """The ``amt-station`` program."""
+def main() -> None:
+    """The ``amt-station`` program; it does not return."""
     for number in _WORDS:
         signal.signal(number, _leave)
     from amt_station.cli.main import main as carry_out

@@ -8,12 +8,14 @@ from amt_station.errors import BadFrame, NoAnswer, StationError
 from amt_station.exchange import AtReply, Exchange, Transcript
 from amt_station.requests.model import Channel
 from amt_station.requests.table import display_name
-from amt_station.text import shortened
+from amt_station.text import printable, shortened
 from amt_station.wire.decoder import Acknowledgement, BareDecoder, Frame, Item, Skipped, Text
 from amt_station.wire.envelope import HEAD_SIZE, MAGIC
-from amt_station.wire.packet import Packet
+from amt_station.wire.packet import PACKET_SIZE, Packet
 
 _PC_LINE = "this is the PC line, not the app channel: use --pc"
+# A packet that is there is among the first; a line that says anything for ever has no other.
+_LOOKED_AT = 4 * PACKET_SIZE
 _APP_CHANNEL = "this is the app channel, not the PC line: use --app"
 
 
@@ -53,11 +55,11 @@ def unanswered(exchange: Exchange, limit: float) -> StationError:
     damage = _first_damage(arrived)
     if damage is not None:
         return BadFrame(f"the answer to {name} could not be read: {damage.error}", damage.error)
-    instead = _instead(arrived)
+    other = instead(arrived)
     if any(isinstance(item, Acknowledgement) for item in arrived):
-        return NoAnswer(f"{name} was acknowledged, but not answered within {limit:g} s{instead}",
+        return NoAnswer(f"{name} was acknowledged, but not answered within {limit:g} s{other}",
                         arrived)
-    return NoAnswer(f"no answer to {name} within {limit:g} s{instead}", arrived)
+    return NoAnswer(f"no answer to {name} within {limit:g} s{other}", arrived)
 
 
 def no_final_result(reply: AtReply, echoed: bool, limit: float) -> StationError:
@@ -65,24 +67,25 @@ def no_final_result(reply: AtReply, echoed: bool, limit: float) -> StationError:
     arrived = [timed.item for timed in reply.transcript.items]
     wrong = _wrong_line(arrived, Channel.PC)
     if wrong:
-        return BadFrame(f"no final result for {reply.sent} within {limit:g} s: {wrong}")
+        return BadFrame(f"no final result for {printable(reply.sent)} within {limit:g} s: {wrong}")
     damage = _first_damage(reply.stray)
     if damage is not None:
-        return BadFrame(f"the answer to {reply.sent} could not be read: {damage.error}",
+        return BadFrame(f"the answer to {printable(reply.sent)} could not be read: {damage.error}",
                         damage.error)
-    instead = _instead(arrived)
+    other = instead(arrived)
     if echoed and not reply.lines:
-        instead = ": the line only sent the text itself back, as an echo or a loop does"
-    return NoAnswer(f"no final result for {reply.sent} within {limit:g} s{instead}", reply.stray)
+        other = ": the line only sent the text itself back, as an echo or a loop does"
+    return NoAnswer(f"no final result for {printable(reply.sent)} within {limit:g} s{other}",
+                    reply.stray)
 
 
 def no_place(transcript: Transcript, limit: float) -> str:
     """What to say when the link could not find its place."""
     items = [timed.item for timed in transcript.items]
     wrong = _wrong_line(items, transcript.channel)
-    instead = f": {wrong}" if wrong else _instead(items)
+    other = f": {wrong}" if wrong else instead(items)
     return (f"the line is out of step and the handset did not answer {transcript.what} within "
-            f"{limit:g} s{instead}; nothing else was sent")
+            f"{limit:g} s{other}; nothing else was sent")
 
 
 def _wrong_line(items: Sequence[Item], channel: Channel) -> str:
@@ -90,14 +93,15 @@ def _wrong_line(items: Sequence[Item], channel: Channel) -> str:
     if channel is not Channel.PC:
         return ""
     # Some bytes of a bare packet may look like text.
-    unframed = b"".join(item.raw for item in items if isinstance(item, (Skipped, Text)))
+    unframed = b"".join(item.raw for item in items
+                        if isinstance(item, (Skipped, Text)))[:_LOOKED_AT]
     packets = [item.packet for item in BareDecoder().feed(unframed) if isinstance(item, Frame)]
     if not packets or _first_damage(items) is None or MAGIC in unframed:
         return ""
     return f"{_packet(packets[0])} came without an envelope; {_APP_CHANNEL}"
 
 
-def _instead(items: Sequence[Item]) -> str:
+def instead(items: Sequence[Item]) -> str:
     """What came instead of an answer, short enough for the line; empty when nothing did."""
     for item in items:
         if isinstance(item, Frame):

@@ -3,7 +3,6 @@
 
 from __future__ import annotations
 
-import math
 import threading
 import time
 from contextlib import contextmanager
@@ -12,7 +11,7 @@ from types import TracebackType
 from typing import Callable, Iterator, TypeVar
 
 from amt_station import diagnosis, log
-from amt_station.errors import StationError, UsageProblem
+from amt_station.errors import OutOfStep, StationError, UsageProblem
 from amt_station.exchange import TimedItem, Transcript
 from amt_station.port import LastingPort, Port
 from amt_station.replug import reopened
@@ -23,6 +22,11 @@ from amt_station.wire.decoder import BareDecoder, Decoder, EnvelopeDecoder, Item
 _SILENCE = 0.3
 _DRAIN_SECONDS = 1.0
 _MOST_DRAINED = 4096
+# So many may well have waited while this process stood still.
+_FEW_PIECES = 16
+
+# Beyond any wait that is meant: no number of seconds below it is too large for the system.
+_LONGEST_WAIT = 1e9
 
 Observer = Callable[[Transcript], None]
 
@@ -105,11 +109,19 @@ class Line:
     # what arrives
 
     def drain(self) -> list[Item]:
-        """Take what has arrived unasked, for a second at most where that never ends."""
+        """Take what has arrived unasked; ``OutOfStep`` when that does not end within a second.
+
+        On such a line anything may be taken for an answer.
+        """
         items: list[Item] = []
+        pieces = 0
         end = time.monotonic() + _DRAIN_SECONDS
-        while time.monotonic() < end and (data := self.port.read(0.0)):
+        while data := self.port.read(0.0):
             items = (items + self._decode(data))[:_MOST_DRAINED]
+            pieces += 1
+            if time.monotonic() >= end and pieces > _FEW_PIECES:
+                raise OutOfStep(f"the line does not fall silent within {_DRAIN_SECONDS:g} s; "
+                                f"nothing was sent{diagnosis.instead(items)}", items)
         return items + self._decode(b"")
 
     def _decode(self, data: bytes) -> list[Item]:
@@ -171,6 +183,7 @@ class Line:
 
 def checked_seconds(timeout: float) -> float:
     """A time to wait: a finite number of seconds above 0."""
-    if isinstance(timeout, bool) or not math.isfinite(timeout) or timeout <= 0:
+    if (isinstance(timeout, bool) or not isinstance(timeout, (int, float))
+            or not 0 < timeout <= _LONGEST_WAIT):
         raise UsageProblem(f"a time of {timeout} s: it has to be a finite number above 0")
     return timeout

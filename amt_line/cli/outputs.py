@@ -35,12 +35,18 @@ MAKERS: Mapping[str, Callable[[Records], str]] = {"junit": _junit, "csv": _csv, 
 class Outputs:
     """Report files of one command; what stood in them stays until there is something new."""
 
-    def __init__(self, paths: Mapping[str, Path | None]) -> None:
-        """``paths`` by the name of what is made; ``UsageProblem`` when one cannot be opened."""
+    def __init__(self, paths: Mapping[str, Path | None], read: Sequence[Path] = ()) -> None:
+        """``paths`` by the name of what is made; ``UsageProblem`` when one cannot be opened.
+
+        What the command has ``read`` is not to be lost for a report.
+        """
         self._files: dict[str, TextIO] = {}
         self._paths = {name: path for name, path in paths.items() if path is not None}
         if len({path.resolve() for path in self._paths.values()}) != len(self._paths):
             raise UsageProblem("two reports would go into one file")
+        for path in self._paths.values():
+            if path.resolve() in {file.resolve() for file in read}:
+                raise UsageProblem(f"{path}: a report would take the place of what is read")
         self._new = {name for name, path in self._paths.items() if not path.exists()}
         for name, path in self._paths.items():
             try:

@@ -28,8 +28,9 @@ def report(settings: Settings, records: Sequence[Path], junit: Path | None, csv:
     """Make report files of one or many records. A directory stands for the records in it."""
     if junit is None and csv is None and html is None:
         raise UsageProblem("no report is asked for: give --junit, --csv or --html")
-    found = load_records([file for path in records for file in _files(path)])
-    outputs = Outputs({"junit": junit, "csv": csv, "html": html})
+    files = [file for path in records for file in _files(path)]
+    found = load_records(files)
+    outputs = Outputs({"junit": junit, "csv": csv, "html": html}, files)
     try:
         outputs.write(found)
     finally:

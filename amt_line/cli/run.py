@@ -84,7 +84,8 @@ def run(context: click.Context, plan: Path, said: Sequence[str], inputs: Path | 
                      station, operator)
     read = load_plan(plan, settings.chosen_channel)
     _check_wishes(read, settings, wishes)
-    outputs = Outputs({"junit": junit, "csv": csv, "html": html})
+    outputs = Outputs({"junit": junit, "csv": csv, "html": html},
+                      [plan] if inputs is None else [plan, inputs])
     try:
         context.exit(_run(settings, read, wishes, outputs))
     finally:

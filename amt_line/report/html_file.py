@@ -34,11 +34,12 @@ def decoded_text(item: Mapping[str, Any]) -> str:
         return "acknowledgement"
     packet = item["packet"]
     atoms = ", ".join(map(_atom_text, packet["atoms"]))
-    return f"{packet['id']} {packet['name']}" + (f": {atoms}" if atoms else "")
+    return f"{packet['id']} {printable(packet['name'])}" + (f": {atoms}" if atoms else "")
 
 
 def _atom_text(atom: Mapping[str, Any]) -> str:
-    return f"{atom['name'] or atom['id']}={printable(str(atom.get('text', atom['value'])))}"
+    name = printable(str(atom["name"] or atom["id"]))
+    return f"{name}={printable(str(atom.get('text', atom['value'])))}"
 
 
 @lru_cache(maxsize=1)

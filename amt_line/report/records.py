@@ -26,12 +26,18 @@ def _validator() -> Any:
     return Draft202012Validator(record_schema())
 
 
+def _no_number(word: str) -> None:
+    raise ValueError(f"{word} is no number")
+
+
 def load_record(path: Path) -> Record:
     """A record from its file; ``UsageProblem`` when it is none."""
     try:
+        if path.exists() and not path.is_file():
+            raise UsageProblem(f"{path}: no file")
         if path.stat().st_size > _LARGEST_FILE:
             raise UsageProblem(f"{path}: larger than {_LARGEST_FILE} bytes")
-        content = json.loads(path.read_text(encoding="utf-8"))
+        content = json.loads(path.read_text(encoding="utf-8"), parse_constant=_no_number)
     except OSError as error:
         raise UsageProblem(f"{path}: {error.strerror}") from error
     except (ValueError, RecursionError) as error:
@@ -39,10 +45,14 @@ def load_record(path: Path) -> Record:
     version = content.get("record") if isinstance(content, dict) else None
     if isinstance(version, int) and version > VERSION:
         raise UsageProblem(f"{path}: a record of version {version}; this program knows {VERSION}")
-    wrong = next(_validator().iter_errors(content), None)
+    try:
+        wrong = next(_validator().iter_errors(content), None)
+    except RecursionError:
+        raise UsageProblem(f"{path}: no record: nested too deep") from None
     if wrong is not None:
         where = "/".join(map(str, wrong.absolute_path)) or "document"
-        raise UsageProblem(f"{path}: no record: {where}: {printable(wrong.message)[:200]}")
+        raise UsageProblem(f"{path}: no record: {printable(where)}: "
+                           f"{printable(wrong.message)[:200]}")
     return content  # type: ignore[no-any-return]
 
 

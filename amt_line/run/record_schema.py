@@ -9,11 +9,13 @@ from amt_line.run.record import VERSION
 Schema = dict[str, Any]
 
 _TEXT: Schema = {"type": "string"}
-_SECONDS: Schema = {"type": "number", "minimum": 0}
+_SECONDS: Schema = {"type": "number", "minimum": 0, "maximum": 1e300}
 _HEX: Schema = {"type": "string", "pattern": "^([0-9a-f]{2})*$"}
 _UTC: Schema = {"type": "string",
                 "pattern": r"^\d{4}-\d\d-\d\dT\d\d:\d\d:\d\d\.\d{3}Z$"}
-_SCALAR: Schema = {"type": ["string", "number", "boolean"]}
+# What no float holds is no number of a handset, and nothing can draw it.
+_LARGEST: Schema = {"minimum": -1e300, "maximum": 1e300}
+_SCALAR: Schema = {"type": ["string", "number", "boolean"], **_LARGEST}
 _STATUS: Schema = {"enum": [0, 1, 2, 3, 4, 5, 6, 7, 130, 143]}
 _STEP_VERDICT: Schema = {"enum": ["pass", "fail", "error", "skipped"]}
 
@@ -45,14 +47,16 @@ _EXCHANGE = _table(
      "received": {"type": "array", "items": _RECEIVED}, "error": _TEXT},
     {"attempt": {"type": "integer", "minimum": 1},
      "bytes_not_kept": {"type": "integer", "minimum": 0}})
-_NUMBER: Schema = {"type": "number"}
+_NUMBER: Schema = {"type": "number", **_LARGEST}
+_VALUE_ITSELF: Schema = {"type": ["string", "number"], **_LARGEST}
 _LIMITS: Schema = {"type": "object", "additionalProperties": False, "properties": {
     "min": _NUMBER, "max": _NUMBER, "marginal_min": _NUMBER, "marginal_max": _NUMBER,
-    "one_of": {"type": "array", "items": {"type": ["string", "number"]}}, "matches": _TEXT}}
+    "one_of": {"type": "array", "items": _VALUE_ITSELF}, "matches": _TEXT}}
 _VALUE = _table(
-    {"name": _TEXT, "value": {"type": ["string", "number"]}},
+    {"name": _TEXT, "value": _VALUE_ITSELF},
     {"unit": _TEXT, "raw": {"type": ["string", "integer"]}, "word": _TEXT, "limits": _LIMITS,
      "verdict": {"enum": ["pass", "fail"]}, "marginal": {"const": True}, "reason": _TEXT})
+_VALUE["dependentRequired"] = {"limits": ["verdict"]}
 _STEP = _table(
     {"number": {"type": "integer", "minimum": 1},
      "section": {"enum": ["setup", "step", "always"]}, "name": _TEXT,

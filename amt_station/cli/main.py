@@ -140,8 +140,15 @@ class _Terminate(KeyboardInterrupt):
     """SIGTERM, which ends whatever is being done just as SIGINT does."""
 
 
-def _terminate(number: int, frame: FrameType | None) -> NoReturn:
-    raise _Terminate()
+def _end_by(number: int, frame: FrameType | None) -> NoReturn:
+    """The first signal ends what is done in order, a second one at once."""
+    for one in (signal.SIGINT, signal.SIGTERM):
+        signal.signal(one, _leave)
+    raise _Terminate() if number == signal.SIGTERM else KeyboardInterrupt()
+
+
+def _leave(number: int, frame: FrameType | None) -> NoReturn:
+    os._exit(128 + number)
 
 
 def _end(interrupt: BaseException) -> StationError:
@@ -152,8 +159,8 @@ def main() -> NoReturn:
     """Carry out the command line of this process."""
     try:
         console.prepare_streams()
-        signal.signal(signal.SIGTERM, _terminate)
-        signal.signal(signal.SIGINT, signal.default_int_handler)
+        signal.signal(signal.SIGTERM, _end_by)
+        signal.signal(signal.SIGINT, _end_by)
         status = run(sys.argv[1:])
         signal.signal(signal.SIGINT, signal.SIG_IGN)
         signal.signal(signal.SIGTERM, signal.SIG_IGN)

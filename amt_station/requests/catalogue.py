@@ -2,14 +2,14 @@
 
 from __future__ import annotations
 
+import os
 import re
 from functools import lru_cache
-from pathlib import Path
 from typing import Mapping
 
 UNDEFINED = "(undefined)"
 
-_CATALOGUE = Path(__file__).with_name("amt-command.def")
+_CATALOGUE = os.path.join(os.path.dirname(__file__), "amt-command.def")
 _ROW = re.compile(r"^AMT_COMMAND\(\s*(0x[0-9A-Fa-f]{2})\s*,\s*([A-Z][A-Z0-9_]*)\s*\)\s*(?://.*)?$")
 
 
@@ -33,7 +33,8 @@ def parse_catalogue(text: str) -> dict[int, str]:
 @lru_cache(maxsize=1)
 def command_names() -> Mapping[int, str]:
     """Id to name, only for the ids that have one."""
-    return parse_catalogue(_CATALOGUE.read_text(encoding="ascii"))
+    with open(_CATALOGUE, encoding="ascii") as catalogue:
+        return parse_catalogue(catalogue.read())
 
 
 @lru_cache(maxsize=1)

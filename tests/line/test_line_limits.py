@@ -10,7 +10,7 @@ import pytest
 from amt_line.plan.inputs import Input
 from amt_line.plan.limits import Limit
 from amt_line.plan.measure import Measure
-from amt_line.plan.pattern import PatternTooSlow, is_whole
+from amt_line.plan.pattern import BadPattern, PatternTooSlow, compiled, is_whole
 from amt_line.plan.references import fill, names
 from amt_station.errors import UsageProblem
 
@@ -80,6 +80,22 @@ def test_a_variable_in_a_pattern_stands_for_itself() -> None:
 def test_a_pattern_that_takes_too_long_comes_to_an_end() -> None:
     with pytest.raises(PatternTooSlow, match="took longer than 1 s"):
         is_whole("(a|aa)+$", "a" * 64 + "b")
+
+
+@pytest.mark.parametrize("pattern", [
+    "(?:(?:(?:ab?){99}){99}){99}", "(?:a{1000}){1000}", "a{400}{400}", "[a]{2}{99999}",
+    "x{" + "9" * 1900 + "}"])
+def test_a_pattern_that_would_fill_the_memory_is_refused(pattern: str) -> None:
+    with pytest.raises(BadPattern, match="counted repeats"):
+        compiled(pattern)
+
+
+@pytest.mark.parametrize("pattern, text", [
+    (r"KEL\d{10}", "KEL0123456789"), (r"(?:[0-9A-F]{2}:){5}[0-9A-F]{2}", "00:11:22:33:44:55"),
+    (r"[]{99999}{99999}]", "{"), (r"\{400}{40}", "{400" + "}" * 40),
+    (".{0,65536}", "x" * 5000)])
+def test_counted_repeats_that_are_meant(pattern: str, text: str) -> None:
+    assert is_whole(pattern, text)
 
 
 @pytest.mark.parametrize("item, good, bad", [

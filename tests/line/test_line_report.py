@@ -53,6 +53,19 @@ def test_junit(record: dict[str, Any]) -> None:
     assert cases[0][0].text == "adc 15"
 
 
+def test_junit_says_it_wherever_a_collector_looks(record: dict[str, Any]) -> None:
+    suite = ElementTree.fromstring(junit_xml([record]))[0]
+    cases = suite.findall("testcase")
+    names = [(case.attrib["classname"], case.attrib["name"]) for case in cases]
+    assert names[:2] == [(names[0][0], "adc"), (names[0][0], "adc (2)")]
+    assert len(set(names)) == len(names), "a second of one name would take the first one's place"
+    assert re.fullmatch(r"\d{4}-\d\d-\d\dT\d\d:\d\d:\d\d", suite.attrib["timestamp"])
+    assert (cases[1][0].text or "").splitlines() == [
+        "adc 25 is above 20", record["steps"][1]["advice"]]
+    assert (cases[4][0].text or "").startswith("there is nobody to ask")
+    assert all(out.text for out in suite.iter("system-out"))
+
+
 def test_junit_of_a_run_that_never_began_is_an_error(record: dict[str, Any]) -> None:
     broken = {**record, "steps": record["steps"][-1:], "verdict": "ERROR", "reason": "no port"}
     suite = ElementTree.fromstring(junit_xml([broken]))[0]

@@ -113,6 +113,50 @@ def test_a_signal_at_any_moment_is_no_traceback(number: signal.Signals) -> None:
         assert process.returncode in (0, 128 + number, -number)
 
 
+@pytest.mark.parametrize("number", [signal.SIGINT, signal.SIGTERM])
+def test_a_signal_in_the_first_import_that_takes_time(number: signal.Signals,
+                                                      tmp_path: Path) -> None:
+    # The first module that nothing has needed before stands still until the signal is there.
+    (tmp_path / "click.py").write_text(
+        "import os, sys, time\nos.write(1, b'x')\ntime.sleep(60)\n", encoding="utf-8")
+    with subprocess.Popen(station_command("commands"), cwd=ROOT, stdout=subprocess.PIPE,
+                          env=station_environment(PYTHONPATH=str(tmp_path)),
+                          stderr=subprocess.PIPE) as process:
+        assert process.stdout is not None and process.stdout.read(1) == b"x"
+        process.send_signal(number)
+        talk = process.communicate(timeout=PATIENCE)[1]
+    assert process.returncode == 128 + number
+    assert talk == b"amt-station: %s\n" % (
+        b"interrupted" if number == signal.SIGINT else b"terminated")
+
+
+def test_nothing_that_takes_time_is_imported_before_the_handlers() -> None:
+    code = ("import sys; before = set(sys.modules); import amt_station.__main__; "
+            "print(sorted(set(sys.modules) - before))")
+    result = subprocess.run([sys.executable, "-I", "-c", f"import sys; sys.path.insert(0, "
+                             f"{str(ROOT)!r}); import signal, __future__; {code}"], cwd=ROOT,
+                            capture_output=True, text=True, timeout=60, check=True)
+    assert result.stdout == "['amt_station', 'amt_station.__main__']\n"
+
+
+@pytest.mark.parametrize("second", [signal.SIGINT, signal.SIGTERM])
+def test_the_second_signal_ends_at_once(second: signal.Signals) -> None:
+    code = ("import os, signal, sys, time; from amt_station.cli import main\n"
+            "def stuck(said):\n"
+            "    os.write(1, said); time.sleep(60)\n"
+            "main.run = lambda arguments: stuck(b'x')\n"
+            "main._end = lambda interrupt: stuck(b'y')\n"
+            "main.main()")
+    with subprocess.Popen([sys.executable, "-c", code], cwd=ROOT, env=station_environment(),
+                          stdout=subprocess.PIPE, stderr=subprocess.PIPE) as process:
+        assert process.stdout is not None and process.stdout.read(1) == b"x"
+        process.send_signal(signal.SIGINT)
+        assert process.stdout.read(1) == b"y"
+        process.send_signal(second)
+        assert process.communicate(timeout=PATIENCE)[1] == b""
+    assert process.returncode == 128 + second
+
+
 def test_a_peer_that_does_not_read_is_no_answer(run_station: Run) -> None:
     master, slave = pty.openpty()
     try:

@@ -26,12 +26,12 @@ COMMANDS = sorted(set(re.findall(r"^    (amt-station [^#\n]+?)\s*(?:#.*)?$", GUI
 class Line:
     """A handset that knows what the guide asks for."""
 
-    def __init__(self, version: bytes = b"ORLA 1.2", adc: int = 2000) -> None:
+    def __init__(self, version: bytes = b"(KEL-1_4.2.1)", adc: int = 3700) -> None:
         self.version, self.adc, self.serial = version, adc, "none"
 
     def __call__(self, item: Item) -> Sequence[bytes]:
         if not isinstance(item, Frame):
-            value = b'\r\n^DBTADDR: "00:11:22:33:44:55"\r\n' if b"ADDR?" in item.raw else b""
+            value = b"\r\n^DSVER: (KEL-1_4.2.1)\r\n" if b"DSVER" in item.raw else b""
             return [value + b"\r\nOK\r\n"]
         packet = item.packet
         atoms: list[Atom] = []
@@ -55,8 +55,8 @@ def run_script(script: str, tmp_path: Path, *arguments: str) -> "subprocess.Comp
 
 
 @pytest.mark.parametrize("version, adc, verdict, words", [
-    (b"ORLA 1.2", 2000, 1, "PASS"), (b"ORLA 1.2", 1799, 2, "FAIL battery ADC"),
-    (b"other", 2000, 2, "FAIL wrong software")])
+    (b"(KEL-1_4.2.1)", 3700, 1, "PASS"), (b"(KEL-1_4.2.1)", 2999, 2, "FAIL battery ADC"),
+    (b"other", 3700, 2, "FAIL wrong software")])
 def test_the_script_for_a_line(version: bytes, adc: int, verdict: int, words: str, peer: Peer,
                                tmp_path: Path) -> None:
     (script,) = [script for script in SCRIPTS if "sys.argv" in script]

@@ -86,6 +86,11 @@ def test_wrong_values_send_nothing(peer: Peer, link: Link) -> None:
         handset.battery.voltage()
     with pytest.raises(UsageProblem, match="finite"):
         handset.battery.adc(timeout=0)
+    for timeout in ("1", 1e300, float("nan"), True):
+        with pytest.raises(UsageProblem, match="finite"):
+            handset.battery.adc(timeout=timeout)  # type: ignore[arg-type]
+        with pytest.raises(UsageProblem, match="finite"):
+            connect(peer.path, timeout=timeout)  # type: ignore[arg-type]
     assert peer.raw == b""
 
 

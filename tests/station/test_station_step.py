@@ -308,3 +308,24 @@ def test_a_text_says_why_it_was_refused(peer: Peer, link: Link) -> None:
     peer.script = sequence([b"\r\nERROR\r\n"])
     with pytest.raises(Refused, match="read: the file is missing or empty"):
         perform(link, prepare_text("AT^DPCBACTRL=1"))
+
+
+class FloodedPort(EndlessPort):
+    """A line that says OK without a pause."""
+
+    written = b""
+
+    def read(self, timeout: float) -> bytes:
+        """As much as anybody takes."""
+        return OK * 100
+
+    def write(self, data: bytes, timeout: float) -> None:
+        """Taken."""
+        self.written += data
+
+
+def test_a_line_that_says_ok_without_a_pause_passes_nothing() -> None:
+    port = FloodedPort()
+    with pytest.raises(OutOfStep, match="does not fall silent.*the text .*OK.* came instead"):
+        Link(port).at("AT+A")
+    assert port.written == b""

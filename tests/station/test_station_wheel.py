@@ -98,3 +98,21 @@ def test_pytest_finds_the_plugin(environment: Path, tmp_path: Path, peer: Peer) 
     result = run(environment / "bin" / "python", "-m", "pytest", "-q", "-p", "no:cacheprovider",
                  "--amt-port", peer.path, cwd=tmp_path)
     assert result.returncode == 0, result.stdout + result.stderr
+
+
+def test_a_plan_and_its_reports(environment: Path, tmp_path: Path, peer: Peer) -> None:
+    """What a run reads beside its modules is installed too: schemas, templates, letters."""
+    program = environment / "bin" / "amt-station"
+    peer.script = lambda item: [b"\r\nOK\r\n"]
+    (tmp_path / "line.toml").write_text('[[step]]\nat = "AT"\n', encoding="utf-8")
+    assert run(program, "check", "line.toml", cwd=tmp_path).returncode == 0
+    assert run(program, "schema", "plan", cwd=tmp_path).stdout.startswith("{")
+    result = run(program, "-p", peer.path, "run", "line.toml", "--records", "kept", "--html",
+                 "a.html", "--junit", "a.xml", "--csv", "a.csv", cwd=tmp_path)
+    assert result.returncode == 0, result.stdout + result.stderr
+    (record,) = (tmp_path / "kept").iterdir()
+    result = run(program, "report", record, "--html", "b.html", cwd=tmp_path)
+    assert result.returncode == 0, result.stderr
+    pages = [(tmp_path / name).read_text(encoding="utf-8") for name in ("a.html", "b.html")]
+    assert pages[0] == pages[1] and "PASS" in pages[0] and ".verdict {" in pages[0]
+    assert run(program, "show", record, cwd=tmp_path).stdout.startswith("PASS  ")

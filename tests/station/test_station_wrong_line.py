@@ -10,6 +10,7 @@ from station_peer import Peer, Script, ok
 from amt_station.errors import BadFrame, NoAnswer, OutOfStep, StationError
 from amt_station.link import Link
 from amt_station.wire.atoms import Atom
+from amt_station.wire.decoder import BareDecoder, Item
 from amt_station.wire.envelope import encode_envelope
 from amt_station.wire.packet import Packet
 
@@ -70,3 +71,27 @@ def test_the_search_for_the_place_says_it_too(peer: Peer, link: Link) -> None:
     peer.script = always(ANSWER.encode())
     with pytest.raises(OutOfStep, match="came without an envelope.*use --app; nothing else"):
         link.find_place(SHORT)
+
+
+def test_a_flood_is_not_looked_through(peer: Peer, link: Link,
+                                       monkeypatch: pytest.MonkeyPatch) -> None:
+    looked_at = []
+    feed = BareDecoder.feed
+
+    def counting(self: BareDecoder, data: bytes) -> list[Item]:
+        looked_at.append(len(data))
+        return feed(self, data)
+
+    monkeypatch.setattr(BareDecoder, "feed", counting)
+    # Each byte of it may be the head of a packet, and none of it is text.
+    peer.script = always(*[b"\xbb" * 4000] * 16)
+    with pytest.raises(BadFrame):
+        link.request(VERSION, 1.0)
+    assert 0 < max(looked_at) <= 4 * 4096
+
+
+@pytest.mark.parametrize("text", ["AT+\x1b[2J", "AT+\u202e"])
+def test_a_text_is_escaped_in_what_went_wrong(text: str, peer: Peer, link: Link) -> None:
+    with pytest.raises(NoAnswer) as caught:
+        link.at(text, SHORT)
+    assert str(caught.value).isprintable()

@@ -60,3 +60,21 @@ with = { station = 3, verdict = "${verdict}" }
 """)
     assert (record["verdict"], record["exit_status"]) == ("FAIL", 1)
     assert stored(handset) == "2", "a wrong pass is the worst that a line can do"
+
+
+def test_the_scripts_of_the_scripting_guide(make_handset: Any, tmp_path: Path) -> None:
+    """Its first step brings a simulated handset up: what follows has to pass with that."""
+    guide = (ROOT / "docs" / "station.md").read_text(encoding="utf-8")
+    handset = make_handset("pc", ports=True)
+    port = str(handset.directory / "pc")
+    scripts = re.findall(r"```python\n(.*?connect.*?)```", guide, re.DOTALL)
+    assert len(scripts) == 3
+    for number, script in enumerate(scripts):
+        path = tmp_path / f"script{number}.py"
+        path.write_text(script.replace("/dev/ttyACM0", port), encoding="utf-8")
+        ended = subprocess.run(
+            [sys.executable, str(path), port, "KEL0000000042"], cwd=tmp_path,
+            env={**os.environ, "PYTHONPATH": str(ROOT)}, stdin=subprocess.DEVNULL,
+            capture_output=True, text=True, timeout=PATIENCE, check=False)
+        assert ended.returncode == 0, ended.stdout + ended.stderr
+    assert stored(handset) == "1"

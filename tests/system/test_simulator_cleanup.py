@@ -16,10 +16,12 @@ from amt_simulator.rundir import BASE_VARIABLE, RunDirectory, base_directory, re
 from support.command import PATIENCE, PROJECT
 
 FAKE_DAEMON = Path(__file__).with_name("support") / "fake_daemon.py"
+# A suite that runs in the background has Ctrl-C ignored, and hands that on.
 LAUNCHER = """
-import json, sys, time
+import json, signal, sys, time
 from pathlib import Path
 from amt_simulator import Handset
+signal.signal(signal.SIGINT, signal.default_int_handler)
 with Handset("pc", build=None, daemon=Path(sys.argv[1])) as handset:
     handset.wait_ready()
     print(json.dumps([str(handset.directory), handset.pid]), flush=True)
