@@ -175,7 +175,7 @@ def test_a_signal_before_the_command_is_known_reaches_it(monkeypatch: pytest.Mon
     """The command may tell that it runs before the process that has started it knows its id."""
     real = subprocess.Popen
 
-    class Early(real):  # type: ignore[type-arg, valid-type, misc]
+    class Early(real):  # type: ignore[valid-type, misc]
         def __init__(self, *words: Any, **options: Any) -> None:
             os.kill(os.getpid(), signal.SIGTERM)
             super().__init__(*words, **options)
