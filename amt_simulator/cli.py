@@ -1,13 +1,16 @@
 """The `amt-handset` command: brings a simulated handset up, and works on one that is up."""
 
+import json
 import os
 import signal
 import sys
+from contextlib import ExitStack
 from pathlib import Path
-from typing import Any
+from typing import Any, Sequence
 
 import click
 
+from amt_simulator import scenarios as ready
 from amt_simulator.commands import COMMANDS
 from amt_simulator.errors import PROGRAM, HandsetError
 from amt_simulator.handset import Handset
@@ -50,7 +53,8 @@ class HandsetGroup(click.Group):
 def handset(ctx: click.Context, directory: Path | None) -> None:
     """A simulated handset: the real daemon in a handset that a PC makes up."""
     # Parsing a subcommand's --help must not need a handset.
-    if ctx.invoked_subcommand != "up" and not {"-h", "--help"} & set(sys.argv[1:]):
+    is_before = ctx.invoked_subcommand in ("up", "run", "scenarios")
+    if not is_before and not {"-h", "--help"} & set(sys.argv[1:]):
         ctx.obj = find(directory)
 
 
@@ -60,6 +64,14 @@ def _announce(made: Handset, build: str) -> Announcement:
                              {name: str(made.directory / name) for name in names})
     announced.write()
     return announced
+
+
+def _introduction(made: Handset, announced: Announcement, scenario: str | None) -> dict[str, Any]:
+    """The same for programs."""
+    return {"ok": True, "directory": announced.directory, "path": announced.path,
+            "scenario": scenario, "build": announced.build, "pid": announced.pid,
+            "ports": announced.ports, "log": str(made.log.path),
+            "files": str(made.directory / ROOT), "stand_ins": str(made.path("/handset"))}
 
 
 def _introduce(made: Handset, announced: Announcement) -> None:
@@ -90,11 +102,35 @@ def _options(given: dict[str, Any]) -> dict[str, Any]:
     }
 
 
+def _in_scenario(name: str | None, given: dict[str, Any]) -> dict[str, Any]:
+    """The options of a handset in a scenario; what was said on the command line goes before."""
+    if name is None:
+        return given
+    source = click.get_current_context().get_parameter_source
+    said = {key: value for key, value in given.items()
+            if key == "ports" or isinstance(value, dict) and value
+            or source(key) not in (None, click.core.ParameterSource.DEFAULT)}
+    return {"path": given["path"], **ready.find(name).with_options(said)}
+
+
+def _place(build: str) -> str | Path:
+    return Path(build).resolve() if os.sep in build else build
+
+
+SCENARIO = click.option("--scenario", metavar="NAME",
+                        help="One of those that `amt-handset scenarios` lists, or a file's path; "
+                        "other options go before it.")
+BUILD = click.option("--build", default="release", show_default=True,
+                     help="Preset, or directory of a build.")
+
+
 @handset.command("up")
 @click.option("--path", type=click.Choice(list(KINDS)), default="pc", show_default=True,
               help="How the daemon is started.")
-@click.option("--build", default="release", show_default=True,
-              help="Preset, or directory of a build.")
+@BUILD
+@SCENARIO
+@click.option("--json", "as_json", is_flag=True,
+              help="Tell where everything is as one line of JSON.")
 @click.option("--arg", "args", multiple=True, help="Further argument for the daemon.")
 @click.option("--config", multiple=True, type=OPTIONAL_PAIR,
               help="Configuration setting; KEY alone takes it out.")
@@ -119,7 +155,7 @@ def _options(given: dict[str, Any]) -> dict[str, Any]:
 @click.option("--usb-state", help="USB state at the beginning, such as DISCONNECTED.")
 @click.option("--env", multiple=True, type=PAIR, help="Environment of the daemon.")
 @click.option("--keep", is_flag=True, help="Leave the handset's directory in place at the end.")
-def up(path: str, build: str, **given: Any) -> None:
+def up(path: str, build: str, scenario: str | None, as_json: bool, **given: Any) -> None:
     """Bring a handset up and stay until Ctrl-C."""
     # Only who stays needs the library for typing.
     from amt_simulator import prompt
@@ -127,12 +163,16 @@ def up(path: str, build: str, **given: Any) -> None:
     end = prompt.End()
     for number in ENDS:
         signal.signal(number, end)
-    place: str | Path = Path(build).resolve() if os.sep in build else build
-    made = Handset(path, place, **_options(given))
+    options = _in_scenario(scenario, {"path": path, **_options(given)})
+    made = Handset(build=_place(build), **options)
     death = ""
     try:
         with made:
-            _introduce(made, _announce(made, build))
+            announced = _announce(made, build)
+            if as_json:
+                click.echo(json.dumps(_introduction(made, announced, scenario)))
+            else:
+                _introduce(made, announced)
             sys.stdout.flush()
             prompt.serve(made, handset, end)
             death = made.death
@@ -144,6 +184,42 @@ def up(path: str, build: str, **given: Any) -> None:
         raise HandsetError(death)
     click.echo("the handset has been powered off" if made.powered_off else "handset is down",
                err=True)
+
+
+@handset.command("run")
+@click.option("--n", "count", type=click.IntRange(1, 64), default=1, show_default=True,
+              help="How many handsets.")
+@click.option("--path", type=click.Choice(list(KINDS)), default="pc", show_default=True,
+              help="How the daemon is started.")
+@BUILD
+@SCENARIO
+@click.argument("command", nargs=-1, required=True, metavar="-- COMMAND...")
+def run(count: int, path: str, build: str, scenario: str | None, command: Sequence[str]) -> None:
+    """Bring handsets up, run a command with them, and take them down.
+
+    AMT_STATION_PORT (and AMT_STATION_PORT_1, _2 ...) name their ports in the command's
+    environment, AMT_STATION_CHANNEL the line, HANDSET_DIR (_1, _2 ...) their directories. The
+    exit status is the command's.
+    """
+    from amt_simulator import visit
+
+    options = _in_scenario(scenario, {"path": path, "ports": True})
+    try:
+        with ExitStack() as stack:
+            handsets = visit.bring_up(stack, options.pop("path"), _place(build), options, count)
+            for made in handsets:
+                _announce(made, build)
+            status = visit.run(command, visit.environment(handsets))
+    except KeyboardInterrupt:
+        status = visit.SIGNALLED + signal.SIGINT
+    click.get_current_context().exit(status)
+
+
+@handset.command("scenarios")
+def scenarios() -> None:
+    """List the ready scenarios for `up` and `run`, and what each shows."""
+    for name in ready.names():
+        click.echo(f"{name:18} {ready.find(name).shows}")
 
 
 for command in COMMANDS:

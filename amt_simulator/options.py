@@ -32,13 +32,15 @@ class Options:
                   a Path of the PC to copy, or None for no such file
     properties    system properties; None takes one away
     answers       scripted answers of stand-ins: function to a line or a list of lines
-    modem         "table": answers by its table; "silent": hears, never answers; "held": its ttys
+    modem         "table": answers by its table; "slow": the same after two seconds; "refusing":
+                  ERROR to everything; "silent": hears, never answers; "held": its ttys
                   wait for the test to speak; "absent": there are no modem ttys
     modem_answers whole command line to the raw answer that replaces the table's
     restart       whether init starts the daemon again when it has ended; None: as its file says
     start         whether init starts the daemon at all; `start()` does it later
     screen        width and height of the framebuffer
     card          size of the memory card in bytes; None: no card
+    card_full     whether the card comes up without a free byte
     usb_state     the USB link's state when the handset comes up; None: as the path wants it
     env           further environment of the daemon
     shared        directories of the PC that the handset may write to, by their path inside
@@ -62,6 +64,7 @@ class Options:
     start: bool = True
     screen: tuple[int, int] = (480, 800)
     card: int | None = 64 << 20
+    card_full: bool = False
     usb_state: str | None = None
     env: Mapping[str, str] = field(default_factory=dict)
     shared: Mapping[str, Path] = field(default_factory=dict)
@@ -120,7 +123,7 @@ def _orders(options: Options, program: programs.Program) -> dict[str, Any]:
         "start_on_plug": service.disabled and options.start,
         "lines": {name: configured.get(key, "") for name, key in LINE_KEYS.items()},
         "modem": options.modem, "modem_answers": dict(options.modem_answers),
-        "card": options.card, "ports": options.ports,
+        "card": options.card, "card_full": options.card_full, "ports": options.ports,
     }
 
 

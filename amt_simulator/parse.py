@@ -6,7 +6,7 @@ from typing import Any
 
 import click
 
-from amt_simulator.escapes import unescape
+from amt_station.wire.escapes import unescape
 
 SIZE = re.compile(r"^(\d+)([kKmMgG]?)$")
 FACTORS = {"": 1, "k": 1 << 10, "m": 1 << 20, "g": 1 << 30}

@@ -20,6 +20,8 @@ from amt_simulator.handset import Handset
 LOOK_SECONDS = 0.2
 PROMPT = "handset> "
 LEAVE = ("exit", "quit")
+# What makes sense without a handset only.
+BEFORE = ("up", "run", "scenarios")
 HISTORY_LINES = 500
 
 
@@ -101,7 +103,7 @@ def serve(handset: Handset, group: click.Group, end: End) -> None:
 
 def _converse(handset: Handset, group: click.Group, watch: Watch, end: End) -> None:
     """Take commands until one ends it."""
-    names = ["help", *LEAVE, *(name for name in group.commands if name != "up")]
+    names = ["help", *LEAVE, *(name for name in group.commands if name not in BEFORE)]
     readline.set_completer(lambda text, state: [
         *(name + " " for name in names if name.startswith(text)), None][state])
     readline.parse_and_bind("tab: complete")
@@ -158,13 +160,13 @@ def run_line(handset: Handset, group: click.Group, line: str, end: End) -> None:
 
 def _help(group: click.Group) -> None:
     for name, command in group.commands.items():
-        if name != "up":
+        if name not in BEFORE:
             click.echo(f"  {name:10} {command.get_short_help_str(80)}", err=True)
     click.echo(f"  {'exit':10} Take the handset down (also Ctrl-D).", err=True)
 
 
 def _command(group: click.Group, name: str) -> click.Command:
     command = group.commands.get(name)
-    if command is None or name == "up":
+    if command is None or name in BEFORE:
         raise HandsetError(f"no such command: {name} (help lists them)")
     return command

@@ -7,6 +7,7 @@ from __future__ import annotations
 
 import os
 from dataclasses import dataclass, field
+from functools import lru_cache
 from typing import Protocol
 
 from amt_station import judge
@@ -99,13 +100,23 @@ class TextSearch:
         return answered
 
 
+@lru_cache(maxsize=1)
+def _free_ids() -> tuple[int, ...]:
+    return tuple(number for number in range(2, 255) if number not in command_names()
+                 and not {number, number - 1, number + 1} & set(requests_by_id()))
+
+
+def is_searched(command: int) -> bool:
+    """Whether a search on the app channel may ask this id."""
+    return command in _free_ids()
+
+
 class PacketSearch:
     """On the app channel: an id that nobody serves, another one each time, and its refusal."""
 
     def __init__(self, turn: int) -> None:
         """``turn`` counts the searches."""
-        free = [number for number in range(2, 255) if number not in command_names()
-                and not {number, number - 1, number + 1} & set(requests_by_id())]
+        free = _free_ids()
         self._packet = Packet(free[turn % len(free)])
         self.what = display_name(self._packet.command)
         self.data = encode_request(self._packet, enveloped=False)

@@ -152,6 +152,8 @@ def _values(plan: Plan, wishes: _Wishes, terminal: Terminal | None) -> dict[str,
 
 def _run(settings: Settings, plan: Plan, wishes: _Wishes, outputs: Outputs) -> int:
     url = settings.chosen_port
+    # A trace is of the plan's channel, whatever the environment says.
+    settings.line = plan.channel.value
     terminal = Terminal() if there_is_a_terminal() else None
     values = _values(plan, wishes, terminal)
     dut = check_with_inputs(plan, values) or wishes.dut or ""

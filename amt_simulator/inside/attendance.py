@@ -2,7 +2,7 @@
 
 from amt_simulator.inside.lines import Line, NoLine
 from amt_simulator.inside.modem import Conversation, Modem
-from amt_simulator.inside.modem_table import MODES
+from amt_simulator.inside.modem_table import MODES, SLOW_SECONDS
 from amt_simulator.inside.relay import Port
 
 MODEM_LINES = ("modem", "mux")
@@ -11,13 +11,16 @@ MODEM_LINES = ("modem", "mux")
 class Answerer:
     """Hears one tty for the modem and says its answers."""
 
-    def __init__(self, conversation: Conversation, line: Line) -> None:
+    def __init__(self, conversation: Conversation, line: Line, seconds: float = 0.0) -> None:
         self._conversation = conversation
         self._line = line
+        self._seconds = seconds
 
     def __call__(self, data: bytes) -> None:
         said = self._conversation.feed(data)
-        if said:
+        if said and self._seconds:
+            self._line.later(self._seconds, lambda: _say(self._line, said))
+        elif said:
             _say(self._line, said)
 
 
@@ -41,7 +44,7 @@ class Attendance:
         self._left: set[str] = set()
 
     def set_modem_mode(self, mode: str) -> None:
-        """Bring the modem into a mode: table, silent, held by whoever takes its ttys, or absent."""
+        """Bring the modem into a mode of the table's."""
         if mode not in MODES:
             raise ValueError(f"no such modem mode: {mode}")
         for name in MODEM_LINES:
@@ -87,8 +90,9 @@ class Attendance:
         self._left.discard(name)
         if mode == "silent":
             line.listen(lambda data: None)
-        elif mode == "table":
-            line.listen(Answerer(Conversation(self.modem), line))
+        elif mode in ("table", "slow", "refusing"):
+            line.listen(Answerer(Conversation(self.modem, mode == "refusing"), line,
+                                 SLOW_SECONDS if mode == "slow" else 0.0))
         elif port:
             line.listen(port.end.say)
             self._hear(name)

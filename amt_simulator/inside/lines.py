@@ -83,6 +83,10 @@ class Line:
         """Call back once, when all has been said that waits, unless the line goes away first."""
         self._there().when_said(callback)
 
+    def later(self, seconds: float, callback: Callable[[], None]) -> None:
+        """Call back once, so many SECONDS from now, whatever becomes of the line."""
+        self._loop.after(seconds, callback)
+
     def master(self) -> int:
         """The master side, to be handed out."""
         self._there()

@@ -198,8 +198,9 @@ def encode_block(response: int, fields: list[table.Field]) -> bytes:
 class Conversation:
     """One tty of the modem: finds command lines and packets in what arrives."""
 
-    def __init__(self, modem: Modem) -> None:
+    def __init__(self, modem: Modem, refuses: bool = False) -> None:
         self._modem = modem
+        self._refuses = refuses
         self._text = ""
         self._decoder: object = None
         self._heard = 0.0
@@ -214,6 +215,8 @@ class Conversation:
         self._text += text
         *lines, self._text = self._text.split("\r")
         self._text = self._text[-8192:]
+        if self._refuses:
+            return table.REFUSAL.encode() * sum("AT" in line.upper() for line in lines)
         return b"".join(self._modem.answer_line(line) for line in lines)
 
     def _feed_wire(self, data: bytes) -> bytes:
@@ -238,6 +241,9 @@ class Conversation:
     def _answer_frame(self, packet: object) -> bytes:
         from amt_station import wire
         assert isinstance(packet, wire.Packet)
+        if self._refuses:
+            code = wire.Atom.integer(wire.RESULT_ATOM, table.REFUSAL_CODE)
+            return wire.encode_envelope(wire.Packet(packet.command + 1 & 0xFF, (code,)))
         values: dict[int, int | str] = {
             atom.id: atom.value if isinstance(atom.value, int) else atom.content.decode("latin-1")
             for atom in packet.atoms}

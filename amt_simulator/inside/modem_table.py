@@ -6,8 +6,13 @@ selected, everything else to the modem as a whole.
 
 from typing import NamedTuple
 
-# What the modem can be told: to answer, to hear only, to leave its ttys to others, to be away.
-MODES = ("table", "silent", "held", "absent")
+# What the modem can be told: to answer, to answer late or with a refusal, to hear only, to leave
+# its ttys to others, to be away.
+MODES = ("table", "slow", "refusing", "silent", "held", "absent")
+SLOW_SECONDS = 2.0
+# What a refusing modem says, by text and by packet.
+REFUSAL = "\r\nERROR\r\n"
+REFUSAL_CODE = 10
 
 # What the modem holds when it comes up.
 MEMORY = {

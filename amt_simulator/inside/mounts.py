@@ -33,6 +33,13 @@ def insert_card(size: int) -> None:
     _mount("tmpfs", CARD, "tmpfs", 0, f"size={size}")
 
 
+def fill_card() -> None:
+    """Leave no free byte on the card."""
+    space = os.statvfs(CARD)
+    with open(f"{CARD}/full", "wb") as file:
+        os.posix_fallocate(file.fileno(), 0, space.f_bavail * space.f_frsize)
+
+
 def remove_card() -> None:
     """Take the card out, if there is one."""
     if not os.path.ismount(CARD):

@@ -47,6 +47,8 @@ def _bring_up() -> Loop:
     attendance.set_modem_mode(orders["modem"])
     if orders["card"] is not None:
         mounts.insert_card(orders["card"])
+        if orders["card_full"]:
+            mounts.fill_card()
 
     def forget_input() -> None:
         for line in lines.values():

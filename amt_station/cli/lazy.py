@@ -36,6 +36,7 @@ COMMANDS: Mapping[str, Place] = {
     "show": Place("amt_line.cli.show:show", "Print the record of a run"),
     "stats": Place("amt_line.cli.stats:stats", "Show yields, failures, values and times"),
     "store": Place("amt_line.cli.store:store", "Deliver records to the database, compare both"),
+    "trace": Place("amt_station.cli.trace:trace", "Show, compare, replay and record traces"),
     "wait": Place("amt_station.cli.ports:wait", "Wait for a port to appear"),
 }
 

@@ -77,9 +77,11 @@ def _complete(wish: str) -> int:
 
 def run(arguments: Sequence[str]) -> int:
     """Carry out one command line and return its exit status; nothing but that comes out."""
-    settings = Settings(json="--json" in arguments)
+    own = list(arguments)
+    settings = Settings(json="--json" in own[:own.index("--") if "--" in own else None])
     try:
         status = _carry_out(arguments, settings)
+        _end_trace(settings, status)
         sys.stdout.flush()
         sys.stderr.flush()
         return status
@@ -91,6 +93,14 @@ def run(arguments: Sequence[str]) -> int:
         return _defect(error)
     except Exception as error:
         return _defect(error)
+
+
+def _end_trace(settings: Settings, status: int) -> None:
+    """A trace that could not be written is told; what the command has come to stays."""
+    if settings.recording is not None:
+        settings.recording.close(f"ended with status {status}")
+        if settings.recording.problem:
+            console.complain(settings.recording.problem)
 
 
 def _lost_output(settings: Settings, error: OSError) -> int:

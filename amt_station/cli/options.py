@@ -17,6 +17,7 @@ if TYPE_CHECKING:
     from amt_station.found_ports import Wanted
     from amt_station.link import Link
     from amt_station.port import Port
+    from amt_station.trace.recording import Recording
 
 _Command = TypeVar("_Command", bound=Callable[..., Any])
 
@@ -40,6 +41,8 @@ class Settings:
     json: bool = False
     usb_serial: str | None = None
     vid_pid: str | None = None
+    trace: str | None = None
+    recording: Recording | None = None
 
     def say(self, name: str, value: Any) -> None:
         """Take what an option says; two that contradict each other are refused."""
@@ -100,7 +103,19 @@ class Settings:
         """Open the port; one that came back under another name is found again."""
         from amt_station.port import SerialPort
 
-        return SerialPort(self.chosen_port, self.baud or DEFAULT_BAUD)
+        port = SerialPort(self.chosen_port, self.baud or DEFAULT_BAUD)
+        return port if self.trace is None else self._traced(port, self.trace)
+
+    def _traced(self, port: Port, path: str) -> Port:
+        """The port with everything that goes over it noted in the one trace of this command."""
+        from amt_station.trace.recording import begun
+
+        try:
+            self.recording = self.recording or begun(path, self.chosen_channel)
+            return self.recording.traced(port)
+        except BaseException:
+            port.close()
+            raise
 
     def open_link(self) -> Link:
         """Open the port with a link on it."""
@@ -168,6 +183,8 @@ _OPTIONS = (
     click.option("--baud", type=click.IntRange(1, _FASTEST), multiple=True, expose_value=False,
                  callback=_remember,
                  help=f"Speed of a real serial port (default {DEFAULT_BAUD})"),
+    click.option("--trace", metavar="FILE", multiple=True, expose_value=False,
+                 callback=_remember, help="Keep what goes over the line in this new file"),
     click.option("--json", is_flag=True, expose_value=False, callback=_remember,
                  help="Print the result as one JSON document"),
 )

@@ -10,7 +10,7 @@ import pytest
 
 from conftest import Copy
 
-COMMANDS = ("demo", "test", "build", "handset", "station", "bench", "fuzz", "coverage", "soak",
+COMMANDS = ("demo", "test", "build", "handset", "station", "manual", "bench", "fuzz", "coverage", "soak",
             "cross", "lint", "setup")
 SECONDS = 120
 

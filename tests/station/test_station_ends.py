@@ -246,7 +246,8 @@ def test_completion_and_version(run_station: Run) -> None:
 def test_only_what_is_used_is_imported() -> None:
     code = ("import sys; from amt_station.cli import main; main.run(['at', 'AT', '-p', '/dev/x']);"
             "print([name for name in ('amt_line', 'jsonschema', 'rich', 'jinja2', 'tomllib', "
-            "'amt_simulator', 'asyncio', 'xml', 'json') if name in sys.modules])")
+            "'amt_simulator', 'asyncio', 'xml', 'json', "
+            "'amt_station.trace') if name in sys.modules])")
     result = subprocess.run([sys.executable, "-c", code], cwd=ROOT, env=station_environment(),
                             capture_output=True, text=True, timeout=60, check=True)
     assert result.stdout == "[]\n"

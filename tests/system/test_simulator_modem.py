@@ -3,7 +3,7 @@
 import pytest
 
 from amt_simulator import Handset
-from amt_simulator.escapes import unescape
+from amt_station.wire.escapes import unescape
 from amt_simulator.inside import modem_table
 from amt_simulator.inside.modem import Modem, Conversation
 from amt_station import wire

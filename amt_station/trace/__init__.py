@@ -1,0 +1,1 @@
+"""What went over a line, as text that a person reads and a program reads back."""
