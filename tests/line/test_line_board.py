@@ -99,7 +99,7 @@ def test_lines(tmp_path: Path) -> None:
 class Wide(io.StringIO):
     """A stream that can show block letters."""
 
-    encoding = "utf-8"  # type: ignore[assignment]
+    encoding = "utf-8"
 
 
 @pytest.mark.parametrize("width", [80, 140])
@@ -134,7 +134,8 @@ def test_blocks_are_as_large_as_there_is_room() -> None:
 # the file of events
 
 def test_events_in_a_file(tmp_path: Path) -> None:
-    events, problems = told(tmp_path, {"A": 15}), []
+    events = told(tmp_path, {"A": 15})
+    problems: list[str] = []
     path = tmp_path / "events"
     file = EventFile(path.open("a", encoding="utf-8"), str(path), problems.append, path)
     for event in events:
@@ -170,7 +171,8 @@ def test_a_full_disk_ends_the_file_and_nothing_else() -> None:
 
 @pytest.mark.parametrize("replaced", [False, True])
 def test_a_file_that_is_taken_away_is_told(tmp_path: Path, replaced: bool) -> None:
-    path, problems = tmp_path / "events", []
+    path = tmp_path / "events"
+    problems: list[str] = []
     file = EventFile(path.open("a", encoding="utf-8"), str(path), problems.append, path)
     other = tmp_path / "other"
     other.touch()

@@ -123,7 +123,8 @@ def test_a_port_that_somebody_else_holds(tmp_path: Path) -> None:
         assert other.stdout is not None and other.stdout.readline() == b"held\n"
         with Bench(tmp_path, ADC, once=True, ports={"A": peer.path}) as bench:
             held = bench.wait("slot-state", state="held")
-            assert f"({other.pid}) has it open" in held["text"] and peer.raw == b""
+            assert f"({other.pid})" in held["text"] and held["text"].endswith("has it open")
+            assert peer.raw == b""
             other.communicate(timeout=PATIENCE)
             assert bench.join() == 0
     peer.close()
@@ -138,7 +139,7 @@ def test_somebody_who_reads_along_is_named_too(tmp_path: Path, monkeypatch: Any)
         assert other.stdout is not None and other.stdout.readline() == b"held\n"
         with Bench(tmp_path, ADC, once=True, ports={"A": peer.path}) as bench:
             held = bench.wait("slot-state", state="held")
-            assert f"({other.pid}) has it open" in held["text"]
+            assert f"({other.pid})" in held["text"] and held["text"].endswith("has it open")
             other.communicate(timeout=PATIENCE)
             peer.script = battery(15)
             assert bench.join() == 0

@@ -10,7 +10,7 @@ import time
 from typing import Any, Iterator
 
 import pytest
-from hypothesis import given
+from hypothesis import given, settings
 from hypothesis import strategies as st
 from line_page import ToldLine, until
 from line_watch import Watcher
@@ -187,6 +187,7 @@ def event_of(slot: str, kind: str, word: str) -> dict[str, Any]:
             **events[kind]}
 
 
+@settings(max_examples=60)
 @given(st.lists(st.one_of(EVENT, st.none()), max_size=40), st.integers())
 def test_whatever_is_missed_the_browser_has_the_board(script: list[Any], seed: int) -> None:
     chance = random.Random(seed)
