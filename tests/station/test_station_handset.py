@@ -161,7 +161,7 @@ def readme_script() -> str:
     return str(script)
 
 
-@pytest.mark.parametrize("version, verdict", [(b"ORLA 1.2", 1), (b"other", 2), (None, 2)])
+@pytest.mark.parametrize("version, verdict", [(b"(KEL-1 ORLA 1.2)", 1), (b"other", 2), (None, 2)])
 def test_the_script_of_the_readme(version: bytes | None, verdict: int, peer: Peer) -> None:
     script = readme_script()
     assert len(script.strip().splitlines()) <= 10
@@ -175,7 +175,7 @@ def test_the_script_of_the_readme(version: bytes | None, verdict: int, peer: Pee
                 return [ACKNOWLEDGEMENT, ok(46, Atom.integer(19, 16))]
             return [ACKNOWLEDGEMENT, ok(46, Atom.integer(19, 16), Atom.raw(18, version))]
         if item.packet.command == 224:
-            return [ACKNOWLEDGEMENT, ok(225, Atom.integer(151, 2000))]
+            return [ACKNOWLEDGEMENT, ok(225, Atom.integer(151, 3700))]
         return [ok(item.packet.command + 1)]
 
     peer.script = answer
