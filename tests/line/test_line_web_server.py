@@ -302,7 +302,7 @@ def test_a_page_that_is_closed_leaves_nothing(line: ToldLine) -> None:
     again.close()
 
 
-def test_browsers_and_connections_are_bounded() -> None:
+def test_browsers_are_bounded() -> None:
     line = ToldLine(pace=Pace(beat=0.2, browsers=3))
     try:
         watchers = [Watcher(line.page) for _ in range(3)]
@@ -313,13 +313,8 @@ def test_browsers_and_connections_are_bounded() -> None:
         until(lambda: line.page.watching == 2, "a browser that went away")
         with Watcher(line.page) as late:
             assert late.read()["slots"] == []
-        idle = [socket.create_connection(("127.0.0.1", line.page.port)) for _ in range(300)]
-        idle[-1].settimeout(60)
-        assert idle[-1].recv(1) == b"", "one too many is closed"
         line.slot("A")
         assert watchers[0].read()["slots"][0]["slot"] == "A", "whoever watches goes on"
-        for connection in idle:
-            connection.close()
         for watcher in watchers:
             watcher.close()
         until(lambda: line.page.watching == 0, "all browsers gone")
