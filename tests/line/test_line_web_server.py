@@ -6,7 +6,7 @@ import json
 import socket
 from http.client import HTTPConnection, HTTPResponse
 from pathlib import Path
-from typing import Any, Iterator, Mapping
+from typing import Any, Iterator, Mapping, Sequence
 
 import pytest
 from line_page import ToldLine, until
@@ -300,6 +300,42 @@ def test_a_page_that_is_closed_leaves_nothing(line: ToldLine) -> None:
     assert line.stream.failure is None, "a page that is closed is no failure of the line"
     again = ToldLine(port=line.page.port)
     again.close()
+
+
+def closed(connections: Sequence[socket.socket]) -> int:
+    """How many of them the server has closed."""
+    count = 0
+    for connection in connections:
+        try:
+            count += connection.recv(1, socket.MSG_PEEK) == b""
+        except BlockingIOError:
+            pass
+        except ConnectionResetError:
+            count += 1
+    return count
+
+
+def test_connections_are_bounded() -> None:
+    line = ToldLine(pace=Pace(beat=0.2))
+    idle: list[socket.socket] = []
+
+    def is_full() -> bool:
+        # One after the other: what comes at once may be lost before the server sees it.
+        idle.append(socket.create_connection(("127.0.0.1", line.page.port), timeout=60))
+        idle[-1].setblocking(False)
+        return closed(idle) > 0
+
+    try:
+        until(is_full, "one too many is closed")
+        assert len(idle) > 256
+        while idle:
+            idle.pop().close()
+        with Watcher(line.page) as late:
+            assert late.read()["slots"] == [], "there is room again"
+    finally:
+        for connection in idle:
+            connection.close()
+        line.close()
 
 
 def test_browsers_are_bounded() -> None:
