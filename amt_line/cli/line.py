@@ -114,6 +114,8 @@ def _check_options(settings: Settings, said: Sequence[str], file: Path | None,
         raise UsageProblem("no slots: give --slot NAME=PORT, --slots FILE or --simulate N")
     if settings.port is not None or settings.usb_serial or settings.vid_pid:
         raise UsageProblem("a line has its ports by --slot or --slots")
+    if settings.trace is not None:
+        raise UsageProblem("--trace is for one port; the records of a line hold every exchange")
     if no_records and (others["records"] is not None or others["store"] is not None):
         raise UsageProblem("--no-records and --records or --store contradict each other")
     if others["replug"] is not None and simulate is None:

@@ -81,6 +81,7 @@ class Station:
     (["--slot", "B=x", "--inputs", "bad.csv"], "line 2: the line has no slot 'A'"),
     (["--slot", "A=x", "--answer", "screen=yes"], "--answer: the plan has no operator step"),
     (["--slot", "A=x", "-p", "y"], "a line has its ports by --slot or --slots"),
+    (["--slot", "A=x", "--trace", "t"], "--trace is for one port"),
     (["--slot", "A=x", "--app"], "the plan is for the pc channel, --app contradicts it"),
     (["--slot", "A=x", "--replug", "1"], "--replug is for the handsets of --simulate"),
     (["--slot", "A=x", "--no-records", "--records", "r"], "contradict each other"),

@@ -15,7 +15,8 @@ from amt_line.run.events import STATES
 GUIDE = (ROOT / "docs" / "line.md").read_text(encoding="utf-8")
 EVENTS = ("slot-state", "run-began", "step-began", "step-again", "step-ended", "notice",
           "question", "answer", "run-ended")
-COMMON = {"--port", "--serial", "--vid-pid", "--pc", "--app", "--timeout", "--baud", "--json"}
+COMMON = {"--port", "--serial", "--vid-pid", "--pc", "--app", "--timeout", "--baud", "--trace",
+          "--json"}
 
 
 def test_the_slots_file_of_the_guide(tmp_path: Path) -> None:
