@@ -76,7 +76,8 @@ def test_what_only_looks_wrong(tmp_path: Path, text: str) -> None:
 
 
 def test_force_of_texts_and_requests_is_done_and_named(tmp_path: Path, peer: Peer) -> None:
-    peer.script = Script(requests={45: [[ACKNOWLEDGEMENT, ok(46, Atom.integer(19, 99))]]},
+    peer.script = Script(requests={45: [[ACKNOWLEDGEMENT, ok(46, Atom.integer(19, module))]
+                                        for module in (99, 16)]},
                          texts={'AT^DBTADDR=""': [OK]})
     plan = load(tmp_path, "[[step]]\nat = 'AT^DBTADDR=\"\"'\nforce = true\n"
                 "[[step]]\nrequest = '45'\natoms = ['module=99']\nforce = true\n"
