@@ -233,7 +233,7 @@ def test_a_database_that_is_away_is_said_so_and_asked_again(tmp_path: Path) -> N
     try:
         response, text = pages.get("/runs")
         assert response.status == 503 and "the database cannot be reached" in text
-        assert "behind: 3 &lt;b&gt;records&lt;/b&gt;" in text
+        assert "The database is behind: 3 &lt;b&gt;records&lt;/b&gt;" in text
         away = False
         assert pages.get("/runs")[0].status == 200
     finally:

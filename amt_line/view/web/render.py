@@ -62,7 +62,8 @@ class Renderer:
         text = _environment().get_template(template).render(
             t=chosen.word, language=chosen, languages=list(language.languages().values()),
             words=dict(chosen.words), version=version(), rooms=self._rooms,
-            delivery=self._delivery(), with_language=lambda code: _with_language(request, code),
+            delivery=self._delivery().removeprefix("behind: "),  # the page says that by itself
+            with_language=lambda code: _with_language(request, code),
             zone=zone_name(), **{"room": "", **values})
         response = web.Response(text=text, status=status, content_type="text/html")
         response.headers["Vary"] = "Accept-Language, Cookie"
