@@ -62,9 +62,13 @@ class Watch:
         try:
             yield
         finally:
-            self._is_over = True
-            signal.setitimer(signal.ITIMER_REAL, 0)
+            self.stop()
             signal.signal(signal.SIGALRM, before)
+
+    def stop(self) -> None:
+        """Look no more. May be called twice: an interrupt may have come before the first time."""
+        self._is_over = True
+        signal.setitimer(signal.ITIMER_REAL, 0)
 
     def look(self) -> None:
         """Tell of the daemon's deaths; a wait for a command ends with the handset.
@@ -90,15 +94,19 @@ class Watch:
 def serve(handset: Handset, group: click.Group, end: End) -> None:
     """Stay until the handset ends; at a terminal, run the commands that are typed."""
     watch = Watch(handset, end)
-    with watch.set_up():
-        if sys.stdin.isatty():
-            click.echo("type a command (help lists them), exit or Ctrl-D ends", err=True)
-            with history(), contextlib.suppress(_Down):
-                _converse(handset, group, watch, end)
-        else:
-            while handset.is_up:
-                signal.pause()
-        watch.look()
+    try:
+        with watch.set_up():
+            if sys.stdin.isatty():
+                click.echo("type a command (help lists them), exit or Ctrl-D ends", err=True)
+                with history(), contextlib.suppress(_Down):
+                    _converse(handset, group, watch, end)
+            else:
+                while handset.is_up:
+                    signal.pause()
+            watch.look()
+    finally:
+        # Left running, the alarm would interrupt what takes the handset down, and then end us.
+        watch.stop()
 
 
 def _converse(handset: Handset, group: click.Group, watch: Watch, end: End) -> None:

@@ -7,7 +7,7 @@ from pathlib import Path
 PROJECT = Path(__file__).resolve().parents[3]
 COMMAND = [sys.executable, "-m", "amt_simulator"]
 # The seconds that a stuck machine does not need.
-PATIENCE = 60
+PATIENCE = 300
 
 
 def handset(*words: str, timeout: float = PATIENCE) -> "subprocess.CompletedProcess[str]":
