@@ -18,7 +18,7 @@ from amt_station.wire.envelope import ACKNOWLEDGEMENT, encode_envelope
 from amt_station.wire.packet import Packet
 
 ROOT = Path(__file__).resolve().parents[2]
-PATIENCE = 10.0
+PATIENCE = 60.0
 
 Script = Callable[[Item], Sequence[bytes]]
 Run = Callable[..., "subprocess.CompletedProcess[str]"]
