@@ -13,6 +13,7 @@ from conftest import HandsetFactory
 from amt_simulator import Handset
 from amt_simulator.errors import HandsetError
 from amt_simulator.waiting import scaled, wait_until
+from amt_station import wire
 from support.channels import AppChannel, PcChannel, flag, integer
 from support.slow_shell import SlowShell
 from support.trace import Trace
@@ -72,9 +73,10 @@ REQUESTS = [("pc", "/system/bin/sync", 219, integer(192, 1)),
 @pytest.mark.parametrize("path, text, request_id, atom", REQUESTS)
 @pytest.mark.parametrize("number", [signal.SIGINT, signal.SIGTERM, signal.SIGSEGV])
 def test_signal_while_a_request_s_command_runs(make_handset: HandsetFactory, number: int, path: str,
-                                               text: str, request_id: int, atom: object) -> None:
+                                               text: str, request_id: int, atom: wire.Atom) -> None:
     handset, shell = start_with_slow_shell(make_handset, path, text)
-    channel = PcChannel(handset) if path == "pc" else AppChannel(handset)
+    channel: PcChannel | AppChannel = (PcChannel(handset) if path == "pc"
+                                       else AppChannel(handset))
     channel.send_packet(request_id, atom)
     shell.wait_held()
     end_by(handset, number)
