@@ -30,18 +30,35 @@ class _Down(Exception):
 
 
 class End:
-    """The handler of the signals that ask for the end: one is enough, it is on its way then."""
+    """The handler of the signals that ask for the end: one is enough, it is on its way then.
+
+    It interrupts the main thread only where that waits for somebody. Elsewhere an exception out of
+    nowhere could leave a lock taken for ever; there the end is seen as soon as that is done.
+    """
 
     def __init__(self) -> None:
         self.is_asked = False
         self.is_final = False
+        self.interrupts = True
 
     def __call__(self, number: int, _frame: object) -> None:
         """Interrupt the main thread, once."""
         self.is_final = self.is_final or number != signal.SIGINT
         if not self.is_asked:
             self.is_asked = True
-            raise KeyboardInterrupt
+            if self.interrupts:
+                raise KeyboardInterrupt
+
+    @contextlib.contextmanager
+    def interrupting(self) -> Iterator[None]:
+        """Interrupt what is waited for in the block, also when the end was asked for before."""
+        self.interrupts = True
+        try:
+            if self.is_asked:
+                raise KeyboardInterrupt
+            yield
+        finally:
+            self.interrupts = False
 
 
 class Watch:
@@ -75,7 +92,7 @@ class Watch:
 
         An end that was asked for is repeated: what interrupted a finalizer got lost there.
         """
-        if self._end.is_asked and not self._is_over:
+        if self._end.is_asked and self._end.interrupts and not self._is_over:
             raise KeyboardInterrupt
         with contextlib.suppress(OSError, HandsetError):
             exits = self._handset.exits()
@@ -93,6 +110,7 @@ class Watch:
 
 def serve(handset: Handset, group: click.Group, end: End) -> None:
     """Stay until the handset ends; at a terminal, run the commands that are typed."""
+    end.interrupts = False
     watch = Watch(handset, end)
     try:
         with watch.set_up():
@@ -101,7 +119,8 @@ def serve(handset: Handset, group: click.Group, end: End) -> None:
                 with history(), contextlib.suppress(_Down):
                     _converse(handset, group, watch, end)
             else:
-                while handset.is_up:
+                while handset.is_up and not end.is_asked:
+                    # What comes in between is seen when the alarm ends the pause.
                     signal.pause()
             watch.look()
     finally:
@@ -118,7 +137,8 @@ def _converse(handset: Handset, group: click.Group, watch: Watch, end: End) -> N
     while handset.is_up:
         try:
             watch.is_typing = True
-            line = input(PROMPT)
+            with end.interrupting():
+                line = input(PROMPT)
         except EOFError:
             click.echo(err=True)
             return
@@ -152,8 +172,9 @@ def run_line(handset: Handset, group: click.Group, line: str, end: End) -> None:
         if words == ["help"]:
             _help(group)
         elif words:
-            _command(group, words[0]).main(words[1:], prog_name=words[0], standalone_mode=False,
-                                           obj=handset)
+            with end.interrupting():
+                _command(group, words[0]).main(words[1:], prog_name=words[0],
+                                               standalone_mode=False, obj=handset)
     except click.ClickException as error:
         error.show()
     except (HandsetError, OSError, ValueError) as error:

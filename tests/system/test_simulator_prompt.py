@@ -5,6 +5,7 @@ import os
 import pty
 import select
 import signal
+import subprocess
 import sys
 from pathlib import Path
 
@@ -139,6 +140,43 @@ def test_deaths_are_told_without_a_terminal(up, base: Path) -> None:
     assert process.stderr.read() == (
         "amt-handset: the sandbox has ended with signal 9 (SIGKILL)\n")
     assert list(base.iterdir()) == []
+
+
+ASKED_WHILE_LOOKING = """
+import os, signal
+from amt_simulator import prompt
+
+
+class Handset:
+    asked = looked = 0
+    death = ""
+
+    @property
+    def is_up(self):
+        self.asked += 1
+        os.kill(os.getpid(), signal.SIGTERM)
+        sum(range(1000))
+        self.looked += 1
+        return True
+
+    def exits(self):
+        return []
+
+
+end = prompt.End()
+signal.signal(signal.SIGTERM, end)
+handset = Handset()
+prompt.serve(handset, None, end)
+print(handset.asked, handset.looked, end.is_asked)
+"""
+
+
+def test_an_end_that_is_asked_for_leaves_nothing_half_done() -> None:
+    """A look at the sandbox takes a lock; interrupted in there, the end would wait for it."""
+    done = subprocess.run([sys.executable, "-c", ASKED_WHILE_LOOKING], cwd=PROJECT, text=True,
+                          stdin=subprocess.DEVNULL, capture_output=True, timeout=PATIENCE,
+                          check=False)
+    assert (done.stdout, done.stderr) == ("1 1 True\n", "")
 
 
 def kill_init(directory: Path) -> None:
