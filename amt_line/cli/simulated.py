@@ -10,6 +10,7 @@ from typing import Any, Collection, Iterator, Mapping
 
 from amt_line.cli.slots import SlotSpec
 from amt_simulator import Handset, HandsetError
+from amt_simulator.waiting import wait_until
 from amt_station.errors import StationError
 from amt_station.requests.model import Channel
 
@@ -100,8 +101,12 @@ class Hand:
     def _change(self, handset: Handset) -> None:
         try:
             if not self._stop.wait(self._seconds):
+                first = handset.pid
                 handset.usb.unplug()
                 self._stop.wait(_AWAY_SECONDS)
+                # However long the service takes to end: the one that ends must not answer any more.
+                wait_until(lambda: self._stop.is_set() or handset.pid != first or None,
+                           "the end of the service")
                 handset.place(_BATTERY, str(_some_battery()))
                 handset.usb.plug()
         except HandsetError:
