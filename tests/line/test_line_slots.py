@@ -15,7 +15,6 @@ from line_bench import ADC, Script
 from line_slots import PATIENCE, QUICK, Bench, battery
 from station_peer import Peer
 
-from amt_simulator.waiting import scaled
 from amt_line.run.presence import Patience
 from amt_line.run.stop import TERMINATED
 from amt_station.wire.decoder import EnvelopeDecoder
@@ -81,7 +80,8 @@ def test_a_handset_that_is_pulled_out(tmp_path: Path, records: Path, step: str) 
         start = time.monotonic()
         bench.sockets["A"].pull()
         ended = bench.wait("run-ended")
-        assert time.monotonic() - start < scaled(2.0)
+        # Two seconds on a machine with time; what the step waits for would take a minute.
+        assert time.monotonic() - start < 20.0
         assert ended["verdict"] == "ABORTED" and ended["reason"].endswith("was pulled out")
         document = bench.record(ended["run"])
         assert (document["state"], document["verdict"]) == ("aborted", "ABORTED")
