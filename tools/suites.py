@@ -39,8 +39,11 @@ class Suite:
 def system(name: str, preset: str, workers: int, patience: Mapping[str, str],
            is_beside: bool = False) -> Suite:
     """The whole daemon of a build, in the simulated handset."""
-    return Suite(name, preset, ("tests/system", f"--handset-build={preset}", "-n", str(workers)),
-                 patience, HANDSET, is_beside)
+    arguments = ["tests/system", f"--handset-build={preset}", "-n", str(workers)]
+    if is_beside:
+        # The programs on the PC are not sanitized.
+        arguments += ["-m", "not pc_side"]
+    return Suite(name, preset, tuple(arguments), patience, HANDSET, is_beside)
 
 
 # In the order in which they begin, and in which their builds are made: what needs no build first,

@@ -8,6 +8,8 @@ import pytest
 
 from amt_station.cli.lazy import COMMANDS
 
+# One worker makes the pages, for all of them.
+pytestmark = pytest.mark.xdist_group("manual")
 PROJECT = Path(__file__).resolve().parents[2]
 # Only a machine that stands still takes so long.
 SECONDS = 600

@@ -16,6 +16,8 @@ from station_peer import ROOT, Peer, answering, station_environment
 from amt_station import __version__
 from amt_station.wire.atoms import Atom
 
+# One worker builds the wheel, for all of them.
+pytestmark = pytest.mark.xdist_group("wheel")
 PACKAGES = ("amt_station", "amt_line", "amt_simulator")
 
 

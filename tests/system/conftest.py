@@ -16,6 +16,7 @@ FAKE_DAEMON = Path(__file__).with_name("support") / "fake_daemon.py"
 HANDSETS = pytest.StashKey[list[Handset]]()
 # A test that takes so long hangs, on however busy a machine.
 MOST_SECONDS = 900
+PC_SIDE = ("test_simulator_", "test_scenarios", "test_line_", "test_traces")
 FAILED = pytest.StashKey[bool]()
 
 
@@ -27,7 +28,13 @@ def pytest_addoption(parser: pytest.Parser) -> None:
 
 
 def pytest_collection_modifyitems(config: pytest.Config, items: list[pytest.Item]) -> None:
-    """Each wait has its own deadline; a test of many waits may need longer than the usual limit."""
+    """Each wait has its own deadline; a test of many waits may need longer than the usual limit.
+
+    Tests of what runs on the PC are marked: they say nothing new on another build of the daemon.
+    """
+    for item in items:
+        if item.path.name.startswith(PC_SIDE):
+            item.add_marker(pytest.mark.pc_side)
     if config.pluginmanager.hasplugin("timeout"):
         for item in items:
             item.add_marker(pytest.mark.timeout(MOST_SECONDS))
