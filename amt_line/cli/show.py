@@ -7,8 +7,8 @@ from typing import Any, Iterator, Mapping
 
 import click
 
-from amt_line.report.html_file import decoded_text
-from amt_line.report.records import (duration, limits_text, load_record, value_text, verdict_word)
+from amt_line.report.records import (decoded_text, duration, limits_text, load_record, value_text,
+                                     verdict_word)
 from amt_station.cli import console
 from amt_station.cli.options import Settings, common_options
 from amt_station.text import printable

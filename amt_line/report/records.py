@@ -118,3 +118,32 @@ def duration(seconds: float | None) -> str:
     if seconds is None:
         return ""
     return f"{seconds * 1000:.0f} ms" if seconds < 1 else f"{seconds:.1f} s"
+
+
+def printable_lines(text: object) -> str:
+    """A text with everything that cannot be shown written out."""
+    return printable(str(text))
+
+
+def spaced_hex(text: str) -> str:
+    """Bytes in hexadecimal, told apart."""
+    return " ".join(text[index:index + 2] for index in range(0, len(text), 2))
+
+
+def decoded_text(item: Mapping[str, Any]) -> str:
+    """What went over the line, in words."""
+    kind = item["kind"]
+    if kind == "text":
+        return printable(item["text"])
+    if kind == "skipped":
+        return f"{len(item['bytes']) // 2} bytes skipped: {printable(item['why'])}"
+    if kind == "acknowledgement":
+        return "acknowledgement"
+    packet = item["packet"]
+    atoms = ", ".join(map(_atom_text, packet["atoms"]))
+    return f"{packet['id']} {printable(packet['name'])}" + (f": {atoms}" if atoms else "")
+
+
+def _atom_text(atom: Mapping[str, Any]) -> str:
+    name = printable(str(atom["name"] or atom["id"]))
+    return f"{name}={printable(str(atom.get('text', atom['value'])))}"

@@ -2,13 +2,11 @@
 
 from __future__ import annotations
 
-from jinja2 import Environment, PackageLoader, StrictUndefined
-
-from amt_line.drawing.days import share_text, yield_over_days
+from amt_line.drawing.days import yield_over_days
 from amt_line.drawing.histogram import value_histogram
 from amt_line.drawing.pareto import failure_pareto
 from amt_line.report import statistics_tables as tables
-from amt_line.report.html_file import printable_lines
+from amt_line.report.template import environment_of
 from amt_line.run.clock import utc_now
 from amt_line.statistics.figures import Statistics
 
@@ -18,13 +16,9 @@ _MOST_HISTOGRAMS = 200
 
 def statistics_page(found: Statistics) -> str:
     """The page."""
-    environment = Environment(loader=PackageLoader("amt_line.report", "templates"),
-                              autoescape=True, undefined=StrictUndefined, trim_blocks=True,
-                              lstrip_blocks=True)
-    environment.filters.update(safe_text=printable_lines, share=share_text)
     limited = tables.limited_values(found)
     others = [one for one in found.values if not one.limited]
-    return environment.get_template("statistics.html").render(
+    return environment_of("amt_line.report").get_template("statistics.html").render(
         all=found.all, filter=tables.filter_text(found.filter), made=utc_now(),
         summary=tables.summary(found), yields=yield_over_days(found.days),
         pareto=failure_pareto(found.failures), failures=tables.failure_table(found),

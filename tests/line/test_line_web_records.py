@@ -175,7 +175,7 @@ def test_a_run_is_shown_whole(served: Served) -> None:
                  "SKIPPED", "Exchanges: 1", "7e 01", "4f 4b", "Before the first step", "Input sn"):
         assert said in tags.text, said
     assert tags.tags.count("details") == 3, "two lists of exchanges and the languages"
-    assert text.count('class="bar"') == 2 and 'class="mark fail"' in text
+    assert text.count('class="value-bar"') == 2 and 'class="mark fail"' in text
 
 
 def test_a_record_is_downloaded_as_it_is(served: Served) -> None:

@@ -7,13 +7,11 @@ from functools import lru_cache
 from typing import Any, Callable
 
 from aiohttp import web
-from jinja2 import Environment, PackageLoader, StrictUndefined
+from jinja2 import Environment
 from yarl import URL
 
-from amt_line.drawing.days import share_text
-from amt_line.drawing.value_bar import bar_for
-from amt_line.report.html_file import decoded_text, printable_lines, spaced_hex
-from amt_line.report.records import duration, number_text, value_text
+from amt_line.drawing.value_bar import value_bar
+from amt_line.report.template import environment_of
 from amt_line.view.web import language
 from amt_line.view.web.assets import version
 from amt_line.view.web.words import limits_words
@@ -24,13 +22,9 @@ _EXPLAINED = frozenset({400, 401, 403, 404, 421, 500, 503})
 
 @lru_cache(maxsize=1)
 def _environment() -> Environment:
-    environment = Environment(loader=PackageLoader("amt_line.view.web", "templates"),
-                              autoescape=True, undefined=StrictUndefined, trim_blocks=True,
-                              lstrip_blocks=True)
-    environment.filters.update(safe_text=printable_lines, hex=spaced_hex, decoded=decoded_text,
-                               duration=duration, number=number_text, local=local_time,
-                               share=share_text)
-    environment.globals.update(value_text=value_text, limits_words=limits_words, bar=bar_for)
+    environment = environment_of("amt_line.view.web")
+    environment.filters.update(local=local_time)
+    environment.globals.update(limits_words=limits_words, bar=value_bar)
     return environment
 
 
