@@ -132,3 +132,17 @@ def in_thread(work: Callable[[], object]) -> threading.Thread:
     thread = threading.Thread(target=work, daemon=True)
     thread.start()
     return thread
+
+
+def toml_text(value: object) -> str:
+    """A value as TOML has it; characters by their numbers."""
+    if isinstance(value, dict):
+        return "{" + ", ".join(f"{toml_text(str(key))} = {toml_text(part)}"
+                               for key, part in value.items()) + "}"
+    if isinstance(value, list):
+        return "[" + ", ".join(map(toml_text, value)) + "]"
+    if isinstance(value, bool):
+        return str(value).lower()
+    if isinstance(value, str):
+        return '"' + "".join(f"\\U{ord(character):08x}" for character in value) + '"'
+    return str(value)

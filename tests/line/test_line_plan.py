@@ -7,7 +7,7 @@ from pathlib import Path
 import pytest
 from hypothesis import given, settings
 from hypothesis import strategies as st
-from line_bench import ADC, load, problems, write_plan
+from line_bench import ADC, load, problems, toml_text, write_plan
 
 from amt_line.plan.problems import PlanProblem
 from amt_line.plan.reader import load_plan
@@ -267,25 +267,13 @@ _VALUES = st.recursive(_LEAVES, lambda inner: st.lists(inner, max_size=3)
                        | st.dictionaries(_KEYS, inner, max_size=4), max_leaves=12)
 
 
-def _toml(value: object) -> str:
-    if isinstance(value, dict):
-        return "{" + ", ".join(f"{key} = {_toml(part)}" for key, part in value.items()) + "}"
-    if isinstance(value, list):
-        return "[" + ", ".join(map(_toml, value)) + "]"
-    if isinstance(value, bool):
-        return str(value).lower()
-    if isinstance(value, str):
-        return '"' + "".join(f"\\U{ord(character):08x}" for character in value) + '"'
-    return str(value)
-
-
 @settings(max_examples=300)
 @given(st.one_of(
     st.text(max_size=200),
     st.dictionaries(_KEYS, _VALUES, max_size=5).map(
-        lambda table: "\n".join(f"{key} = {_toml(value)}" for key, value in table.items())),
+        lambda table: "\n".join(f"{key} = {toml_text(value)}" for key, value in table.items())),
     st.lists(st.dictionaries(_KEYS, _VALUES, max_size=5), min_size=1, max_size=3).map(
-        lambda steps: f"step = {_toml(steps)}")))
+        lambda steps: f"step = {toml_text(steps)}")))
 def test_whatever_is_in_the_file_there_is_a_plan_or_a_clear_problem(
         tmp_path_factory: pytest.TempPathFactory, text: str) -> None:
     path = tmp_path_factory.getbasetemp() / "any.toml"

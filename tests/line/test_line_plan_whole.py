@@ -10,7 +10,7 @@ import pytest
 from hypothesis import given, settings
 from hypothesis import strategies as st
 from jsonschema import Draft7Validator
-from line_bench import ADC, OK, Bench, Script, load, problems, verdicts, write_plan
+from line_bench import ADC, OK, Bench, Script, load, problems, toml_text, verdicts, write_plan
 from station_peer import Peer, ok
 
 from amt_line.plan.problems import PlanProblem
@@ -137,19 +137,6 @@ def steps(draw: Any) -> dict[str, Any]:
     return step
 
 
-def _toml(value: object) -> str:
-    if isinstance(value, dict):
-        return "{" + ", ".join(f"{_toml(str(key))} = {_toml(part)}"
-                               for key, part in value.items()) + "}"
-    if isinstance(value, list):
-        return "[" + ", ".join(map(_toml, value)) + "]"
-    if isinstance(value, bool):
-        return str(value).lower()
-    if isinstance(value, str):
-        return '"' + "".join(f"\\U{ord(character):08x}" for character in value) + '"'
-    return repr(value)
-
-
 INPUTS = "[input.x]\n[input.n]\nformat = 'int'\n"
 
 
@@ -158,7 +145,7 @@ INPUTS = "[input.x]\n[input.n]\nformat = 'int'\n"
 def test_what_the_schema_refuses_is_refused_and_the_reader_refuses_no_less(
         tmp_path_factory: pytest.TempPathFactory, made: list[dict[str, Any]], last: str) -> None:
     lists = {"step": made[:-1] or made, last: made[-1:]} if last != "step" else {"step": made}
-    text = "\n".join(f"{name} = {_toml(content)}" for name, content in lists.items())
+    text = "\n".join(f"{name} = {toml_text(content)}" for name, content in lists.items())
     path = write_plan(tmp_path_factory.getbasetemp(), f"{text}\n{INPUTS}")
     by_the_schema = VALIDATOR.is_valid(tomllib.loads(path.read_text(encoding="utf-8")))
     try:
@@ -173,7 +160,7 @@ def test_what_the_schema_refuses_is_refused_and_the_reader_refuses_no_less(
 @given(steps())
 def test_what_is_wrong_by_the_schema_alone_is_told_with_step_and_key(
         tmp_path_factory: pytest.TempPathFactory, step: dict[str, Any]) -> None:
-    path = write_plan(tmp_path_factory.getbasetemp(), f"step = {_toml([step])}\n{INPUTS}")
+    path = write_plan(tmp_path_factory.getbasetemp(), f"step = {toml_text([step])}\n{INPUTS}")
     wrong = not VALIDATOR.is_valid(tomllib.loads(path.read_text(encoding="utf-8")))
     try:
         load_plan(path, Channel.PC)
