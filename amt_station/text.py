@@ -16,11 +16,6 @@ def printable(text: str) -> str:
         character if character.isprintable() else _escape(character) for character in text)
 
 
-def safe_lines(text: str) -> str:
-    """As ``printable``, but line ends and tabs stay."""
-    return "\n".join(printable(line).replace("\\t", "\t") for line in text.split("\n"))
-
-
 def plain(text: str) -> str:
     """``text`` as JSON can carry it: bytes that are no characters are written out."""
     return text.encode("utf-8", "surrogateescape").decode("utf-8", "backslashreplace")

@@ -59,9 +59,10 @@ def diff(context: click.Context, first: Path, second: Path) -> None:
     found = differences(read_trace(first), read_trace(second))
     if settings.json:
         console.data_json({"ok": not found, "differences": [one.json() for one in found]})
-    for one in found * (not settings.json):
-        sign, path = ("-", first) if one.is_first else ("+", second)
-        console.data(f"{sign} {path}:{one.line}: {one.text}")
+    else:
+        for one in found:
+            sign, path = ("-", first) if one.is_first else ("+", second)
+            console.data(f"{sign} {path}:{one.line}: {one.text}")
     context.exit(1 if found else 0)
 
 
