@@ -14,6 +14,7 @@ from amt_station.errors import NoPort, UsageProblem
 _VID_PID = re.compile(r"([0-9A-Fa-f]{4}):([0-9A-Fa-f]{4})", re.ASCII)
 _LOOK_SECONDS = 0.1
 PROC = Path("/proc")
+_PSEUDO_TERMINALS = "/dev/pts/"
 
 
 @dataclass(frozen=True)
@@ -45,6 +46,9 @@ class Holder:
     pid: int
     command: str
 
+    def __str__(self) -> str:
+        return f"{self.command} ({self.pid})"
+
 
 def found_ports() -> list[FoundPort]:
     """Every port that pySerial finds, by device name."""
@@ -64,6 +68,11 @@ def holders(device: str, proc: Path = PROC) -> list[Holder]:
         return []
     return [_holder(process) for process in _processes(proc)
             if int(process.name) != os.getpid() and _has_open(process, path, node)]
+
+
+def is_pseudo_terminal(device: str) -> bool:
+    """Whether there is a program at the other end, which has the port open by right."""
+    return os.path.realpath(device).startswith(_PSEUDO_TERMINALS)
 
 
 def running(commands: Collection[str], proc: Path = PROC) -> list[Holder]:

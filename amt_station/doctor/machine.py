@@ -7,11 +7,11 @@ from datetime import datetime, timezone
 from pathlib import Path
 from typing import Sequence
 
+from amt_station import state
 from amt_station.doctor.computer import NotKnown
 from amt_station.doctor.examination import Examination
 from amt_station.doctor.finding import Finding, error, ok, unchecked, warning
 from amt_station.errors import EXIT_DEFECT
-from amt_station.state import state_directory
 
 _MEGABYTE = 1_000_000
 _LITTLE = 1000 * _MEGABYTE
@@ -25,7 +25,7 @@ _SET = ("`sudo timedatectl set-ntp true`, or name the factory's time server in "
 
 def records_directory(visit: Examination) -> Path:
     """Where the records of this station go."""
-    return visit.records or state_directory() / "records"
+    return visit.records or state.records_directory()
 
 
 def clock(visit: Examination) -> Sequence[Finding]:

@@ -8,15 +8,15 @@ from typing import Sequence
 
 from amt_station.doctor.computer import User, group_of
 from amt_station.doctor.examination import Examination
-from amt_station.doctor.finding import Finding, error, ok, unchecked
+from amt_station.doctor.finding import Finding, error, ok, unchecked, warning
 from amt_station.doctor.services import PROBERS
 from amt_station.errors import EXIT_BUSY, EXIT_NO_PORT, NoPort, PortBusy, UsageProblem
-from amt_station.found_ports import FoundPort, Holder, found_ports
+from amt_station.found_ports import FoundPort, Holder, found_ports, is_pseudo_terminal
 
 RULE_ADVICE = ("install the rule file: `amt-station doctor --udev-rule | sudo tee "
                "/etc/udev/rules.d/70-amt-station.rules`, then plug the handset in again")
-# At the other end of a terminal of this kind there is a program, which has it open by right.
-_PSEUDO_TERMINALS = "/dev/pts/"
+# Where pySerial's URLs lead that open no device.
+_ELSEWHERE = ("loop", "rfc2217", "socket")
 
 
 def presence(visit: Examination) -> Sequence[Finding]:
@@ -29,7 +29,7 @@ def presence(visit: Examination) -> Sequence[Finding]:
     except UsageProblem as problem:
         return [unchecked(str(problem))]
     if not visit.device:
-        return [ok(f"{visit.url} leads to no port of this PC")]
+        return [_url(visit.url)]
     try:
         mode = os.stat(visit.device).st_mode
     except OSError as problem:
@@ -38,6 +38,12 @@ def presence(visit: Examination) -> Sequence[Finding]:
     if not stat.S_ISCHR(mode):
         return [error(f"{visit.device} is no serial port", f"name one; {_there()}", EXIT_NO_PORT)]
     return [ok(f"{visit.device} is there{_description(visit.device)}")]
+
+
+def _url(url: str) -> Finding:
+    if url.partition("://")[0].lower() in _ELSEWHERE:
+        return ok(f"{url} leads to no port of this PC")
+    return warning(f"the port behind {url} is not looked at", "name the port itself with -p")
 
 
 def _there() -> str:
@@ -60,7 +66,7 @@ def _ids(port: FoundPort) -> str:
 def permission(visit: Examination) -> Sequence[Finding]:
     """Whether this user may read and write it."""
     if not visit.device:
-        return [ok("no file of this PC is needed for it")]
+        return [ok("whatever the URL opens is its own matter")]
     user = visit.computer.user()
     if visit.computer.may_use(visit.device):
         return [ok(f"{user.name} may read and write it")]
@@ -91,31 +97,23 @@ def holder(visit: Examination) -> Sequence[Finding]:
         return [error(str(problem), "plug the handset in again; if that is no help, name another "
                       f"port: {_there()}", EXIT_NO_PORT)]
     if others:
-        return [error(f"{_names(others)} has {visit.url} open too, and takes a part of what the "
-                      "handset says", _way_out(others), EXIT_BUSY)]
+        return [error(f"{', '.join(map(str, others))} has {visit.url} open too, and takes a part "
+                      "of what the handset says", _way_out(others), EXIT_BUSY)]
     return [ok(f"it can be opened for this process alone{_seen(visit)}")]
 
 
 def _seen(visit: Examination) -> str:
     """What else is known: whoever reads along without a lock is seen among the processes only."""
-    if not visit.device or _is_pseudo(visit.device):
+    if not visit.device or is_pseudo_terminal(visit.device):
         return ""
     whom = "nobody else" if os.geteuid() == 0 else "no process that this user may look at"
     return f", and {whom} has it open"
 
 
-def _is_pseudo(device: str) -> bool:
-    return os.path.realpath(device).startswith(_PSEUDO_TERMINALS)
-
-
 def _others(visit: Examination) -> list[Holder]:
-    if not visit.device or _is_pseudo(visit.device):
+    if not visit.device or is_pseudo_terminal(visit.device):
         return []
     return visit.computer.holders(visit.device)
-
-
-def _names(others: Sequence[Holder]) -> str:
-    return ", ".join(f"{one.command} ({one.pid})" for one in others)
 
 
 def _way_out(others: Sequence[Holder]) -> str:

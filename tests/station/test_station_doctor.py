@@ -425,3 +425,11 @@ def test_a_real_holder_is_named(peer: Peer, run_station: Run, tmp_path: Path) ->
     assert result.returncode == 4, result.stdout
     assert f"({process.pid})" in result.stdout and "has it open" in result.stdout
     assert peer.raw == b""
+
+
+def test_a_url_that_opens_a_device_somehow(fake: FakeComputer, peer: Peer) -> None:
+    peer.script = replying(OK)
+    findings = examined(f"spy://{peer.path}?file=/dev/null", fake)
+    assert one(findings, "port").level is Level.WARNING
+    assert "is not looked at" in one(findings, "port").text
+    assert one(findings, "answer").level is Level.OK
