@@ -5,6 +5,7 @@ from __future__ import annotations
 import hashlib
 import json
 import os
+import re
 import signal
 import subprocess
 import tarfile
@@ -236,6 +237,23 @@ def test_the_bundle_is_what_the_porting_guide_says(unpacked: Path) -> None:
         assert f"| {owner} {mode} |" in row
     for file in (unpacked / "board").iterdir():
         assert file.name in guide
+
+
+def test_the_commands_of_the_porting_guide(made: Path, unpacked: Path, tmp_path: Path) -> None:
+    guide = (PROJECT / "docs" / "porting.md").read_text("utf-8")
+    (unpack,) = re.findall(r"^    (tar -x .*)$", guide, re.MULTILINE)
+    (compare,) = re.findall(r"^    (sed -n .*MANIFEST.*)$", guide, re.MULTILINE)
+    image = tmp_path / "image"
+    image.mkdir()
+    for command, folder in ((unpack, made), (compare, unpacked)):
+        command = command.replace("IMAGE", str(image)).replace(
+            "vx-kel-amt-1.1-handset-arm", unpacked.name)
+        done = run("sh", "-c", command, cwd=folder)
+        assert done.returncode == 0, done.stderr
+    assert done.stdout.count(": OK\n") == len(manifest(unpacked))
+    (image / "system/etc/vx-kel-amt.cfg").write_text("", "utf-8")
+    done = run("sh", "-c", compare.replace("IMAGE", str(image)), cwd=unpacked)
+    assert done.returncode == 1 and "system/etc/vx-kel-amt.cfg: FAILED\n" in done.stdout
 
 
 def test_the_daemon_of_the_bundle_is_stripped_and_named(unpacked: Path, build: Path) -> None:
