@@ -9,9 +9,10 @@ import pytest
 from packages import PROJECT, package
 
 from amt_station import __version__
-from tools.package import elf
+from tools.package import elf, fresh_root
+from tools.package import main as command
 from tools.package.handset_build import HandsetBuild, made
-from tools.package.source import PackageFailed
+from tools.package.source import PackageFailed, run
 
 
 def test_a_kind_that_is_none(tmp_path: Path) -> None:
@@ -83,3 +84,71 @@ def test_all_name_the_same_version() -> None:
     changes = (PROJECT / "packaging" / "debian" / "changelog").read_text("utf-8")
     assert re.findall(r"project\(vx-kel-amt VERSION (\S+)", cmake) == [__version__]
     assert re.findall(r"^vx-kel-amt \((\S+)\)", changes, re.MULTILINE)[0] == __version__
+
+
+def test_a_package_that_is_not_the_same_again(tmp_path: Path,
+                                              monkeypatch: pytest.MonkeyPatch) -> None:
+    """Each is compared with what was made first, by its name."""
+    first = tmp_path / "some.whl"
+    first.write_bytes(b"first")
+
+    def make_all(kinds: object, into: Path, build: str) -> list[Path]:
+        (into / first.name).write_bytes(content)
+        return [into / first.name]
+
+    monkeypatch.setattr(command, "make_all", make_all)
+    content = b"first"
+    command.check(["wheel"], [first], "release")
+    content = b"again"
+    with pytest.raises(PackageFailed, match="some.whl is not the same when it is made again"):
+        command.check(["wheel"], [first], "release")
+
+
+@pytest.fixture
+def root(tmp_path: Path) -> Path:
+    """Some files, one of which nobody looks at."""
+    for name in ("etc/one", "etc/two", "usr/three", "var/log/four"):
+        (tmp_path / name).parent.mkdir(parents=True, exist_ok=True)
+        (tmp_path / name).write_text(name, "utf-8")
+    (tmp_path / "link").symlink_to("etc/one")
+    return tmp_path
+
+
+def test_what_has_changed_below_a_root(root: Path) -> None:
+    before = fresh_root.listing(root)
+    assert {"link", "etc", "etc/one", "usr/three", "var"} <= set(before)
+    assert fresh_root.differences(before, fresh_root.listing(root)) == []
+    (root / "var/log/four").unlink()
+    (root / "etc/one").write_text("other", "utf-8")
+    (root / "etc/two").chmod(0o600)
+    (root / "usr/three").unlink()
+    (root / "new").mkdir()
+    (root / "link").unlink()
+    (root / "link").symlink_to("etc/two")
+    assert fresh_root.differences(before, fresh_root.listing(root)) == [
+        "etc/one", "etc/two", "link", "new", "usr/three"]
+
+
+def test_what_a_removed_package_has_left(root: Path, monkeypatch: pytest.MonkeyPatch) -> None:
+    """A file of its own is found by its name, whatever was there before."""
+    monkeypatch.setattr(fresh_root, "enter", lambda *words: "")
+    assert "etc/one" in fresh_root.purge(root)
+    (root / "usr" / "amt_station").mkdir()
+    with pytest.raises(PackageFailed, match="left behind: usr/amt_station$"):
+        fresh_root.purge(root)
+
+
+def test_a_trial_that_says_something_else(root: Path, monkeypatch: pytest.MonkeyPatch) -> None:
+    monkeypatch.setattr(fresh_root, "enter", lambda *words: "nothing")
+    with pytest.raises(PackageFailed, match="amt-station at --help says: nothing"):
+        fresh_root.install(root, root / "some.deb")
+
+
+def test_a_program_that_fails_leaves_what_it_has_said(tmp_path: Path) -> None:
+    """The end of it is shown, all of it is kept."""
+    with pytest.raises(PackageFailed) as failed:
+        run(["sh", "-c", "seq 100; exit 3"], tmp_path)
+    assert str(failed.value).splitlines()[-2:] == ["100", "sh ended with status 3"]
+    assert failed.value.said.splitlines() == [str(number) for number in range(1, 101)]
+    with pytest.raises(PackageFailed, match="nowhere-to-be-found: No such file"):
+        run(["nowhere-to-be-found"], tmp_path)

@@ -56,7 +56,8 @@ def enter(root: Path, *words: str) -> str:
                 "PATH": "/usr/sbin:/usr/bin:/sbin:/bin"})
 
 
-def _install(root: Path, package: Path) -> None:
+def install(root: Path, package: Path) -> None:
+    """Install it with all that it wants, and try what is in it."""
     enter(root, "apt-get", "install", "-y", "-q", f"/{package.name}")
     for words, wanted in TRIALS:
         said = enter(root, *words)
@@ -64,7 +65,8 @@ def _install(root: Path, package: Path) -> None:
             raise PackageFailed(f"{' '.join(words)} says: {said}")
 
 
-def _purge(root: Path) -> dict[str, str]:
+def purge(root: Path) -> dict[str, str]:
+    """Take it away; what is there without it."""
     enter(root, "apt-get", "purge", "-y", "-q", "amt-station")
     left = listing(root)
     own = [name for name in left if any(word in name for word in OWN) and not
@@ -86,10 +88,10 @@ def check(package: Path) -> None:
             package.parent)
         shutil.copy(package, root)
         enter(root, "apt-get", "update", "-q")
-        _install(root, package)
-        before = _purge(root)
-        _install(root, package)
-        changed = differences(before, _purge(root))
+        install(root, package)
+        before = purge(root)
+        install(root, package)
+        changed = differences(before, purge(root))
     if changed:
         raise PackageFailed(f"not as before: {' '.join(changed)}")
     note("installed, tried and removed without residue")
