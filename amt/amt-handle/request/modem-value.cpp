@@ -203,13 +203,16 @@ int amt_modem_handle_temperature(uint32_t channel, amt_buf_st *req_ptr, amt_buf_
         return PUB_ERR_PARAM;
     }
     amt_at_clear();
-    const pub_file_st file(TEMPERATURE_FILE, pub_file_mode_en::READ);
+    pub_file_st file(TEMPERATURE_FILE, pub_file_mode_en::READ);
     if (!file.is_open()) {
         pub_log_fail(g_amt_handle_log, PUB_ERR_FILE, "fopen error: errno=%d", errno);
         return amt_reply_fail(channel, rsp_ptr, AMT_TEMPERATURE_RSPCMD);
     }
     uint32_t temperature = 0;
-    if (pub_file_scan_unsigned(file, &temperature) != 1) {
+    const int count = pub_file_scan_unsigned(file, &temperature);
+    /* Before the answer, which may have to wait for its reader. */
+    pub_file_close(&file);
+    if (count != 1) {
         pub_log_fail(g_amt_handle_log, PUB_ERR_FILE, "fscanf error: errno=%d", errno);
         return amt_reply_fail(channel, rsp_ptr, AMT_TEMPERATURE_RSPCMD);
     }

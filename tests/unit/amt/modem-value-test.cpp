@@ -1,7 +1,12 @@
 #include "amt/amt-handle/request/modem-value.h"
 
+#include <fcntl.h>
+#include <poll.h>
+#include <sys/socket.h>
 #include <sys/stat.h>
 #include <unistd.h>
+
+#include <thread>
 
 #include <gtest/gtest.h>
 
@@ -16,6 +21,7 @@ namespace {
 using namespace std::string_literals;
 
 const std::string OK = "\r\nOK\r\n";
+constexpr const char *TEMPERATURE_PATH = "sys/class/power_supply/battery/temp";
 
 /* Serves the request of that id with the modem's answer line and returns the app's packets. */
 std::vector<std::string> ask(amt_handle_func handler, uint8_t id, const std::string &answer)
@@ -87,7 +93,7 @@ protected:
 
     std::vector<std::string> ask_with(const std::string &content) const
     {
-        write_whole_file("sys/class/power_supply/battery/temp", content);
+        write_whole_file(TEMPERATURE_PATH, content);
         EXPECT_EQ(m_line.handle(amt_modem_handle_temperature, wire_packet(55, byte_atom(99, 1))),
                   PUB_ERR_NONE);
         return m_line.app_packets();
@@ -134,6 +140,33 @@ TEST_F(temperature, without_a_file_is_a_failure)
     EXPECT_EQ(m_line.handle(amt_modem_handle_temperature, wire_packet(55, "")), PUB_ERR_NONE);
     EXPECT_EQ(m_line.app_packets(), std::vector<std::string>{failure_packet(56)});
     EXPECT_TRUE(capture.has("fopen error: errno=2"));
+}
+
+/* The end of a thread runs no destructors, and strikes where it waits: for the app that does not read, too. */
+TEST_F(temperature, closes_the_file_before_it_waits_for_the_reader_of_the_answer)
+{
+    const int app_fd = g_handle_context.m_pty.m_ptm_fd;
+    size_t waiting_count = 0;
+    while (send(app_fd, "x", 1, MSG_DONTWAIT) == 1) {
+        waiting_count++;
+    }
+    ASSERT_EQ(mkfifo(TEMPERATURE_PATH, 0600), 0);
+    std::thread handler([this] {
+        EXPECT_EQ(m_line.handle(amt_modem_handle_temperature, wire_packet(55, "")), PUB_ERR_NONE);
+    });
+    const int driver_fd = open(TEMPERATURE_PATH, O_WRONLY);
+    EXPECT_EQ(write(driver_fd, "315\n", 4), 4);
+    pollfd reader_gone = {driver_fd, 0, 0};
+    EXPECT_EQ(poll(&reader_gone, 1, 20000), 1);
+    std::vector<std::string> packets;
+    while (packets.size() < waiting_count + 1) {
+        for (const std::string &packet : m_line.app_packets()) {
+            packets.push_back(packet);
+        }
+    }
+    handler.join();
+    EXPECT_EQ(packets.back(), reply(315).front());
+    close(driver_fd);
 }
 
 TEST_F(temperature, leaves_no_descriptor_open)

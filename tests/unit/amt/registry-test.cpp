@@ -148,8 +148,7 @@ TEST_F(registry, leaves_two_acknowledgements_to_their_handlers)
     amt_handle_register_all();
     for (uint32_t id = 0; id < AMT_HANDLE_FUNC_COUNT; id++) {
         const bool is_handlers = id == AMT_VERSION_CMD || id == AMT_WRITE_TEST_RESULT_CMD;
-        EXPECT_EQ(g_handle_context.m_pc_ack_a[id],
-                  is_handlers ? amt_ack_en::HANDLER : amt_ack_en::DISPATCHER)
+        EXPECT_EQ(g_handle_context.m_pc_ack_a[id], is_handlers ? amt_ack_en::HANDLER : amt_ack_en::DISPATCHER)
             << id;
     }
 }
