@@ -6,7 +6,8 @@ from pathlib import Path
 
 from amt_simulator.errors import HandsetError
 
-PLATFORM = Path(__file__).resolve().parent.parent / "platform" / "android"
+# In the tree, links to the files that ship.
+PLATFORM = Path(__file__).with_name("platform")
 INIT_FILE = "vx-kel-amt.rc"
 CONFIG_FILE = "vx-kel-amt.cfg"
 

@@ -12,6 +12,9 @@ from amt_simulator.errors import HandsetError
 from amt_simulator.tree import ROOT
 
 PROJECT = Path(__file__).resolve().parent.parent
+IS_TREE = (PROJECT / "CMakePresets.json").is_file()
+# Where the presets' builds lie: in an installation, what it was given when it was packaged.
+BUILDS = PROJECT / "build" if IS_TREE else Path(__file__).with_name("builds")
 DAEMON = "vx-kel-amt"
 PRELOAD = "libhandset-devices.so"
 LIBRARIES = {
@@ -20,6 +23,9 @@ LIBRARIES = {
     "audio.primary.tq5530.amt.so": "system/lib/hw",
 }
 PROGRAMS = ("amt-audio", "sync")
+# What of a build a handset needs, in the build's directory.
+PARTS = (f"bin/{DAEMON}", *(f"bin/{name}" for name in PROGRAMS),
+         *(f"lib/{name}" for name in LIBRARIES))
 # Init's modules, and the wire codec that its modem speaks; each in a package that is empty inside.
 MODULES = ("amt_simulator/inside", "amt_station/wire")
 COVERAGE = b".gcda\0"
@@ -59,7 +65,15 @@ class Program:
 
 def build_directory(build: "str | Path") -> Path:
     """The directory of a build: a preset's name, or a directory."""
-    return build if isinstance(build, Path) else PROJECT / "build" / build
+    return build if isinstance(build, Path) else BUILDS / build
+
+
+def _absent(path: Path, what: str) -> HandsetError:
+    """What is wrong where a file of a build is not there, and what to do."""
+    if IS_TREE:
+        return HandsetError(f"{path} is not there; ./dev build makes {what}")
+    return HandsetError(f"{path} is not there: the wheel for a platform and the Debian package "
+                        "bring the build release, and --build takes the directory of another")
 
 
 def find_program(build: "str | Path | None", daemon: Path | None) -> Program:
@@ -70,8 +84,7 @@ def find_program(build: "str | Path | None", daemon: Path | None) -> Program:
             raise HandsetError("neither a build nor a daemon was given")
         daemon = directory / "bin" / DAEMON
     if not daemon.is_file():
-        raise HandsetError(f"{daemon} is not there; ./dev build makes the build "
-                           f"{directory.name if directory else ''}".rstrip())
+        raise _absent(daemon, f"the build {directory.name if directory else ''}".rstrip())
     content = daemon.read_bytes()
     match = SANITIZER.search(content)
     return Program(daemon, directory, {b"a": "asan", b"t": "tsan"}[match[1]] if match else "",
@@ -82,7 +95,7 @@ def _part(build: Path, place: str, name: str) -> Path:
     """A file that belongs to the daemon of a build."""
     path = build / place / name
     if not path.is_file():
-        raise HandsetError(f"{path} is not there; ./dev build makes all of the build {build.name}")
+        raise _absent(path, f"all of the build {build.name}")
     return path
 
 

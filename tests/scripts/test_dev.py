@@ -10,8 +10,8 @@ import pytest
 
 from conftest import Copy
 
-COMMANDS = ("demo", "line", "test", "build", "handset", "station", "manual", "bench", "fuzz",
-            "coverage", "soak", "cross", "lint", "setup")
+COMMANDS = ("demo", "line", "test", "build", "handset", "station", "manual", "package", "bench",
+            "fuzz", "coverage", "soak", "cross", "lint", "setup")
 SECONDS = 120
 
 

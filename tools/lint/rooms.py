@@ -47,7 +47,7 @@ PYTHON_FLOORS: Floors = (
     # A handset for other people's tests, simulated when none is named.
     ("amt_station/pytest_plugin",),
     # What starts everything.
-    ("amt_station/__main__", "tools", "amt", "platform"),
+    ("amt_station/__main__", "tools", "amt", "platform", "packaging"),
     ("tests",),
 )
 
