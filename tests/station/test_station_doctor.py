@@ -232,6 +232,17 @@ def test_settings_that_somebody_changes(fake: FakeComputer, peer: Peer) -> None:
                           "baud")
 
 
+def test_a_speed_that_cannot_be_compared(fake: FakeComputer, peer: Peer) -> None:
+    made = visit(peer.path, fake)
+    made.baud = 1234567
+    rows = [Check(row.name, row.target) for row in checks.CHECKS if row.name in ("port",
+                                                                              "line settings")]
+    findings = [finding for name, finding in examine(made, rows) if name == "line settings"]
+    made.close()
+    assert [finding.level for finding in findings] == [Level.OK, Level.UNCHECKED]
+    assert "1234567 baud" in findings[1].text and "baud" not in findings[0].text
+
+
 def test_every_setting_is_looked_at() -> None:
     import termios
 
