@@ -235,8 +235,8 @@ def test_settings_that_somebody_changes(fake: FakeComputer, peer: Peer) -> None:
 def test_a_speed_that_cannot_be_compared(fake: FakeComputer, peer: Peer) -> None:
     made = visit(peer.path, fake)
     made.baud = 1234567
-    rows = [Check(row.name, row.target) for row in checks.CHECKS if row.name in ("port",
-                                                                              "line settings")]
+    names = ("port", "line settings")
+    rows = [Check(row.name, row.target) for row in checks.CHECKS if row.name in names]
     findings = [finding for name, finding in examine(made, rows) if name == "line settings"]
     made.close()
     assert [finding.level for finding in findings] == [Level.OK, Level.UNCHECKED]
