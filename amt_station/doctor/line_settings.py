@@ -8,7 +8,7 @@ from dataclasses import dataclass
 from typing import Any, Sequence
 
 from amt_station.doctor.examination import Examination
-from amt_station.doctor.finding import Finding, error, ok
+from amt_station.doctor.finding import Finding, error, ok, unchecked
 from amt_station.errors import EXIT_BAD_FRAME
 
 _INPUT, _OUTPUT, _CONTROL, _LOCAL, _IN_SPEED, _OUT_SPEED = range(6)
@@ -51,11 +51,20 @@ def settings(visit: Examination) -> Sequence[Finding]:
         return [error(f"{visit.device} has no line settings: {problem.args[-1]}",
                       "it is no serial port: name another", EXIT_BAD_FRAME)]
     found = wrong(attributes, visit.baud)
+    if not found and _speed(visit.baud) is None:
+        return [ok("8 data bits, no parity, 1 stop bit, no flow control"),
+                unchecked(f"whether {visit.baud} baud were taken cannot be asked for here: it is "
+                          "none of the usual speeds")]
     if not found:
         return [ok(f"{visit.baud} baud, 8 data bits, no parity, 1 stop bit, no flow control")]
     return [error("; ".join(found), "another program or the driver changes them while the station "
                   f"has the port: end that program; `stty -a -F {visit.device}` shows all",
                   EXIT_BAD_FRAME)]
+
+
+def _speed(baud: int) -> int | None:
+    """What terminals call a speed; None for one that they have no name for."""
+    return getattr(termios, f"B{baud}", None)
 
 
 def _attributes(device: str) -> list[Any]:
@@ -70,7 +79,7 @@ def wrong(attributes: Sequence[Any], baud: int) -> list[str]:
     """What is not as the station wants it, of what ``tcgetattr`` gives."""
     found = [setting.wrong for setting in _SETTINGS
              if attributes[setting.word] & setting.bits != setting.wanted]
-    speed = getattr(termios, f"B{baud}", None)
+    speed = _speed(baud)
     if speed is not None and {attributes[_IN_SPEED], attributes[_OUT_SPEED]} != {speed}:
         found.append(f"the speed is not {baud} baud")
     return found

@@ -17,7 +17,7 @@ from amt_station.doctor.finding import Finding
 from amt_station.port import FdPort, Port, SerialPort
 from amt_station.requests.model import Channel
 
-# What never comes is waited for so long.
+# What never comes is waited for so long. Nothing that is looked at may hang on it.
 SHORT = 0.3
 
 
@@ -86,9 +86,9 @@ class FakeComputer:
 
 def visit(url: str, fake: FakeComputer, channel: Channel = Channel.PC,
           open_port: Callable[[str], Port] = SerialPort,
-          records: Path | None = None) -> Examination:
+          records: Path | None = None, timeout: float = SHORT) -> Examination:
     """A visit to a port of this PC that does not wait long."""
-    return Examination(lambda: url, open_port, channel, timeout=SHORT, records=records,
+    return Examination(lambda: url, open_port, channel, timeout=timeout, records=records,
                        computer=fake.computer)
 
 

@@ -28,6 +28,8 @@ from amt_station.link import Link
 from amt_station.udev import rule
 
 OK = "\r\nOK\r\n"
+# An answer that is there is not waited for.
+PATIENT = ("--timeout", str(PATIENCE))
 
 
 @pytest.fixture
@@ -230,6 +232,17 @@ def test_settings_that_somebody_changes(fake: FakeComputer, peer: Peer) -> None:
                           "baud")
 
 
+def test_a_speed_that_cannot_be_compared(fake: FakeComputer, peer: Peer) -> None:
+    made = visit(peer.path, fake)
+    made.baud = 1234567
+    names = ("port", "line settings")
+    rows = [Check(row.name, row.target) for row in checks.CHECKS if row.name in names]
+    findings = [finding for name, finding in examine(made, rows) if name == "line settings"]
+    made.close()
+    assert [finding.level for finding in findings] == [Level.OK, Level.UNCHECKED]
+    assert "1234567 baud" in findings[1].text and "baud" not in findings[0].text
+
+
 def test_every_setting_is_looked_at() -> None:
     import termios
 
@@ -360,7 +373,7 @@ def test_all_is_well(peer: Peer, tmp_path: Path, fake: FakeComputer,
                      capsys: pytest.CaptureFixture[str]) -> None:
     peer.script = replying(OK)
     fake.install(monkeypatch, tmp_path)
-    assert main.run(["-p", peer.path, "doctor"]) == 0
+    assert main.run(["-p", peer.path, "doctor", *PATIENT]) == 0
     said = capsys.readouterr()
     lines = said.out.splitlines()
     assert [line.split()[0] for line in lines] == ["ok"] * len(checks.CHECKS)
@@ -374,11 +387,11 @@ def test_one_line_each_and_json(peer: Peer, tmp_path: Path, fake: FakeComputer,
     peer.script = replying("\r\nERROR\r\n")
     fake.set(clock_is_kept=lambda: False)
     fake.install(monkeypatch, tmp_path)
-    assert main.run(["-p", peer.path, "doctor"]) == 1
+    assert main.run(["-p", peer.path, "doctor", *PATIENT]) == 1
     said = capsys.readouterr()
     assert len(said.out.splitlines()) == len(checks.CHECKS)
     assert said.err == "1 error, 2 not checked, 1 warning\n"
-    assert main.run(["-p", peer.path, "doctor", "--json"]) == 1
+    assert main.run(["-p", peer.path, "doctor", "--json", *PATIENT]) == 1
     told = json.loads(capsys.readouterr().out)
     assert (told["ok"], told["exit_status"], told["port"], told["channel"]) == (
         False, 1, peer.path, "pc")
@@ -408,7 +421,7 @@ def test_the_rule_file_is_printed(run_station: Run) -> None:
 def test_a_traced_visit(peer: Peer, tmp_path: Path, run_station: Run) -> None:
     peer.script = replying(OK)
     trace = tmp_path / "visit.trace"
-    result = run_station("-p", peer.path, "--trace", str(trace), "doctor",
+    result = run_station("-p", peer.path, "--trace", str(trace), "doctor", *PATIENT,
                          XDG_STATE_HOME=str(tmp_path))
     assert result.returncode in (0, 8), result.stdout
     assert r'station says  "AT^DBTADDR=?\r"' in trace.read_text(encoding="utf-8")
@@ -429,7 +442,7 @@ def test_a_real_holder_is_named(peer: Peer, run_station: Run, tmp_path: Path) ->
 
 def test_a_url_that_opens_a_device_somehow(fake: FakeComputer, peer: Peer) -> None:
     peer.script = replying(OK)
-    findings = examined(f"spy://{peer.path}?file=/dev/null", fake)
+    findings = examined(f"spy://{peer.path}?file=/dev/null", fake, timeout=PATIENCE)
     assert one(findings, "port").level is Level.WARNING
     assert "is not looked at" in one(findings, "port").text
     assert one(findings, "answer").level is Level.OK

@@ -2,47 +2,83 @@
 
 from __future__ import annotations
 
-import os
-from pathlib import Path
+import time
 from typing import Sequence
 
 import pytest
-from doctor_visit import FakeComputer, examined
-from station_peer import Peer, Script, error_packet, ok, replying, sequence
+from station_peer import Script, error_packet, ok, replying, sequence
 
-from amt_station.doctor.finding import Finding, Level, exit_status
+from amt_station.doctor.checks import CHECKS, examine
+from amt_station.doctor.examination import Examination
+from amt_station.doctor.finding import Level, exit_status
 from amt_station.errors import NoPort
-from amt_station.port import FdPort
+from amt_station.port import Port
 from amt_station.requests.model import Channel
 from amt_station.wire.atoms import Atom
-from amt_station.wire.decoder import Frame, Item, Text
+from amt_station.wire.decoder import (BareDecoder, Decoder, EnvelopeDecoder, Frame, Item, Text)
 from amt_station.wire.envelope import encode_envelope
 from amt_station.wire.packet import Packet
 
+CONCERNED = ("answer", "mode", "request buffer")
+SECONDS = 1.0
 QUESTION = b"AT^DBTADDR=?\r"
 OK = "\r\nOK\r\n"
 
 
-@pytest.fixture
-def fake(tmp_path: Path) -> FakeComputer:
-    """A PC on which all is well."""
-    return FakeComputer(tmp_path / "pc")
+class Wire:
+    """A port at which the answer is there as soon as the question is written: no thread is waited
+    for, so that how long the deadline is makes no difference."""
+
+    name = "wire"
+
+    def __init__(self, script: Script, decoder: Decoder) -> None:
+        self.said = b""
+        self._script = script
+        self._decoder = decoder
+        self._coming = b""
+
+    def read(self, timeout: float) -> bytes:
+        """As in ``Port``."""
+        if not self._coming:
+            time.sleep(timeout)
+        came, self._coming = self._coming, b""
+        return came
+
+    def write(self, data: bytes, timeout: float) -> None:
+        """As in ``Port``."""
+        self.said += data
+        for item in self._decoder.feed(data):
+            self._coming += b"".join(self._script(item))
+
+    def close(self) -> None:
+        """As in ``Port``."""
 
 
 class Found:
     """What the three checks of the handset have found."""
 
-    def __init__(self, findings: Sequence[tuple[str, Finding]]) -> None:
+    def __init__(self, port: Port, channel: Channel = Channel.PC) -> None:
+        visit = Examination(lambda: "wire", lambda url: port, channel, timeout=SECONDS)
+        findings = list(examine(visit, [check for check in CHECKS if check.name in CONCERNED]))
         by_name = dict(findings)
         assert len(by_name) == len(findings)
-        self.answer, self.mode = by_name["answer"], by_name["mode"]
-        self.buffer = by_name["request buffer"]
+        self.answer, self.mode, self.buffer = (by_name[name] for name in CONCERNED)
         self.status = exit_status([finding for _, finding in findings])
 
     @property
     def levels(self) -> list[Level]:
         """How bad they are."""
         return [self.answer.level, self.mode.level, self.buffer.level]
+
+
+def pc(script: Script) -> Wire:
+    """A handset at the PC line."""
+    return Wire(script, EnvelopeDecoder())
+
+
+def app(script: Script) -> Wire:
+    """A handset at the app channel."""
+    return Wire(script, BareDecoder())
 
 
 def always(*answers: bytes) -> Script:
@@ -63,23 +99,22 @@ GOOD = [Level.OK, Level.OK, Level.OK]
 SILENT = [Level.ERROR, Level.UNCHECKED, Level.UNCHECKED]
 
 
-def test_a_healthy_handset_is_asked_once(peer: Peer, fake: FakeComputer) -> None:
-    peer.script = replying(OK)
-    found = Found(examined(peer.path, fake))
+def test_a_healthy_handset_is_asked_once() -> None:
+    handset = pc(replying(OK))
+    found = Found(handset)
     assert (found.levels, found.status) == (GOOD, 0)
-    assert peer.raw == QUESTION
+    assert handset.said == QUESTION
 
 
-def test_a_healthy_app_channel(app_peer: Peer, fake: FakeComputer) -> None:
-    app_peer.script = refusing
-    found = Found(examined(app_peer.path, fake, channel=Channel.APP))
+def test_a_healthy_app_channel() -> None:
+    found = Found(app(refusing), Channel.APP)
     assert (found.levels, found.status) == (GOOD, 0)
 
 
-def test_nobody_answers(peer: Peer, fake: FakeComputer) -> None:
-    found = Found(examined(peer.path, fake))
+def test_nobody_answers() -> None:
+    found = Found(pc(always()))
     assert (found.levels, found.status) == (SILENT, 5)
-    assert found.answer.text == "nothing comes back within 0.3 s"
+    assert found.answer.text == f"nothing comes back within {SECONDS:g} s"
     assert "switch the handset on" in found.answer.advice
 
 
@@ -94,10 +129,9 @@ def test_nobody_answers(peer: Peer, fake: FakeComputer) -> None:
     (b"\r\nhandset login: ", "something else than a handset's test service answers: "
      "handset login: came", "name another port", 5),
 ])
-def test_something_else_answers(answer: bytes, text: str, advice: str, status: int, peer: Peer,
-                                fake: FakeComputer) -> None:
-    peer.script = always(answer)
-    found = Found(examined(peer.path, fake))
+def test_something_else_answers(answer: bytes, text: str, advice: str, status: int
+                                ) -> None:
+    found = Found(pc(always(answer)))
     assert (found.levels, found.status) == (SILENT, status)
     assert found.answer.text.startswith(text) and advice in found.answer.advice
 
@@ -117,61 +151,51 @@ class Flood:
         pass
 
 
-def test_a_line_that_never_falls_silent(fake: FakeComputer, peer: Peer) -> None:
-    found = Found(examined(peer.path, fake, open_port=lambda url: Flood()))
-    assert (found.levels, found.answer.status) == (SILENT, 6)
+def test_a_line_that_never_falls_silent() -> None:
+    found = Found(Flood())
+    assert (found.levels, found.status) == (SILENT, 6)
     assert "garbage" in found.answer.text
 
 
-class Gone(FdPort):
-    """A port whose handset goes when it is asked."""
+def test_a_handset_that_goes() -> None:
+    def go(item: Item) -> Sequence[bytes]:
+        raise NoPort("port wire went away: I/O error")
 
-    def read(self, timeout: float) -> bytes:
-        if timeout:
-            raise NoPort(f"port {self.name} went away: I/O error")
-        return b""
-
-
-def test_a_handset_that_goes(fake: FakeComputer, peer: Peer) -> None:
-    found = Found(examined(peer.path, fake, open_port=lambda url: Gone(os.dup(peer.slave), url)))
-    assert (found.levels, found.answer.status) == (SILENT, 3)
+    found = Found(pc(go))
+    assert (found.levels, found.status) == (SILENT, 3)
     assert "went away" in found.answer.text and "cable" in found.answer.advice
 
 
-def test_the_app_channel_where_the_pc_line_was_named(app_peer: Peer, fake: FakeComputer) -> None:
-    app_peer.script = refusing
-    found = Found(examined(app_peer.path, fake))
+def test_the_app_channel_where_the_pc_line_was_named() -> None:
+    found = Found(app(refusing))
     assert found.levels == [Level.OK, Level.ERROR, Level.UNCHECKED] and found.status == 5
     assert found.mode.text == "it serves the app channel here, not the PC line"
     assert "--app mode enter" in found.mode.advice
 
 
-def test_the_pc_line_where_the_app_channel_was_named(peer: Peer, fake: FakeComputer) -> None:
+def test_the_pc_line_where_the_app_channel_was_named() -> None:
     # The packet without an envelope goes to the modem, which does not know it.
-    peer.script = lambda item: (OK.encode(),) if item.raw.endswith(QUESTION) else ()
-    found = Found(examined(peer.path, fake, channel=Channel.APP))
+    found = Found(pc(lambda item: (OK.encode(),) if item.raw.endswith(QUESTION) else ()),
+                  Channel.APP)
     assert found.levels == [Level.OK, Level.ERROR, Level.UNCHECKED] and found.status == 5
     assert found.mode.text == "it serves the PC line here, not the app channel"
     assert "--pc" in found.mode.advice
 
 
-def test_an_envelope_where_the_app_channel_was_named(peer: Peer, fake: FakeComputer) -> None:
-    peer.script = lambda item: (OK.encode(),) if isinstance(item, Text) and item.raw.endswith(
-        QUESTION) else (encode_envelope(Packet(46, (Atom.integer(1, 0),))),)
-    found = Found(examined(peer.path, fake, channel=Channel.APP))
+def test_an_envelope_where_the_app_channel_was_named() -> None:
+    found = Found(pc(lambda item: (OK.encode(),) if isinstance(item, Text) and item.raw.endswith(
+        QUESTION) else (encode_envelope(Packet(46, (Atom.integer(1, 0),))),)), Channel.APP)
     assert found.levels == [Level.OK, Level.ERROR, Level.UNCHECKED] and found.status == 6
 
 
-def test_a_refused_packet_is_held(peer: Peer, fake: FakeComputer) -> None:
-    peer.script = always(error_packet(194))
-    found = Found(examined(peer.path, fake))
+def test_a_refused_packet_is_held() -> None:
+    found = Found(pc(always(error_packet(194))))
     assert found.levels == [Level.OK, Level.OK, Level.ERROR] and found.status == 1
     assert "the handset still holds the request AMT_BOARD_PCBA_CTRL_CMD" in found.buffer.text
     assert "unplug the USB cable" in found.buffer.advice
 
 
-def test_a_held_packet_is_carried_out_now(peer: Peer, fake: FakeComputer) -> None:
-    peer.script = sequence([ok(194, Atom.string(191, "PCBA-7"))], [OK.encode()])
-    found = Found(examined(peer.path, fake))
+def test_a_held_packet_is_carried_out_now() -> None:
+    found = Found(pc(sequence([ok(194, Atom.string(191, "PCBA-7"))], [OK.encode()])))
     assert found.levels == [Level.OK, Level.OK, Level.WARNING] and found.status == 8
     assert found.buffer.text.endswith("was asked before: AMT_BOARD_PCBA_CTRL_RSPCMD")

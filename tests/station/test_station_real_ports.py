@@ -93,7 +93,8 @@ def test_several_are_listed_and_told_apart(computer: Computer, peer: Peer,
 
 def test_the_doctor_finds_the_only_one(computer: Computer, peer: Peer, app_peer: Peer,
                                        tmp_path: Path) -> None:
-    own = ["--records", str(tmp_path), "--store", f"sqlite:///{tmp_path}/line.sqlite"]
+    own = ["--timeout", "60", "--records", str(tmp_path), "--store",
+           f"sqlite:///{tmp_path}/line.sqlite"]
     peer.script = replying(OK)
     computer.plug("ttyACM0", peer, "5510", "KEL1")
     told = json.loads(computer.station("doctor", "--json", *own).stdout)

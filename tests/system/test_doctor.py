@@ -13,6 +13,9 @@ from amt_simulator import Handset
 from conftest import HandsetFactory
 
 PROJECT = Path(__file__).resolve().parents[2]
+# For an answer, which is not waited for once it is there; for one that must not come, which is
+# waited for to the end, behind others that have to be there by then; and for none at all.
+PATIENCE, LONG, SHORT = 60, 20, 3
 
 
 class Station:
@@ -28,9 +31,10 @@ class Station:
         return subprocess.run([sys.executable, "-m", "amt_station", *arguments], cwd=PROJECT,
                               env=self._environment, capture_output=True, text=True, check=False)
 
-    def findings(self, *arguments: str) -> tuple[int, dict[str, dict[str, Any]]]:
+    def findings(self, *arguments: str,
+                 timeout: int = PATIENCE) -> tuple[int, dict[str, dict[str, Any]]]:
         """The exit status of the doctor, and what each check has found."""
-        result = self.run("--json", *arguments, "doctor")
+        result = self.run("--json", *arguments, "--timeout", str(timeout), "doctor")
         told = json.loads(result.stdout)
         assert told["exit_status"] == result.returncode
         return result.returncode, {row["check"]: row for row in told["findings"]}
@@ -61,7 +65,7 @@ def test_a_healthy_handset(make_handset: HandsetFactory, station: Station) -> No
 
 def test_a_handset_in_normal_mode(make_handset: HandsetFactory, station: Station) -> None:
     app = port(make_handset("packet", ports=True), "app")
-    status, found = station.findings("-p", app)
+    status, found = station.findings("-p", app, timeout=LONG)
     assert levels(found) == ["ok"] * 5 + ["error", "not checked"] and status == 5
     assert found["mode"]["text"] == "it serves the app channel here, not the PC line"
     status, found = station.findings("--app", "-p", app)
@@ -69,7 +73,8 @@ def test_a_handset_in_normal_mode(make_handset: HandsetFactory, station: Station
 
 
 def test_a_handset_in_the_test_mode(make_handset: HandsetFactory, station: Station) -> None:
-    status, found = station.findings("--app", "-p", port(make_handset("pc", ports=True), "pc"))
+    status, found = station.findings("--app", "-p", port(make_handset("pc", ports=True), "pc"),
+                                     timeout=LONG)
     assert levels(found) == ["ok"] * 5 + ["error", "not checked"] and status == 5
     assert found["mode"]["text"] == "it serves the PC line here, not the app channel"
 
@@ -98,6 +103,6 @@ def test_a_handset_that_stands_still(make_handset: HandsetFactory, station: Stat
     handset = make_handset("pc", ports=True)
     handset.set_restart(False)
     handset.stop()
-    status, found = station.findings("-p", port(handset, "pc"))
+    status, found = station.findings("-p", port(handset, "pc"), timeout=SHORT)
     assert levels(found) == ["ok"] * 4 + ["error"] + ["not checked"] * 2 and status == 5
     assert found["answer"]["text"] == "nothing comes back within 3 s"

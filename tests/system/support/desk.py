@@ -40,7 +40,9 @@ class Desk:
         self.environment = {
             name: value for name, value in os.environ.items()
             if not name.startswith(("AMT_STATION_", "XDG_", "PYTEST_", "NO_COLOR"))}
-        self.environment |= {"HOME": str(self.home), "PYTHONPATH": str(PROJECT),
+        # A busy machine needs longer for an answer than what waits for none by itself.
+        self.environment |= {"AMT_STATION_TIMEOUT": "60", "HOME": str(self.home),
+                             "PYTHONPATH": str(PROJECT),
                              "PATH": f"{programs}:{self.environment['PATH']}"}
         for name in ("PLAN", "end-of-line.toml"):
             self.write(name, PLAN)
