@@ -46,13 +46,13 @@ def unanswered(exchange: Exchange, limit: float) -> StationError:
     if exchange.answers:
         return NoAnswer(f"{name} was taken, but its outcome was not reported within {limit:g} s",
                         arrived)
-    wrong = _wrong_line(arrived, exchange.channel)
+    wrong = wrong_line(arrived, exchange.channel)
     if wrong:
         return BadFrame(f"no answer to {name} within {limit:g} s: {wrong}")
     if any(isinstance(item, Frame) and item.packet == exchange.request for item in arrived):
         return NoAnswer(f"no answer to {name} within {limit:g} s: the line sent the request "
                         "itself back, as an echo or a loop does", arrived)
-    damage = _first_damage(arrived)
+    damage = first_damage(arrived)
     if damage is not None:
         return BadFrame(f"the answer to {name} could not be read: {damage.error}", damage.error)
     other = instead(arrived)
@@ -65,10 +65,10 @@ def unanswered(exchange: Exchange, limit: float) -> StationError:
 def no_final_result(reply: AtReply, echoed: bool, limit: float) -> StationError:
     """The error for an AT text whose final result did not come within ``limit`` seconds."""
     arrived = [timed.item for timed in reply.transcript.items]
-    wrong = _wrong_line(arrived, Channel.PC)
+    wrong = wrong_line(arrived, Channel.PC)
     if wrong:
         return BadFrame(f"no final result for {printable(reply.sent)} within {limit:g} s: {wrong}")
-    damage = _first_damage(reply.stray)
+    damage = first_damage(reply.stray)
     if damage is not None:
         return BadFrame(f"the answer to {printable(reply.sent)} could not be read: {damage.error}",
                         damage.error)
@@ -82,13 +82,13 @@ def no_final_result(reply: AtReply, echoed: bool, limit: float) -> StationError:
 def no_place(transcript: Transcript, limit: float) -> str:
     """What to say when the link could not find its place."""
     items = [timed.item for timed in transcript.items]
-    wrong = _wrong_line(items, transcript.channel)
+    wrong = wrong_line(items, transcript.channel)
     other = f": {wrong}" if wrong else instead(items)
     return (f"the line is out of step and the handset did not answer {transcript.what} within "
             f"{limit:g} s{other}; nothing else was sent")
 
 
-def _wrong_line(items: Sequence[Item], channel: Channel) -> str:
+def wrong_line(items: Sequence[Item], channel: Channel) -> str:
     """That the answer came in the form of the other line; empty when it did not."""
     if channel is not Channel.PC:
         return ""
@@ -96,7 +96,7 @@ def _wrong_line(items: Sequence[Item], channel: Channel) -> str:
     unframed = b"".join(item.raw for item in items
                         if isinstance(item, (Skipped, Text)))[:_LOOKED_AT]
     packets = [item.packet for item in BareDecoder().feed(unframed) if isinstance(item, Frame)]
-    if not packets or _first_damage(items) is None or MAGIC in unframed:
+    if not packets or first_damage(items) is None or MAGIC in unframed:
         return ""
     return f"{_packet(packets[0])} came without an envelope; {_APP_CHANNEL}"
 
@@ -115,5 +115,6 @@ def _packet(packet: Packet) -> str:
     return f"packet {packet.command} ({display_name(packet.command)})"
 
 
-def _first_damage(items: Sequence[Item]) -> Skipped | None:
+def first_damage(items: Sequence[Item]) -> Skipped | None:
+    """The first bytes that were neither a frame nor text."""
     return next((item for item in items if isinstance(item, Skipped)), None)

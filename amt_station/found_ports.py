@@ -7,11 +7,14 @@ import re
 import time
 from dataclasses import dataclass
 from pathlib import Path
+from typing import Collection
 
 from amt_station.errors import NoPort, UsageProblem
 
 _VID_PID = re.compile(r"([0-9A-Fa-f]{4}):([0-9A-Fa-f]{4})", re.ASCII)
 _LOOK_SECONDS = 0.1
+PROC = Path("/proc")
+_PSEUDO_TERMINALS = "/dev/pts/"
 
 
 @dataclass(frozen=True)
@@ -43,6 +46,9 @@ class Holder:
     pid: int
     command: str
 
+    def __str__(self) -> str:
+        return f"{self.command} ({self.pid})"
+
 
 def found_ports() -> list[FoundPort]:
     """Every port that pySerial finds, by device name."""
@@ -53,18 +59,34 @@ def found_ports() -> list[FoundPort]:
                    for port in list_ports.comports()), key=lambda port: port.device)
 
 
-def holders(device: str) -> list[Holder]:
+def holders(device: str, proc: Path = PROC) -> list[Holder]:
     """The processes that have ``device`` open, of those that this user may look at."""
     path = os.path.realpath(device)
     try:
         node = os.stat(path)
     except OSError:
         return []
-    found = []
-    for process in Path("/proc").glob("[0-9]*"):
-        if int(process.name) != os.getpid() and _has_open(process, path, node):
-            found.append(Holder(int(process.name), _command(process)))
-    return sorted(found, key=lambda holder: holder.pid)
+    return [_holder(process) for process in _processes(proc)
+            if int(process.name) != os.getpid() and _has_open(process, path, node)]
+
+
+def is_pseudo_terminal(device: str) -> bool:
+    """Whether there is a program at the other end, which has the port open by right."""
+    return os.path.realpath(device).startswith(_PSEUDO_TERMINALS)
+
+
+def running(commands: Collection[str], proc: Path = PROC) -> list[Holder]:
+    """The processes that go by one of these names."""
+    return [_holder(process) for process in _processes(proc) if _command(process) in commands]
+
+
+def _processes(proc: Path) -> list[Path]:
+    """The directory of every process that is shown here, by number."""
+    return sorted(proc.glob("[0-9]*"), key=lambda process: int(process.name))
+
+
+def _holder(process: Path) -> Holder:
+    return Holder(int(process.name), _command(process))
 
 
 def _has_open(process: Path, path: str, node: os.stat_result) -> bool:

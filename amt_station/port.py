@@ -261,5 +261,5 @@ def _who_holds(url: str) -> str:
     """Who has the port open, as far as this user may know."""
     from amt_station.found_ports import holders
 
-    names = ", ".join(f"{holder.command} ({holder.pid})" for holder in holders(url))
+    names = ", ".join(map(str, holders(url)))
     return f"{names} has it open" if names else "somebody else has it open"

@@ -17,6 +17,11 @@ def state_directory() -> Path:
     return Path(base) / "amt-station"
 
 
+def records_directory() -> Path:
+    """Where the records of runs go unless something else is said."""
+    return state_directory() / "records"
+
+
 def write_defect(error: Exception) -> Path | None:
     """Keep the traceback of a defect; None when no place for it can be written."""
     text = "".join(traceback.format_exception(error))

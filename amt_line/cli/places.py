@@ -4,14 +4,10 @@ from __future__ import annotations
 
 import getpass
 import socket
-from pathlib import Path
 
-from amt_station.state import state_directory
+from amt_station.state import records_directory
 
-
-def records_directory() -> Path:
-    """Where records go unless something else is said."""
-    return state_directory() / "records"
+__all__ = ["operator_name", "records_directory", "station_name"]
 
 
 def station_name() -> str:

@@ -11,7 +11,7 @@ from amt_line.run.plug import Plug, Seen
 from amt_line.run.port import StoppablePort
 from amt_line.run.stop import Stop
 from amt_station.errors import PortBusy, Refused, StationError
-from amt_station.found_ports import holders
+from amt_station.found_ports import holders, is_pseudo_terminal
 from amt_station.link import Link
 from amt_station.port import Port
 from amt_station.requests.model import Channel
@@ -20,8 +20,6 @@ from amt_station.requests.model import Channel
 Tell = Callable[[bool, str], None]
 
 HELD_AGAIN_SECONDS = 0.5
-# At the other end of a terminal of this kind there is a program, which has it open by right.
-_PSEUDO_TERMINALS = "/dev/pts/"
 
 
 @dataclass(frozen=True)
@@ -155,6 +153,6 @@ class Presence:
 def _holders(url: str) -> str:
     """Who else reads what arrives at a port, although the port is not kept for them."""
     path = os.path.realpath(url)
-    if not os.path.exists(path) or path.startswith(_PSEUDO_TERMINALS):
+    if not os.path.exists(path) or is_pseudo_terminal(path):
         return ""
-    return ", ".join(f"{holder.command} ({holder.pid})" for holder in holders(path))
+    return ", ".join(map(str, holders(path)))

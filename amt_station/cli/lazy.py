@@ -25,6 +25,7 @@ COMMANDS: Mapping[str, Place] = {
     "at": Place("amt_station.cli.at:at", "Send an AT text and show its reply"),
     "commands": Place("amt_station.cli.commands:commands", "List requests and typed commands"),
     "check": Place("amt_line.cli.check:check", "Check a test plan; nothing is sent"),
+    "doctor": Place("amt_station.cli.doctor:doctor", "Look for what goes wrong on this PC"),
     "line": Place("amt_line.cli.line:line", "Carry out a plan with many handsets at once"),
     "ports": Place("amt_station.cli.ports:ports", "List the serial ports and who holds one"),
     "recover": Place("amt_station.cli.recover:recover", "Clear what the handset has refused"),

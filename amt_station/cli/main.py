@@ -21,8 +21,8 @@ from amt_station.errors import (EXIT_DEFECT, EXIT_PASS, Interrupted, Refused, St
 _PROGRAM = "amt-station"
 _COMPLETE = "_AMT_STATION_COMPLETE"
 _EPILOG = ("Exit status: 0 pass, 1 the handset said no, 2 usage (nothing was sent), 3 no port, "
-           "4 port busy, 5 no answer, 6 bad frame, 7 the station's own error, 130 interrupted, "
-           "143 terminated.")
+           "4 port busy, 5 no answer, 6 bad frame, 7 the station's own error, 8 a doubt (doctor), "
+           "130 interrupted, 143 terminated.")
 
 
 @click.command(cls=Root, epilog=_EPILOG, context_settings={"help_option_names": ["-h", "--help"]})

@@ -91,19 +91,27 @@ class Settings:
     @property
     def chosen_port(self) -> str:
         """Flag before environment; the port that is meant where its name is not given."""
+        return self.port_or("")
+
+    def port_or(self, default: str) -> str:
+        """As ``chosen_port``, with a default where nothing is said at all."""
         wanted = self.wanted
         if wanted is not None:
             return wanted.find().device
-        port = self.port or os.environ.get(PORT_VARIABLE)
+        port = self.port or os.environ.get(PORT_VARIABLE) or default
         if not port:
             raise NoPort(f"no port named; give --port or set {PORT_VARIABLE}")
         return self.wanted_port.find().device if port == AUTO else port
 
     def open_port(self) -> Port:
         """Open the port; one that came back under another name is found again."""
+        return self.open_named(self.chosen_port)
+
+    def open_named(self, url: str) -> Port:
+        """Open a port that has been chosen already."""
         from amt_station.port import SerialPort
 
-        port = SerialPort(self.chosen_port, self.baud or DEFAULT_BAUD)
+        port = SerialPort(url, self.baud or DEFAULT_BAUD)
         return port if self.trace is None else self._traced(port, self.trace)
 
     def _traced(self, port: Port, path: str) -> Port:

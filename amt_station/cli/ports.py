@@ -17,7 +17,7 @@ _LOOK_SECONDS = 0.1
 
 
 def _held_by(found: list[Holder]) -> str:
-    return ", ".join(f"{holder.command} ({holder.pid})" for holder in found)
+    return ", ".join(map(str, found))
 
 
 def _port_json(port: FoundPort, found: list[Holder]) -> dict[str, object]:

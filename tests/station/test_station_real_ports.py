@@ -89,3 +89,24 @@ def test_several_are_listed_and_told_apart(computer: Computer, peer: Peer,
     assert computer.station("--serial", "KEL2", "at", "AT").returncode == 0
     assert computer.station("--vid-pid", "1d6b:5510", "at", "AT").returncode == 0
     assert peer.raw == b"AT\r" * 2 and app_peer.raw == b""
+
+
+def test_the_doctor_finds_the_only_one(computer: Computer, peer: Peer, app_peer: Peer,
+                                       tmp_path: Path) -> None:
+    own = ["--records", str(tmp_path), "--store", f"sqlite:///{tmp_path}/line.sqlite"]
+    peer.script = replying(OK)
+    computer.plug("ttyACM0", peer, "5510", "KEL1")
+    told = json.loads(computer.station("doctor", "--json", *own).stdout)
+    found = {row["check"]: row for row in told["findings"]}
+    assert told["port"] == "/dev/ttyACM0"
+    assert found["port"]["text"].startswith(
+        "/dev/ttyACM0 is there (1d6b:5510, serial number KEL1, socket 1-0")
+    assert [found[name]["level"] for name in ("permission", "holder", "line settings", "answer",
+                                              "mode", "request buffer")] == ["ok"] * 6
+    computer.plug("ttyUSB3", app_peer, "5511", "KEL2")
+    several = computer.station("doctor", "--json", *own)
+    told = json.loads(several.stdout)
+    assert several.returncode == 8 and told["port"] is None
+    assert told["findings"][0]["level"] == "not checked"
+    assert "/dev/ttyACM0 (KEL1), /dev/ttyUSB3 (KEL2)" in told["findings"][0]["text"]
+    assert app_peer.raw == b""

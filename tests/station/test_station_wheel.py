@@ -66,7 +66,7 @@ def test_what_is_in_it(wheel: Path) -> None:
     assert {"amt_station/py.typed", "amt_station/protocol-prose.md"} <= names
     for package in PACKAGES:
         for path in (ROOT / package).rglob("*"):
-            if path.suffix in (".py", ".lua", ".toml"):
+            if path.suffix in (".py", ".lua", ".rules", ".toml"):
                 assert str(path.relative_to(ROOT)) in names
     assert not [name for name in names if name.startswith("tests/")]
 

@@ -16,7 +16,8 @@ FAKE_DAEMON = Path(__file__).with_name("support") / "fake_daemon.py"
 HANDSETS = pytest.StashKey[list[Handset]]()
 # A test that takes so long hangs, on however busy a machine.
 MOST_SECONDS = 900
-PC_SIDE = ("test_simulator_", "test_scenarios", "test_line_", "test_traces")
+PC_SIDE = ("test_doctor", "test_documents", "test_simulator_", "test_scenarios", "test_line_",
+           "test_traces")
 FAILED = pytest.StashKey[bool]()
 
 
