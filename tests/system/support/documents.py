@@ -19,7 +19,7 @@ DOCUMENTS = sorted(str(path.relative_to(PROJECT)) for path in (
 
 # What a line of commands begins with.
 PROGRAMS = ("./dev", "amt-station", "amt-handset", "ctest", "echo", "export", "g++", "python3",
-            "rsync", "sqlite3", "sudo", "wireshark", "tshark", "pip")
+            "rsync", "sed", "sqlite3", "sudo", "tar", "wireshark", "tshark", "pip")
 DEV = "./dev"
 OWN = ("amt-station", "amt-handset", DEV)
 LENT = {"station": "amt-station", "handset": "amt-handset"}

@@ -24,6 +24,7 @@ _NO_USB = "there is no handset on USB"
 _OTHERS = Row("is another program's business")
 _NO_SERVER = Row("there is no server of that name")
 _YOURS = Row("is about the reader's own files")
+_BUNDLE = Row("is for a bundle that a build has made; the tests of the packages type it")
 _FINDINGS = (0, 3, 8)
 
 UNTYPED: dict[str, Row] = {
@@ -34,6 +35,11 @@ UNTYPED: dict[str, Row] = {
     "./dev build": _LONG,
     "./dev build android": _LONG,
     "./dev build && ./dev test unit station": _LONG,
+    "./dev package bundle --build android": _LONG,
+    "tar -x --numeric-owner -f vx-kel-amt-1.1-handset-arm.tar.gz --strip-components=2 -C IMAGE "
+    "vx-kel-amt-1.1-handset-arm/root": _BUNDLE,
+    r"sed -n '/^#/!s/^[^ ]* [^ ]* \([^ ]*\) \//\1 /p' MANIFEST | (cd IMAGE && sha256sum -c)":
+        _BUNDLE,
     "./dev lint --since HEAD": _LONG,
     "ctest --test-dir build/release --output-on-failure -R at_exchange": Row(
         "needs a build of the unit tests"),
