@@ -6,12 +6,12 @@ import shutil
 from pathlib import Path
 
 import pytest
-from packages import PROJECT, BareRoot, package
+from packages import PROJECT, SECONDS, BareRoot, package
 
 from amt_simulator.program import PARTS
 from tools.package.fresh_root import differences, listing
 
-pytestmark = pytest.mark.xdist_group("package-debian")
+pytestmark = [pytest.mark.xdist_group("package-debian"), pytest.mark.timeout(2 * SECONDS)]
 
 # dpkg's own books, which remember a package that has gone.
 BOOKS = ("var/lib/dpkg", "var/log", "proc", "dev")

@@ -21,7 +21,7 @@ from tools.package import elf
 from tools.package.fresh_root import differences, listing
 from tools.package.handset_build import made as made_build
 
-pytestmark = pytest.mark.xdist_group("package-wheels")
+pytestmark = [pytest.mark.xdist_group("package-wheels"), pytest.mark.timeout(2 * SECONDS)]
 
 KINDS = ("wheel", "platform", "bundle")
 PROGRAMS = ("amt-station", "amt-handset")
