@@ -111,7 +111,6 @@ def test_every_line_is_a_rule() -> None:
         assert all(n < behind for n, line in enumerate(rules) if f'GOTO="{label}"' in line)
 
 
-
 def test_ids_narrow_it() -> None:
     narrow = rule("1D6B:5510")
     assert 'ATTRS{idVendor}=="1d6b", ATTRS{idProduct}=="5510"' in narrow
