@@ -12,6 +12,9 @@ from PIL import Image
 
 __all__ = ["browser", "started_browser"]
 
+# One worker has the browser: four of them would keep the machine busy with starting.
+pytestmark = pytest.mark.xdist_group("browser")
+
 HOSTILE = "<script>window.hacked=1</script><img src=x onerror=window.hacked=2>\u202eevil"
 SHOWN = HOSTILE.replace("\u202e", "\\u202e")
 VALUE = {"name": "adc", "value": 4050, "unit": "mV", "limits": {"min": 100, "max": 4000},
