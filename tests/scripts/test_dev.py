@@ -8,7 +8,7 @@ from pathlib import Path
 
 import pytest
 
-from conftest import Copy
+from dev_copy import Copy
 
 COMMANDS = ("demo", "line", "test", "build", "handset", "station", "manual", "package", "bench",
             "fuzz", "coverage", "soak", "cross", "lint", "setup")
