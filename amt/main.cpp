@@ -142,6 +142,8 @@ int start(int mode)
 /* Everything up to the running hub, on the starter. Returns when the hub runs. */
 void start_up()
 {
+    /* A shell command has SIGINT ignored: it must not begin before the main thread waits for its signals. */
+    amt_signal_settle();
     int exit_status = 0;
     if (!parse_options(g_argument_count, g_argument_ptr, &exit_status)) {
         _exit(exit_status);

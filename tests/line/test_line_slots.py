@@ -131,7 +131,7 @@ def test_a_port_that_somebody_else_holds(tmp_path: Path) -> None:
 
 
 def test_somebody_who_reads_along_is_named_too(tmp_path: Path, monkeypatch: Any) -> None:
-    monkeypatch.setattr("amt_line.run.presence._PSEUDO_TERMINALS", "/none")
+    monkeypatch.setattr("amt_station.found_ports._PSEUDO_TERMINALS", "/none")
     peer = Peer(EnvelopeDecoder())
     with subprocess.Popen([sys.executable, "-c", HOLD.replace("fcntl.flock(port, fcntl.LOCK_EX)",
                                                               ""), peer.path],
