@@ -148,7 +148,7 @@ def browser(started_browser: Browser) -> Iterator[Browser]:
     complaints = started_browser.complaints()
     # A page that nobody looks at any more would go on drawing, for as long as other tests run.
     started_browser.open("about:blank")
-    assert complaints == []
+    assert complaints == [], "\n".join(complaints)
 
 
 __all__ = ["DESKTOP", "TABLET", "UPRIGHT", "Browser", "Keys", "browser", "started_browser"]
