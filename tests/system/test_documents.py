@@ -136,7 +136,7 @@ def test_commands_within_sentences() -> None:
 
 
 def unknown_of(text: str, names: set[str]) -> list[str]:
-    """What no program knows of a command that may hold placeholders."""
+    """What no program knows of a command, whose values may be named in capitals."""
     program, *words = (word for word in text.replace("[--", "--").split() if word != "...")
     if not words:
         return []

@@ -57,7 +57,7 @@ class Desk:
         return self.home / ".local" / "state" / "amt-station"
 
     def meant(self, text: str) -> str:
-        """A command line with what its placeholders stand for."""
+        """A command line with a port, a database and files of this desk for those it names."""
         if re.search(r"PORT\b|/dev/tty(ACM|USB)0|\.\.\./pc", text):
             pc = self._find_port("pc")
             text = re.sub(r"(?<![A-Z_])PORT(?![A-Z_])|/dev/tty(ACM|USB)0|\.\.\./pc", pc, text)

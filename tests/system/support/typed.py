@@ -27,7 +27,7 @@ def parse(words: Sequence[str]) -> None:
 
 
 def unknown_words(words: Sequence[str]) -> list[str]:
-    """What a program does not know of words in which values may be placeholders.
+    """What a program does not know of a usage's words, where values are named in capitals.
 
     ``[--option VALUE]`` may be left out, ``--one|--other`` are options of which one is said.
     """
