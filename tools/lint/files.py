@@ -6,18 +6,18 @@ import subprocess
 from pathlib import Path
 from typing import Iterable, Sequence
 
+from tools import project
 from tools.project import PROJECT, die
 
 CPP_ROOMS = ("platform", "pub", "amt", "tests")
 
 
 def git(*words: str) -> str:
-    """What git says."""
-    ended = subprocess.run(["git", *words], cwd=PROJECT, check=False, capture_output=True,
-                           text=True)
-    if ended.returncode != 0:
-        die(f"git cannot tell which files there are: {ended.stderr.strip()}")
-    return ended.stdout
+    """What git says; without it there is nothing to look at."""
+    try:
+        return project.git(*words)
+    except project.GitFailed as failed:
+        die(f"git cannot tell which files there are: {failed}")
 
 
 def project_files(paths: Sequence[str] = ()) -> list[str]:

@@ -2,14 +2,13 @@
 
 import os
 import shutil
-import subprocess
 from functools import lru_cache
 from pathlib import Path
 from typing import Iterable, Sequence
 
 from amt_station import __version__
 from tools import children
-from tools.project import PROJECT
+from tools.project import PROJECT, GitFailed, git
 
 NAME, VERSION = "vx-kel-amt", __version__
 EPOCH = "SOURCE_DATE_EPOCH"
@@ -26,13 +25,9 @@ class PackageFailed(Exception):
 
 def _git(*words: str) -> str:
     try:
-        ended = subprocess.run(["git", *words], cwd=PROJECT, check=False, capture_output=True,
-                               text=True)
-    except OSError as error:
-        raise PackageFailed(f"git: {error.strerror}") from None
-    if ended.returncode != 0:
-        raise PackageFailed(f"git cannot tell what belongs to the project: {ended.stderr.strip()}")
-    return ended.stdout
+        return git(*words)
+    except GitFailed as failed:
+        raise PackageFailed(f"git cannot tell what belongs to the project: {failed}") from None
 
 
 @lru_cache(maxsize=1)
