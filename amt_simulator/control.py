@@ -39,6 +39,8 @@ class ProcessInfo:
     descriptors: dict[int, str]
     children: list[int]
     resident_kib: int
+    # Of these, the part that no file is behind: what the process has written and allocated.
+    anonymous_kib: int
     policy: int
 
 

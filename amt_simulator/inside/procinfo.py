@@ -8,9 +8,20 @@ def _read(path: str) -> str:
         return stream.read()
 
 
-def _status(pid: int) -> dict[str, str]:
-    pairs = (line.partition(":") for line in _read(f"/proc/{pid}/status").splitlines())
+def _pairs(path: str) -> dict[str, str]:
+    pairs = (line.partition(":") for line in _read(path).splitlines())
     return {key: value.strip() for key, _, value in pairs}
+
+
+def _memory(pid: int) -> dict[str, int]:
+    """What is resident, in KiB, page by page: the sums in `status` are each processor's own, and
+    lag behind. Of a process that has ended it is nothing."""
+    try:
+        pages = _pairs(f"/proc/{pid}/smaps_rollup")
+    except ProcessLookupError:
+        pages = {}
+    return {"resident_kib": int(pages.get("Rss", "0").split()[0]),
+            "anonymous_kib": int(pages.get("Anonymous", "0").split()[0])}
 
 
 def _links(directory: str) -> dict[str, str]:
@@ -44,16 +55,15 @@ def _threads(pid: int) -> tuple[dict[str, dict[str, str]], list[int]]:
 
 def describe(pid: int) -> dict[str, object]:
     """Threads, descriptors, children and memory of the process PID."""
-    status = _status(pid)
     threads, children = _threads(pid)
     return {
         "pid": pid,
         "command": _read(f"/proc/{pid}/cmdline").rstrip("\0").split("\0"),
-        "state": status["State"],
+        "state": _pairs(f"/proc/{pid}/status")["State"],
         "threads": threads,
         "descriptors": _links(f"/proc/{pid}/fd"),
         "children": children,
-        "resident_kib": int(status.get("VmRSS", "0 kB").split()[0]),
+        **_memory(pid),
         "policy": os.sched_getscheduler(pid),
     }
 

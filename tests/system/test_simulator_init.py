@@ -119,7 +119,8 @@ def test_a_look_at_the_daemon(fake: Handset) -> None:
     info = fake.inspect()
     assert info.threads[info.pid]["state"] in "SR"
     assert set(info.descriptors.values()) >= {"/dev/null", "/handset/stdout.txt"}
-    assert info.children == [] and info.resident_kib > 1000
+    assert info.children == []
+    assert info.resident_kib > 1000 and 0 < info.anonymous_kib < info.resident_kib
     assert fake.inspect(1).command[-4:-2] == ["-m", "amt_simulator.inside.supervisor"]
     fake.set_restart(False)
     fake.stop()
