@@ -54,6 +54,8 @@ SUITES = (
                           "--dist", "loadgroup")),
     system("system", "release", SYSTEM_WORKERS, PATIENCE),
     system("system-asan", "asan", SANITIZED_WORKERS, SANITIZED_PATIENCE, is_beside=True),
+    Suite("stateful", "asan", ("tests/stateful", "-n", "2"), SANITIZED_PATIENCE, HANDSET,
+          is_beside=True),
     system("system-tsan", "tsan", SANITIZED_WORKERS, SANITIZED_PATIENCE, is_beside=True),
     Suite("unit", "release"),
     Suite("soak", "release", ("tests/soak",), PATIENCE, HANDSET),

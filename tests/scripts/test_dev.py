@@ -11,7 +11,7 @@ import pytest
 from dev_copy import Copy
 
 COMMANDS = ("demo", "line", "test", "build", "handset", "station", "manual", "package", "bench",
-            "fuzz", "coverage", "soak", "cross", "lint", "setup")
+            "fuzz", "coverage", "soak", "stateful", "cross", "lint", "setup")
 SECONDS = 120
 
 

@@ -1,0 +1,1 @@
+"""Speaks on all lines of two handsets at once, and knows from a model what must be answered."""
