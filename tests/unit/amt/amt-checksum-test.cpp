@@ -1,5 +1,6 @@
 #include "amt/amt-packet.h"
 
+#include <algorithm>
 #include <gtest/gtest.h>
 #include <random>
 #include <stdio.h>
@@ -66,6 +67,79 @@ TEST(amt_checksum, agrees_with_the_definition_at_every_length)
             ASSERT_EQ(amt_checksum(area.data(), length), slow_checksum(data)) << length;
         }
         data.push_back(static_cast<uint8_t>(random()));
+    }
+}
+
+/* The table byte by byte: fast enough to try every length at every address. */
+class byte_by_byte_c {
+public:
+    byte_by_byte_c()
+    {
+        for (uint32_t i = 0; i < m_entry_list.size(); i++) {
+            m_entry_list[i] = slow_checksum({static_cast<uint8_t>(i)});
+        }
+    }
+
+    uint32_t checksum_of(const uint8_t *data, uint32_t length) const
+    {
+        uint32_t crc = 0;
+        for (uint32_t i = 0; i < length + 4; i++) {
+            crc = ((crc << 8) | (i < length ? data[i] : 0U)) ^ m_entry_list[crc >> 24];
+        }
+        return crc;
+    }
+
+private:
+    std::vector<uint32_t> m_entry_list = std::vector<uint32_t>(256);
+};
+
+std::vector<uint8_t> make_random(uint32_t seed, uint32_t size)
+{
+    std::mt19937 random(seed);
+    std::vector<uint8_t> data(size);
+    for (uint8_t &byte : data) {
+        byte = static_cast<uint8_t>(random());
+    }
+    return data;
+}
+
+TEST(amt_checksum, agrees_with_byte_by_byte_at_every_length_and_address)
+{
+    constexpr uint32_t MOST = 200;
+    constexpr uint32_t ADDRESSES = 17;
+    const byte_by_byte_c reference;
+    for (uint32_t seed = 0; seed < 5; seed++) {
+        const std::vector<uint8_t> data = make_random(seed, MOST + ADDRESSES);
+        for (uint32_t offset = 0; offset < ADDRESSES; offset++) {
+            const uint8_t *const from = data.data() + offset;
+            for (uint32_t length = 0; length <= MOST; length++) {
+                ASSERT_EQ(amt_checksum(from, length), reference.checksum_of(from, length))
+                    << "seed " << seed << ", offset " << offset << ", length " << length;
+            }
+        }
+    }
+}
+
+TEST(amt_checksum, agrees_with_byte_by_byte_up_to_the_largest_frame)
+{
+    const byte_by_byte_c reference;
+    const std::vector<uint8_t> data = make_random(11, 4200);
+    for (uint32_t length = 0; length <= data.size(); length++) {
+        ASSERT_EQ(amt_checksum(data.data(), length), reference.checksum_of(data.data(), length)) << length;
+    }
+}
+
+/* It is linear and takes no notice of zeros in front: so both halves of a split data's checksum add up. */
+TEST(amt_checksum, of_both_halves_adds_up_at_every_split)
+{
+    for (const uint32_t size : {1U, 7U, 8U, 9U, 64U, 257U, 1021U}) {
+        const std::vector<uint8_t> whole = make_random(size, size);
+        for (uint32_t split = 0; split <= size; split++) {
+            std::vector<uint8_t> head = whole;
+            std::fill(head.begin() + split, head.end(), uint8_t{0});
+            const std::vector<uint8_t> tail(whole.begin() + split, whole.end());
+            ASSERT_EQ(checksum_of(head) ^ checksum_of(tail), checksum_of(whole)) << size << " at " << split;
+        }
     }
 }
 
