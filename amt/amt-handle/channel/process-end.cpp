@@ -17,6 +17,10 @@ namespace {
 constexpr long WATCHDOG_US = 800000;
 
 std::atomic<pid_t> g_service_pid;
+
+/* Set in every child that has been forked, before fork returns there; everywhere when that cannot be had. */
+std::atomic<bool> g_may_be_child;
+
 std::atomic<pthread_t> g_ender;
 std::atomic<int> g_exit_status;
 std::atomic<int (*)()> g_shut_down;
@@ -52,6 +56,11 @@ void set_enders_mask()
     for (;;) {
         pause();
     }
+}
+
+void note_child()
+{
+    g_may_be_child = true;
 }
 
 } // namespace
@@ -112,10 +121,16 @@ void amt_process_end()
 void amt_service_process_mark()
 {
     g_service_pid = getpid();
+    g_may_be_child = pthread_atfork(nullptr, nullptr, note_child) != 0;
 }
 
 bool amt_service_process_is_own()
 {
     const pid_t service_pid = g_service_pid;
     return service_pid == 0 || service_pid == getpid();
+}
+
+bool amt_service_process_is_child()
+{
+    return g_may_be_child && !amt_service_process_is_own();
 }

@@ -45,7 +45,13 @@ bool amt_process_end_has_begun();
 void amt_service_process_mark();
 
 /*
- * Whether the caller runs in the service's own process. True as well when none has been marked. Cheap, and
- * callable from a signal handler.
+ * Whether the caller runs in the service's own process. True as well when none has been marked. Asks the
+ * kernel, so that a signal handler, too, may ask at any moment.
  */
 bool amt_service_process_is_own();
+
+/*
+ * The opposite, for who has come back from a request that may have forked: without a system call. Not for a
+ * signal handler, which may interrupt a child that does not know yet that it is one.
+ */
+bool amt_service_process_is_child();

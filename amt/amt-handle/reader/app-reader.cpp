@@ -71,7 +71,7 @@ void amt_handle_read_app_loop()
     amt_handle_clear_buf(&g_handle_context.m_rsp_app);
     pub_log_entry(g_amt_handle_log);
     while (read_and_serve()) {
-        if (!amt_service_process_is_own()) {
+        if (amt_service_process_is_child()) {
             _exit(0);
         }
     }

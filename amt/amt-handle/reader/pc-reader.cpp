@@ -69,7 +69,7 @@ void amt_handle_read_pc_loop()
     amt_handle_clear_buf(&g_handle_context.m_rsp_pc);
     pub_log_entry(g_amt_handle_log);
     while (amt_reader_is_pc_path_open() && read_and_serve()) {
-        if (!amt_service_process_is_own()) {
+        if (amt_service_process_is_child()) {
             _exit(0);
         }
     }

@@ -6,6 +6,7 @@
 #include <signal.h>
 #include <string.h>
 #include <sys/mman.h>
+#include <sys/wait.h>
 #include <unistd.h>
 
 #include <gtest/gtest.h>
@@ -206,6 +207,44 @@ TEST(process_end, knows_whether_it_has_begun)
 TEST(process_end, is_not_moved_by_signals)
 {
     EXPECT_EXIT(end_unmoved_by_signals(), testing::ExitedWithCode(6), "");
+}
+
+/* The exit status of a child that has made the check. */
+template <typename check_t> int try_in_child(check_t check)
+{
+    const pid_t pid = fork();
+    if (pid == 0) {
+        _exit(check() ? 0 : 1);
+    }
+    int status = -1;
+    EXPECT_EQ(waitpid(pid, &status, 0), pid);
+    return status;
+}
+
+TEST(service_process, that_was_never_marked_is_nobody_s_child)
+{
+    const auto check = [] {
+        return try_in_child([] { return amt_service_process_is_own() && !amt_service_process_is_child(); });
+    };
+    EXPECT_EQ(check(), 0);
+}
+
+[[noreturn]] void mark_and_fork()
+{
+    amt_service_process_mark();
+    if (!amt_service_process_is_own() || amt_service_process_is_child()) {
+        _exit(1);
+    }
+    const auto is_told_apart = [] { return amt_service_process_is_child() && !amt_service_process_is_own(); };
+    if (try_in_child([&] { return is_told_apart() && try_in_child(is_told_apart) == 0; }) != 0) {
+        _exit(2);
+    }
+    _exit(amt_service_process_is_own() && !amt_service_process_is_child() ? 0 : 3);
+}
+
+TEST(service_process, knows_its_children_from_itself)
+{
+    EXPECT_EXIT(mark_and_fork(), testing::ExitedWithCode(0), "");
 }
 
 TEST(shut_down, happens_once)
