@@ -16,6 +16,7 @@
 #include "amt/amt-log.h"
 #include "platform/include/cutils/properties.h"
 #include "pub/error.h"
+#include "pub/util/mutex.h"
 #include "pub/util/thread-end.h"
 
 namespace {
@@ -40,20 +41,17 @@ struct handshake_st
     amt_timer_st m_data_timer;
 };
 
-std::mutex g_mutex;
+pub_mutex_c g_mutex;
 handshake_st g_handshake; /* under g_mutex */
 
 std::atomic<bool> g_is_ac_power;     /* the start was refused because of AC power */
 std::atomic<bool> g_is_property_set; /* once a process */
 
-/*
- * The end may come by a fault on the very thread that holds the lock, and then goes on without. That thread may
- * not call try_lock, but POSIX lets it ask.
- */
+/* The end may come by a fault on the very thread that holds the lock, and then goes on without. */
 bool lock_for_the_end()
 {
     for (int i = 0; i < END_ATTEMPTS; i++) {
-        if (pthread_mutex_trylock(g_mutex.native_handle()) == 0) {
+        if (g_mutex.try_lock()) {
             return true;
         }
         pub_util_sleep_ms(1);
@@ -94,7 +92,7 @@ bool is_waiting_for_data()
 /* A timer that was deleted when its call was on the way already has not run out. */
 bool has_run_out(const amt_timer_st &timer)
 {
-    const std::lock_guard<std::mutex> lock(g_mutex);
+    const std::lock_guard<pub_mutex_c> lock(g_mutex);
     return is_armed(timer);
 }
 
@@ -173,7 +171,7 @@ void amt_set_handshake_property()
 
 bool is_ready()
 {
-    const std::lock_guard<std::mutex> lock(g_mutex);
+    const std::lock_guard<pub_mutex_c> lock(g_mutex);
     return g_handshake.m_is_ready;
 }
 
@@ -204,7 +202,7 @@ int amt_handshake_ask_permission()
     }
     PUB_LOG(g_amt_handle_log, "will treat handshake.");
     {
-        const std::lock_guard<std::mutex> lock(g_mutex);
+        const std::lock_guard<pub_mutex_c> lock(g_mutex);
         g_handshake.m_is_ready = false;
         g_handshake.m_is_done = false;
         g_handshake.m_is_over = false;
@@ -221,20 +219,20 @@ int amt_handshake_ask_permission()
 void amt_handshake_begin()
 {
     if (g_usb_activate != 0) {
-        const std::lock_guard<std::mutex> lock(g_mutex);
+        const std::lock_guard<pub_mutex_c> lock(g_mutex);
         arm(&g_handshake.m_link_timer, handle_link_time_out, LINK_SECONDS);
     }
 }
 
 void amt_handshake_link_up()
 {
-    const std::lock_guard<std::mutex> lock(g_mutex);
+    const std::lock_guard<pub_mutex_c> lock(g_mutex);
     set_ready();
 }
 
 void amt_handshake_link_down()
 {
-    const std::lock_guard<std::mutex> lock(g_mutex);
+    const std::lock_guard<pub_mutex_c> lock(g_mutex);
     g_handshake.m_is_ready = false;
 }
 
@@ -247,7 +245,7 @@ void amt_handshake_modem_data()
     if (!is_ready() && read_shown(text_a, USB_STATE_FILE) && strstr(text_a, "CONFIGURED") != nullptr) {
         amt_handshake_link_up();
     }
-    const std::lock_guard<std::mutex> lock(g_mutex);
+    const std::lock_guard<pub_mutex_c> lock(g_mutex);
     if (is_waiting_for_data() && !is_armed(g_handshake.m_data_timer)) {
         PUB_LOG(g_amt_handle_log, "will create timer.");
         arm(&g_handshake.m_data_timer, handle_data_time_out, DATA_SECONDS);
@@ -259,7 +257,7 @@ bool amt_handshake_pc_data()
     if (g_usb_activate == 0) {
         return false;
     }
-    const std::lock_guard<std::mutex> lock(g_mutex);
+    const std::lock_guard<pub_mutex_c> lock(g_mutex);
     if (!g_handshake.m_is_ready) {
         set_ready();
     }
@@ -287,7 +285,7 @@ void amt_handle_exit_by_handshake()
     amt_set_handshake_property();
     g_is_property_set = true;
     {
-        const std::lock_guard<std::mutex> lock(g_mutex);
+        const std::lock_guard<pub_mutex_c> lock(g_mutex);
         stop_timing();
     }
     kill(getpid(), SIGTERM);

@@ -39,6 +39,21 @@ def test_one_id_is_registered_twice(pc_handset: Handset) -> None:
     assert texts[place + 1] == "APP register command id: 219(0xdb) - AMT_DAMT1_CMD"
 
 
+# what is loaded
+
+
+def test_needs_no_library_but_the_platform_s_and_the_c_library(pc_handset: Handset) -> None:
+    if pc_handset.program.sanitizer or pc_handset.program.counts_coverage:
+        pytest.skip("what the daemon is instrumented with brings libraries of its own")
+    dynamic = subprocess.run(["readelf", "-d", str(pc_handset.program.daemon)], check=True,
+                             capture_output=True, text=True).stdout
+    needed = re.findall(r"\(NEEDED\).*\[(.*?)\]", dynamic)
+    platform = {"liblog.so", "libcutils.so", "libldt.so"}
+    # The loader itself is named where thread-local storage is used.
+    assert {name for name in needed if not name.startswith("ld-linux")} == {
+        *platform, "libz.so.1", "libc.so.6"}
+
+
 # folders
 
 

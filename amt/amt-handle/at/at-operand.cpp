@@ -34,7 +34,7 @@ int handle_amt_get_at_para(const char *prefix, char *out, uint32_t *length_ptr)
     if (end <= start) {
         return PUB_ERR_NONE;
     }
-    const std::string_view line = text.substr(start, end - start);
+    const std::string_view line{text.data() + start, end - start};
     const std::string_view parameter = line.substr(0, line.find_first_of(LINE_OR_TEXT_END));
     *length_ptr = static_cast<uint32_t>(parameter.copy(out, AMT_AT_PARA_SIZE));
     return PUB_ERR_NONE;

@@ -16,6 +16,7 @@
 #include "amt/amt-log.h"
 #include "amt/amt-packet.h"
 #include "pub/error.h"
+#include "pub/util/mutex.h"
 
 namespace {
 
@@ -43,7 +44,7 @@ struct pending_st
     char m_text_a[TEXT_SIZE];
 };
 
-std::mutex g_lock;
+pub_mutex_c g_lock;
 pending_st g_pending;
 
 /* One kind of identity: the AT text that writes it, what the log calls it, and its file on either channel. */
@@ -64,21 +65,21 @@ constexpr identity_st g_identity_a[] = {
 
 void set_pending(identity_en kind, const char *text)
 {
-    const std::lock_guard<std::mutex> guard(g_lock);
+    const std::lock_guard<pub_mutex_c> guard(g_lock);
     g_pending.m_kind = kind;
     snprintf(g_pending.m_text_a, TEXT_SIZE, "%.*s", static_cast<int>(TEXT_SIZE - 1), text);
 }
 
 void set_channel(int32_t channel)
 {
-    const std::lock_guard<std::mutex> guard(g_lock);
+    const std::lock_guard<pub_mutex_c> guard(g_lock);
     g_pending.m_channel = static_cast<uint8_t>(channel);
 }
 
 /* The pending write at this moment. */
 pending_st get_pending()
 {
-    const std::lock_guard<std::mutex> guard(g_lock);
+    const std::lock_guard<pub_mutex_c> guard(g_lock);
     return g_pending;
 }
 
@@ -188,7 +189,7 @@ int handle_amt_imei_and_sn_save_file(const identity_st &identity, const pending_
 /* The write is not pending any more, unless it has been replaced meanwhile. */
 void clear_pending(const pending_st &write)
 {
-    const std::lock_guard<std::mutex> guard(g_lock);
+    const std::lock_guard<pub_mutex_c> guard(g_lock);
     if (g_pending.m_kind == write.m_kind && strcmp(g_pending.m_text_a, write.m_text_a) == 0) {
         g_pending.m_kind = identity_en::NONE;
     }
@@ -198,7 +199,7 @@ void clear_pending(const pending_st &write)
 
 void amt_identity_reset()
 {
-    const std::lock_guard<std::mutex> guard(g_lock);
+    const std::lock_guard<pub_mutex_c> guard(g_lock);
     g_pending = {};
 }
 

@@ -39,12 +39,13 @@ std::string_view cut_hex_text(std::string_view value)
     while (start < value.size() && value[start] == ' ') {
         start++;
     }
-    const std::string_view mark = value.substr(start, 2);
+    const std::string_view text(value.data() + start, value.size() - start);
+    const std::string_view mark = text.substr(0, 2);
     if (mark == "0D" || mark == "0d") {
         start += mark.size();
     }
     const size_t end = find_end(value);
-    return end > start ? value.substr(start, end - start) : std::string_view();
+    return end > start ? std::string_view(value.data() + start, end - start) : std::string_view();
 }
 
 /* Packs each two digits into a byte; an odd last digit is dropped. Returns the number of bytes. */
