@@ -30,6 +30,15 @@ int fail_access(const char *call, const char *path, const pub_log_place_st &plac
     return AMT_RESULT_FILE_ERR_ACCESS;
 }
 
+/*
+ * Whether no file has the path. Of one that only cannot be looked at just now nothing is known: to make it anew would
+ * lose what it holds.
+ */
+bool is_missing(const char *path)
+{
+    return access(path, F_OK) != 0 && errno != EIO && errno != ENOMEM;
+}
+
 /* Seeks to an item. A negative index, before the start of any file, fails and leaves the file where it is. */
 int seek_item(const pub_file_st &file, int32_t index)
 {
@@ -65,7 +74,7 @@ int save_result(const char *path, int32_t count, int32_t index, int32_t verdict,
         return pub_log_fail({g_amt_handle_log, func}, AMT_RESULT_FILE_ERR_ACCESS,
                             "Save fail: Directory access deny\n");
     }
-    if (access(path, F_OK) != 0 && initTestFile(path, count) != PUB_ERR_NONE) {
+    if (is_missing(path) && initTestFile(path, count) != PUB_ERR_NONE) {
         return pub_log_fail({g_amt_handle_log, func}, AMT_RESULT_FILE_ERR_WRITE,
                             "Save fail: init result file error\n");
     }
@@ -91,6 +100,12 @@ int initTestFile(const char *path, int32_t count)
     }
     for (int32_t i = 0; i < count; i++) {
         fputs("0\n", file.m_stream_ptr);
+    }
+    if (fflush(file.m_stream_ptr) != 0 || ferror(file.m_stream_ptr) != 0) {
+        const int status = pub_log_error(g_amt_handle_log, AMT_RESULT_FILE_ERR_WRITE);
+        /* A part of a file would be taken for a whole one from then on. */
+        unlink(path);
+        return status;
     }
     return PUB_ERR_NONE;
 }
@@ -130,7 +145,7 @@ int readProductResult(int32_t index)
     if (access(FOLDER, R_OK) != 0) {
         return fail_access("access folder", FOLDER);
     }
-    if (access(AMT_PRODUCT_FILE, F_OK) != 0) {
+    if (is_missing(AMT_PRODUCT_FILE)) {
         log_failure("access file", AMT_PRODUCT_FILE);
         if (initTestFile(AMT_PRODUCT_FILE, AMT_PRODUCT_COUNT) != PUB_ERR_NONE) {
             return pub_log_fail(g_amt_handle_log, AMT_RESULT_FILE_ERR_WRITE,

@@ -21,7 +21,10 @@ constexpr int AMT_RESULT_FILE_ERR_ACCESS = -1; /* open, access, seek or read */
 constexpr int AMT_RESULT_FILE_ERR_WRITE = -2;  /* digit not written, or file not created */
 constexpr int AMT_RESULT_FILE_ERR_ITEM = -3;   /* index out of range, or update failed */
 
-/* Creates or truncates the file, with count (at most 36) items of "0". Returns 0 or -1. */
+/*
+ * Creates or truncates the file, with count (at most 36) items of "0". Returns 0, -1, or -2 when it could not be
+ * written whole: then there is no file.
+ */
 int initTestFile(const char *path, int32_t count);
 
 /* Overwrites one item in place: 1 pass, 2 fail, any other verdict becomes "0". Returns 0, -1 or -2. */

@@ -4,6 +4,7 @@
 
 #include <gtest/gtest.h>
 
+#include "tests/unit/amt/small-file.h"
 #include "tests/unit/support/log-capture.h"
 #include "tests/unit/support/temp-folder.h"
 
@@ -53,6 +54,17 @@ TEST_F(result_file, cannot_be_created_in_a_missing_folder)
     EXPECT_EQ(capture.texts().back(), expected);
     EXPECT_EQ(updateTestItem(path.c_str(), 0, 1), -1);
     EXPECT_EQ(capture.texts().back(), expected);
+}
+
+TEST_F(result_file, is_created_whole_or_not_at_all)
+{
+    const small_file_c small(10);
+    const log_capture_c capture;
+    EXPECT_EQ(initTestFile(m_path.c_str(), 20), -2);
+    EXPECT_EQ(capture.count_containing("FUNC-initTestFile(), error_code=-2"), 1);
+    EXPECT_EQ(read_whole_file(m_path), "(missing)");
+    EXPECT_EQ(initTestFile(m_path.c_str(), 5), 0);
+    EXPECT_EQ(read_whole_file(m_path), items("00000"));
 }
 
 TEST_F(result_file, is_updated_in_place)
