@@ -16,8 +16,8 @@ SANITIZED_WORKERS = 4 * CORES
 PATIENCE: Mapping[str, str] = {"HANDSET_TIME_SCALE": "6"}
 SANITIZED_PATIENCE: Mapping[str, str] = {"HANDSET_TIME_SCALE": "12"}
 
-# The part of a build that the simulated handset needs.
-HANDSET, ALL = "handset", "all"
+# The parts of a build that the simulated handset needs, and that together with failing calls.
+HANDSET, TORTURE, ALL = "handset", "torture", "all"
 
 
 @dataclass(frozen=True)
@@ -59,6 +59,7 @@ SUITES = (
     system("system-tsan", "tsan", SANITIZED_WORKERS, SANITIZED_PATIENCE, is_beside=True),
     Suite("unit", "release"),
     Suite("soak", "release", ("tests/soak",), PATIENCE, HANDSET),
+    Suite("torture", "release", ("tests/torture",), PATIENCE, TORTURE),
     Suite("fuzz", "fuzz", ("tests/fuzz", "-n", str(CORES))),
     Suite("unit-asan", "asan", is_extra=True),
     Suite("unit-tsan", "tsan", is_extra=True),

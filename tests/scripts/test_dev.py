@@ -11,7 +11,8 @@ import pytest
 from dev_copy import Copy
 
 COMMANDS = ("demo", "line", "test", "build", "handset", "station", "manual", "package", "bench",
-            "fuzz", "coverage", "soak", "stateful", "cross", "lint", "setup")
+            "fuzz", "coverage", "soak", "stateful", "torture", "cross",
+            "lint", "setup")
 SECONDS = 120
 
 
