@@ -108,6 +108,29 @@ def test_wifi_transmission(pc: PcChannel) -> None:
     trace.expect("WIFI-TX-start start. channel:6; power:15; rate:540(will multi 100)")
 
 
+def test_wifi_tests_log_their_starts_and_ends(pc: PcChannel) -> None:
+    pc.handset.answer("ldt_TxTest", "0", "3", "-4", "0")
+    pc.handset.answer("ldt_RxTest", "0", "6 70", "-7", "0 90")
+    trace = Trace(pc.handset)
+    for operands, answer in (("1,6,540,15", OK), ("0", ERROR), ("1,7,20,2", ERROR), ("0", OK)):
+        pc.at(f"AT^DWLTSD={operands}", answer)
+    for operands, answer in (("1,11,20", OK), ("0", ERROR), ("1,3,540", ERROR), ("0", OK)):
+        pc.at(f"AT^DWLTRD={operands}", answer)
+    assert [text for text in trace.texts() if text.startswith("WIFI-")] == [
+        "WIFI-TX-start start. channel:6; power:15; rate:540(will multi 100)",
+        "WIFI-TX-start end. return:0.",
+        "WIFI-TX-stop start. ", "WIFI-TX-stop end. return:3.",
+        "WIFI-TX-start start. channel:7; power:2; rate:20(will multi 100)",
+        "WIFI-TX-start end. return:-4.",
+        "WIFI-TX-stop start. ", "WIFI-TX-stop end. return:0.",
+        "WIFI-RX-start start. channel:11; rate:20(will multi 100)",
+        "WIFI-RX-start end. return:0.",
+        "WIFI-RX-stop start. channel:11", "WIFI-RX-stop end. return:6; cnt:70.",
+        "WIFI-RX-start start. channel:3; rate:540(will multi 100)",
+        "WIFI-RX-start end. return:-7.",
+        "WIFI-RX-stop start. channel:11", "WIFI-RX-stop end. return:0; cnt:90."]
+
+
 def test_wifi_transmission_takes_the_low_bits(pc: PcChannel) -> None:
     trace = Trace(pc.handset)
     pc.at("AT^DWLTSD=1,262,65537,40000", OK)

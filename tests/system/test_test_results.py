@@ -246,6 +246,13 @@ def test_final_ok_alone_keeps_the_station(desk: ModemDesk, said: bytes) -> None:
     assert desk.handset.read(AMT) == file_of(AMT_COUNT)
 
 
+@pytest.mark.parametrize("before", [b"x", b"\r\n", b"\r\n^DATOMW: 9,2,z\r\n", b"9,2,z\r"])
+def test_text_in_front_of_the_line_says_nothing(desk: ModemDesk, before: bytes) -> None:
+    trace = read_result(desk, 3, before + b"\r\n^DATOMR: 4,1,a\r\n", verdict_of(4, 1, "a"))
+    trace.expect("amt_modem_read_test_result head_ptr[\\r\\n^DATOMR: 4,1,a\\r\\n\\r\\nOK\\r\\n]")
+    assert desk.handset.read(AMT) == file_of(AMT_COUNT, i4=1)
+
+
 def test_first_line_counts(desk: ModemDesk) -> None:
     read_result(desk, 3, b"\r\n^DATOMR: 4,1,a\r\n\r\n^DATOMR: 5,2,b\r\n", verdict_of(4, 1, "a"))
     # The line ends where the final result begins.
