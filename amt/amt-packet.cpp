@@ -10,18 +10,38 @@ namespace {
 /* Distance from an atom's length field to its value. */
 constexpr uint32_t LENGTH_FIELD_SIZE = AMT_ATOM_HEADER_SIZE - AMT_ATOM_LENGTH_OFFSET;
 
-void append_atom(uint8_t *packet, uint8_t atom_id, uint8_t type, const void *value, size_t n)
+void put_length(uint8_t *packet, uint16_t total)
 {
-    if (n > AMT_PACKET_SIZE || !amt_packet_has_room(packet, static_cast<uint32_t>(n))) {
+    amt_put_u16_le(packet, total);
+    amt_put_u16_le(packet + AMT_PACKET_ATOM_LENGTH_OFFSET,
+                   static_cast<uint16_t>(total - AMT_PACKET_HEADER_SIZE));
+}
+
+bool fits(uint32_t total, size_t n)
+{
+    return n <= AMT_PACKET_SIZE && total + AMT_ATOM_HEADER_SIZE + n <= AMT_PACKET_SIZE;
+}
+
+/* Inlined where the size is known, the copy is a store. */
+inline void append_atom(uint8_t *packet, uint8_t atom_id, uint8_t type, const void *value, size_t n)
+{
+    const uint16_t total = amt_packet_get_length(packet);
+    if (packet == nullptr || !fits(total, n)) {
         return;
     }
-    uint8_t *atom = amt_packet_get_end(packet);
+    uint8_t *const atom = packet + total;
     atom[0] = AMT_ATOM_HEAD;
     atom[AMT_ATOM_ID_OFFSET] = atom_id;
     atom[AMT_ATOM_TYPE_OFFSET] = type;
     amt_put_u16_le(atom + AMT_ATOM_LENGTH_OFFSET, static_cast<uint16_t>(n));
     memcpy(atom + AMT_ATOM_HEADER_SIZE, value, n);
-    amt_packet_add_length(packet, static_cast<uint16_t>(AMT_ATOM_HEADER_SIZE + n));
+    put_length(packet, static_cast<uint16_t>(total + AMT_ATOM_HEADER_SIZE + n));
+}
+
+/* How much of the area lies behind a length field, its own bytes left out. */
+uint32_t get_room_behind(const uint8_t *packet, const uint8_t *length_field)
+{
+    return AMT_PACKET_SIZE - static_cast<uint32_t>(length_field + LENGTH_FIELD_SIZE - packet);
 }
 
 /* Copies the first n bytes of the value behind a length field; those behind the end of the area count as zero
@@ -29,10 +49,12 @@ void append_atom(uint8_t *packet, uint8_t atom_id, uint8_t type, const void *val
 void copy_value(uint8_t *dst, const uint8_t *packet, const uint8_t *length_field, uint32_t n)
 {
     const uint8_t *value = length_field + LENGTH_FIELD_SIZE;
-    const uint32_t inside = AMT_PACKET_SIZE - static_cast<uint32_t>(value - packet);
+    const uint32_t inside = get_room_behind(packet, length_field);
     const uint32_t copied = n < inside ? n : inside;
     memcpy(dst, value, copied);
-    memset(dst + copied, 0, n - copied);
+    if (copied < n) {
+        memset(dst + copied, 0, n - copied);
+    }
 }
 
 int32_t get_number(const uint8_t *packet, uint8_t atom_id, int32_t missing)
@@ -42,6 +64,9 @@ int32_t get_number(const uint8_t *packet, uint8_t atom_id, int32_t missing)
         return missing;
     }
     const uint32_t n = amt_get_u16_le(length_field);
+    if (n == AMT_ATOM_INT_SIZE && n <= get_room_behind(packet, length_field)) {
+        return static_cast<int32_t>(amt_get_u32_le(length_field + LENGTH_FIELD_SIZE));
+    }
     uint8_t number_a[AMT_ATOM_INT_SIZE];
     if (n > sizeof(number_a)) {
         abort();
@@ -91,17 +116,13 @@ uint16_t amt_packet_add_length(uint8_t *packet, uint16_t n)
     if (packet == nullptr) {
         return 0;
     }
-    const uint16_t total = static_cast<uint16_t>(amt_packet_get_length(packet) + n);
-    const uint16_t atom_length = static_cast<uint16_t>(total - AMT_PACKET_HEADER_SIZE);
-    amt_put_u16_le(packet, total);
-    amt_put_u16_le(packet + AMT_PACKET_ATOM_LENGTH_OFFSET, atom_length);
-    return atom_length;
+    put_length(packet, static_cast<uint16_t>(amt_packet_get_length(packet) + n));
+    return amt_get_u16_le(packet + AMT_PACKET_ATOM_LENGTH_OFFSET);
 }
 
 bool amt_packet_has_room(const uint8_t *packet, uint32_t n)
 {
-    return packet != nullptr && n <= AMT_PACKET_SIZE &&
-           amt_packet_get_length(packet) + AMT_ATOM_HEADER_SIZE + n <= AMT_PACKET_SIZE;
+    return packet != nullptr && fits(amt_packet_get_length(packet), n);
 }
 
 void amt_packet_add_int(uint8_t *packet, uint8_t atom_id, int32_t value)

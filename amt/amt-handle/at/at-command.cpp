@@ -16,6 +16,9 @@ struct at_command_st
     int (*m_handler)(const char *operands);
 };
 
+/* Every text below begins so. A request without it, a bulk of data for the modem, is searched once. */
+constexpr std::string_view TEXT_START = "AT^D";
+
 /* Looked for in this order, and the first found is served. A carriage return in a text must match. */
 constexpr at_command_st g_at_command_a[] = {
     {"AT^DBTADDR?\r", amt_at_read_bt_address},      {"AT^DBTADDR=?\r", amt_at_test_only},
@@ -29,6 +32,19 @@ constexpr at_command_st g_at_command_a[] = {
     {"AT^DBOOTDLFIN", amt_at_read_boot_dl_fin},     {"AT^DEMMCINFO?\r", amt_at_read_emmc_info},
 };
 
+constexpr bool begin_all_alike()
+{
+    for (const at_command_st &command : g_at_command_a) {
+        for (size_t i = 0; i < TEXT_START.size(); i++) {
+            if (command.m_text_ptr[i] != TEXT_START[i]) {
+                return false;
+            }
+        }
+    }
+    return true;
+}
+static_assert(begin_all_alike());
+
 } // namespace
 
 int handle_amt_pc_req_at()
@@ -37,6 +53,9 @@ int handle_amt_pc_req_at()
         return pub_log_error(g_amt_handle_log, PUB_ERR_PARAM);
     }
     const std::string_view request = amt_handle_get_text(g_handle_context.m_req);
+    if (request.find(TEXT_START) == std::string_view::npos) {
+        return amt_modem_write_request();
+    }
     for (const at_command_st &command : g_at_command_a) {
         const std::string_view text = command.m_text_ptr;
         const size_t found = request.find(text);

@@ -104,8 +104,8 @@ int amt_reply_check_modem(const pub_log_place_st &place)
 
 void amt_reply_start(amt_buf_st *rsp_ptr, uint8_t rsp_id)
 {
-    amt_handle_clear_buf(rsp_ptr);
-    amt_packet_init(rsp_ptr->m_buf_a, rsp_id);
+    rsp_ptr->m_buf_len = 0;
+    amt_packet_init(rsp_ptr->m_buf_a, rsp_id); /* clears the rest */
 }
 
 int amt_reply_finish(uint32_t channel, amt_buf_st *rsp_ptr)
