@@ -1,5 +1,6 @@
 #pragma once
 
+#include <signal.h>
 #include <stddef.h>
 #include <stdint.h>
 #include <stdio.h>
@@ -14,6 +15,11 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size);
 class fuzz_input_c {
 public:
     fuzz_input_c(const uint8_t *data, size_t size) : m_data_ptr(data), m_size(size) {}
+
+    bool is_empty() const
+    {
+        return m_size == 0;
+    }
 
     uint8_t take_u8()
     {
@@ -65,6 +71,6 @@ private:
     do {                                                                                                     \
         if (!(condition)) {                                                                                  \
             fprintf(stderr, "%s:%d: does not hold: %s\n", __FILE__, __LINE__, #condition);                   \
-            abort();                                                                                         \
+            raise(SIGABRT);                                                                                  \
         }                                                                                                    \
     } while (0)
