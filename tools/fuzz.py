@@ -1,22 +1,109 @@
-"""Every fuzz target for a while: `./dev fuzz [SECONDS]`."""
+"""Every fuzz target for a while, and the Python readers: `./dev fuzz [SECONDS]`."""
+
+from __future__ import annotations
 
 import argparse
-import sys
+import shutil
+from concurrent.futures import ThreadPoolExecutor
+from typing import Sequence
 
-from tools import children
+from tools import fuzz_properties, fuzz_targets
 from tools.build import build
-from tools.project import CORES
+from tools.fuzz_properties import Properties
+from tools.fuzz_targets import Figures
+from tools.project import CORES, PROJECT, note, say
+
+FOUND = PROJECT / "build" / "fuzz-found"
+SECONDS, NIGHTLY_HOURS = 60, 1.0
+HEAD = ("target", "executions", "a second", "edges", "new edges", "inputs taken")
+
+
+def run_target(name: str, seconds: int, is_grown: bool) -> Figures:
+    """Run a target, and let its corpus grow by what it has found."""
+    found = FOUND / name
+    shutil.rmtree(found, ignore_errors=True)
+    figures = fuzz_targets.run(name, seconds, found)
+    if is_grown and not figures.is_finding:
+        figures.grown = fuzz_targets.grow(name, found)
+    note(f"{name}: {'FINDING' if figures.is_finding else 'done'}")
+    return figures
+
+
+def table(rows: Sequence[Sequence[str]]) -> str:
+    """Columns of one width each, the first to the left."""
+    widths = [max(len(row[column]) for row in rows) for column in range(len(rows[0]))]
+    return "\n".join("  ".join([row[0].ljust(widths[0]), *(
+        cell.rjust(width) for cell, width in zip(row[1:], widths[1:]))]) for row in rows)
+
+
+def describe(runs: Sequence[Figures]) -> str:
+    """The table of all targets, and whether anything was found."""
+    rows = [HEAD, *((figures.name, f"{figures.executions:,}",
+                     f"{figures.executions / max(figures.seconds, 1e-9):,.0f}",
+                     str(figures.edges), str(figures.new_edges), str(figures.grown))
+                    for figures in runs)]
+    total = sum(figures.executions for figures in runs)
+    new = [figures.name for figures in runs if figures.new_edges > 0]
+    wrong = [figures.name for figures in runs if figures.is_finding]
+    return "\n".join([table(rows), "", f"{total:,} executions; new edges: "
+                      f"{', '.join(new) or 'none'}; findings: {', '.join(wrong) or 'none'}"])
+
+
+def describe_properties(properties: Properties) -> str:
+    """The line of the Python readers."""
+    held = "all held" if properties.status == fuzz_properties.PASSED else "NOT ALL HELD"
+    return (f"Python readers: {properties.examples:,} examples in {properties.rounds} rounds "
+            f"of {properties.seconds:.0f} s: {held}")
+
+
+def parse() -> argparse.Namespace:
+    """The options."""
+    parser = argparse.ArgumentParser(prog="./dev fuzz", description=__doc__)
+    parser.add_argument("seconds", nargs="?", type=int, metavar="SECONDS",
+                        help=f"for each target (default: {SECONDS})")
+    parser.add_argument("--nightly", nargs="?", type=float, const=NIGHTLY_HOURS, metavar="HOURS",
+                        help=f"so many hours for each target instead (default: {NIGHTLY_HOURS:g})")
+    parser.add_argument("-j", "--jobs", type=int, default=CORES, metavar="N",
+                        help="targets at once (default: %(default)s)")
+    parser.add_argument("--grow", action="store_true",
+                        help="take inputs that reach new edges into tests/fuzz/corpus")
+    parser.add_argument("--target", action="append", choices=fuzz_targets.names(),
+                        help="only this one, and no Python; may be given again")
+    options = parser.parse_args()
+    if options.nightly is not None and options.seconds is not None:
+        parser.error("SECONDS or --nightly, not both")
+    if options.nightly is not None:
+        options.seconds = round(options.nightly * 3600)
+    if options.seconds is None:
+        options.seconds = SECONDS
+    if options.seconds < 1:
+        parser.error("the seconds are a whole number above 0")
+    if options.jobs < 1:
+        parser.error("the jobs are a whole number above 0")
+    return options
 
 
 def main() -> int:
-    """Build the targets and run them; a finding fails its test."""
-    parser = argparse.ArgumentParser(prog="./dev fuzz", description=__doc__)
-    parser.add_argument("seconds", nargs="?", type=int, default=60, metavar="SECONDS",
-                        help="for each target (default: 60)")
-    seconds = parser.parse_args().seconds
-    if seconds < 1:
-        parser.error("the seconds are a whole number above 0")
+    """Build the targets and run them; a finding is shown, and ends with a status of its own."""
+    options = parse()
     build("fuzz")
-    return children.run(
-        [sys.executable, "-m", "pytest", "-q", "-s", "-p", "no:cacheprovider", "-n", str(CORES),
-         "tests/fuzz", f"--fuzz-seconds={seconds}"], children.show)
+    FOUND.mkdir(parents=True, exist_ok=True)
+    chosen = options.target or fuzz_targets.names()
+    say(f"{len(chosen)} targets, {options.seconds} s each, {options.jobs} at once")
+    pool = ThreadPoolExecutor(options.jobs)
+    try:
+        runs = list(pool.map(lambda name: run_target(name, options.seconds, options.grow), chosen))
+    finally:
+        # Interrupted, it must not wait for what it has begun.
+        pool.shutdown(wait=False, cancel_futures=True)
+    wrong = [figures for figures in runs if figures.is_finding]
+    for figures in wrong:
+        print(f"\n{figures.name}:\n{figures.report}\n(its input: {FOUND}/{figures.name}-*)")
+    print(describe(runs), flush=True)
+    if options.target:
+        return 1 if wrong else 0
+    properties = fuzz_properties.run(options.seconds, options.jobs)
+    if properties.status != fuzz_properties.PASSED:
+        print(properties.said.decode("utf-8", "replace"))
+    print(describe_properties(properties))
+    return 1 if wrong or properties.status != fuzz_properties.PASSED else 0

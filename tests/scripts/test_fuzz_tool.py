@@ -1,0 +1,123 @@
+"""./dev fuzz: its options, what it reads of the engine's words, its table, and the corpora."""
+
+from pathlib import Path
+from typing import Sequence
+
+import pytest
+
+from tools import fuzz, fuzz_properties, fuzz_targets
+from tools.fuzz_properties import Properties
+from tools.fuzz_targets import Figures
+from tools.project import PROJECT
+
+SAID = b"""INFO: seed corpus: files: 7
+#8\tINITED cov: 102 ft: 211 corp: 7/84b exec/s: 0 rss: 31Mb
+#4096\tpulse  cov: 104 ft: 213 corp: 7/84b lim: 4 exec/s: 2048 rss: 33Mb
+#12960\tDONE   cov: 105 ft: 313 corp: 43/624b lim: 80 exec/s: 1296 rss: 72Mb
+stat::number_of_executed_units: 12960
+stat::average_exec_per_sec:     1296
+stat::new_units_added:          56
+"""
+# In the engine's place: says what it says, and makes an input, or takes one.
+ENGINE = """#!/bin/sh
+case $1 in
+    -merge=1) cp "$4"/* "$3" ;;
+    *) echo input > "$6/one"; cat {said} ;;
+esac
+exit {status}
+"""
+
+
+def options(monkeypatch: pytest.MonkeyPatch, *words: str) -> dict[str, object]:
+    """What a command line asks for."""
+    monkeypatch.setattr("sys.argv", ["fuzz", *words])
+    return vars(fuzz.parse())
+
+
+def place_engine(monkeypatch: pytest.MonkeyPatch, folder: Path, status: int = 0) -> None:
+    """Targets that are one shell script."""
+    (folder / "said").write_bytes(SAID)
+    program = folder / "packet-fuzz"
+    program.write_text(ENGINE.format(said=folder / "said", status=status))
+    program.chmod(0o755)
+    monkeypatch.setattr(fuzz_targets, "PROGRAMS", folder)
+    monkeypatch.setattr(fuzz_targets, "CORPORA", folder / "corpus")
+    monkeypatch.setattr(fuzz, "FOUND", folder / "found")
+
+
+@pytest.mark.parametrize("words, seconds", [
+    ((), 60), (("5",), 5), (("--nightly",), 3600), (("--nightly", "0.5"), 1800)])
+def test_lengths(monkeypatch: pytest.MonkeyPatch, words: Sequence[str], seconds: int) -> None:
+    assert options(monkeypatch, *words)["seconds"] == seconds
+
+
+def test_other_options(monkeypatch: pytest.MonkeyPatch) -> None:
+    found = options(monkeypatch, "-j", "3", "--grow", "--target", "packet", "--target", "hub")
+    assert (found["jobs"], found["grow"], found["target"]) == (3, True, ["packet", "hub"])
+    assert options(monkeypatch)["grow"] is False
+
+
+@pytest.mark.parametrize("words", [
+    ("0",), ("x",), ("5", "--nightly"), ("-j", "0"), ("--nightly", "0"), ("--target", "none")])
+def test_nonsense_is_refused(monkeypatch: pytest.MonkeyPatch, words: Sequence[str]) -> None:
+    with pytest.raises(SystemExit) as ended:
+        options(monkeypatch, *words)
+    assert ended.value.code == 2
+
+
+def test_the_engines_words_are_read() -> None:
+    figures = fuzz_targets.read_figures("packet", SAID)
+    assert (figures.executions, figures.edges_before, figures.edges) == (12960, 102, 105)
+    assert figures.new_edges == 3 and not figures.is_finding
+
+
+def test_a_target_that_says_nothing_is_a_finding() -> None:
+    assert fuzz_targets.read_figures("packet", b"").is_finding
+    assert Figures("packet", status=77, executions=5).is_finding
+
+
+def test_a_corpus_grows_only_when_asked(monkeypatch: pytest.MonkeyPatch, tmp_path: Path) -> None:
+    place_engine(monkeypatch, tmp_path)
+    figures = fuzz.run_target("packet", 1, False)
+    assert (figures.executions, figures.grown, figures.is_finding) == (12960, 0, False)
+    assert not (tmp_path / "corpus").exists()
+    assert fuzz.run_target("packet", 1, True).grown == 1
+    assert (tmp_path / "corpus" / "packet" / "one").read_text() == "input\n"
+    assert fuzz.run_target("packet", 1, True).grown == 0
+
+
+def test_what_a_finding_needs_is_not_taken(monkeypatch: pytest.MonkeyPatch,
+                                           tmp_path: Path) -> None:
+    place_engine(monkeypatch, tmp_path, status=77)
+    figures = fuzz.run_target("packet", 1, True)
+    assert figures.is_finding and not (tmp_path / "corpus").exists()
+    assert "number_of_executed_units" in figures.report
+
+
+def test_the_table_and_its_last_line() -> None:
+    runs = [Figures("packet", 0, 10.0, 2_000_000, 100, 103, 2),
+            Figures("log", 0, 10.0, 50, 70, 70, 0)]
+    assert fuzz.describe(runs).splitlines() == [
+        "target  executions  a second  edges  new edges  inputs taken",
+        "packet   2,000,000   200,000    103          3             2",
+        "log             50         5     70          0             0", "",
+        "2,000,050 executions; new edges: packet; findings: none"]
+    runs[1].status = 1
+    assert fuzz.describe(runs[1:]).endswith("new edges: none; findings: log")
+
+
+def test_the_line_of_the_python_readers() -> None:
+    assert fuzz.describe_properties(Properties(3000, 2, 60.4)) == (
+        "Python readers: 3,000 examples in 2 rounds of 60 s: all held")
+    assert fuzz.describe_properties(Properties(1, 1, 1.0, 1)).endswith("NOT ALL HELD")
+
+
+def test_the_files_of_the_python_readers_are_there() -> None:
+    for name in fuzz_properties.FILES:
+        assert (PROJECT / name).is_file()
+
+
+def test_every_target_has_a_corpus() -> None:
+    for name in fuzz_targets.names():
+        inputs = list((fuzz_targets.CORPORA / name).iterdir())
+        assert inputs and all(path.stat().st_size <= 8192 for path in inputs), name
