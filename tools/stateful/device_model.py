@@ -154,9 +154,11 @@ def lcd_light(phone: Phone, packet: wire.Packet) -> Reply:
 def read_item(phone: Phone, packet: wire.Packet) -> Reply:
     """The item at the station's own number, one behind where a write puts it."""
     station = number(packet, 39)
-    if not 0 <= station < 36:
+    if station >= 36:
         return answer(229, result=10)
     items = phone.files.setdefault(handset.PRODUCT_RESULTS, "0\n" * 36)
+    if station < 0:
+        return answer(229, result=10)
     return answer(229, integer(39, station), integer(36, int(items[2 * station])))
 
 

@@ -84,11 +84,22 @@ def repeat(build: str, steps: Sequence[Step], patience: float | None = None) -> 
                len(steps) + 1, float("inf"), patience)
 
 
+def _last_steps(steps: Sequence[Step], is_failing: Callable[[Sequence[Step]], bool],
+                end: float) -> list[Step]:
+    """A few last steps if they fail by themselves: what went before seldom matters."""
+    count = 1
+    while count < len(steps) // 2 and time.monotonic() < end:
+        if is_failing(steps[-count:]):
+            return list(steps[-count:])
+        count *= 4
+    return list(steps)
+
+
 def shorten(steps: Sequence[Step], is_failing: Callable[[Sequence[Step]], bool],
             seconds: float) -> list[Step]:
     """The shortest list of steps that still fails, as far as SECONDS allow to look for it."""
     end = time.monotonic() + seconds
-    kept = list(steps)
+    kept = _last_steps(steps, is_failing, end)
     size = max(1, len(kept) // 2)
     while size >= 1 and time.monotonic() < end:
         start = len(kept)
