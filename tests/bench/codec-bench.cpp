@@ -1,3 +1,4 @@
+#include <algorithm>
 #include <benchmark/benchmark.h>
 #include <cbor.h>
 #include <msgpack.h>
@@ -149,7 +150,7 @@ public:
         m_length += keep(cbor_encode_uint8(key, g_area_a + m_length, room()));
         m_length += keep(cbor_encode_string_start(n, g_area_a + m_length, room()));
         if (keep(n <= room() ? 1 : 0) != 0) {
-            memcpy(g_area_a + m_length, text, n);
+            std::copy_n(text, n, g_area_a + m_length);
             m_length += n;
         }
     }
