@@ -10,7 +10,7 @@ import pytest
 
 from conftest import HandsetFactory
 from amt_station.trace.dialogue import read_trace
-from test_dialogues import Session
+from support.session import Session
 
 PROJECT = Path(__file__).resolve().parents[2]
 SESSIONS = {
