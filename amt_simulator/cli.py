@@ -16,7 +16,7 @@ from amt_simulator.errors import PROGRAM, HandsetError
 from amt_simulator.handset import Handset
 from amt_simulator.kinds import KINDS
 from amt_simulator.inside.modem_table import MODES
-from amt_simulator.parse import CardSize, Escaped, Pair, Screen, file_contents, pairs
+from amt_simulator.parse import CardSize, Escaped, Pair, Screen, Words, file_contents, pairs
 from amt_simulator.tree import ROOT
 from amt_simulator.running import Announcement, NoHandset, find
 
@@ -92,7 +92,7 @@ def _options(given: dict[str, Any]) -> dict[str, Any]:
     for function, line in given["answers"]:
         answers.setdefault(function, []).append(line)
     return {
-        "args": given["args"], "config": pairs(given["config"]),
+        "args": given["args"], "through": given["through"], "config": pairs(given["config"]),
         "files": file_contents(given["files"]), "properties": pairs(given["properties"]),
         "answers": answers, "modem": given["modem"],
         "modem_answers": dict(given["modem_answers"]),
@@ -132,6 +132,8 @@ BUILD = click.option("--build", default="release", show_default=True,
 @click.option("--json", "as_json", is_flag=True,
               help="Tell where everything is as one line of JSON.")
 @click.option("--arg", "args", multiple=True, help="Further argument for the daemon.")
+@click.option("--through", type=Words(), default="", metavar="WORDS",
+              help="A program, with its arguments, that runs the daemon: an emulator, a tracer.")
 @click.option("--config", multiple=True, type=OPTIONAL_PAIR,
               help="Configuration setting; KEY alone takes it out.")
 @click.option("--file", "files", multiple=True, type=OPTIONAL_PAIR, metavar="PATH[=FILE]",

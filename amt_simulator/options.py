@@ -1,6 +1,7 @@
 """What a handset is to be like, and how its directory is furnished for it."""
 
 import json
+import shutil
 from dataclasses import dataclass, field
 from pathlib import Path
 from typing import Any, Mapping, Sequence
@@ -16,6 +17,9 @@ from amt_simulator.usb import PLUGGED
 
 # The pause that init makes before it starts the daemon again.
 RESTART_SECONDS = 0.3
+# Where programs lie, in the handset as on the PC.
+PC_PROGRAMS = "/usr"
+PROGRAM_PATH = "/usr/sbin:/usr/bin:/sbin:/bin"
 RECORDS = ("log.txt", "calls.txt", "stdout.txt", "stderr.txt", "init.txt")
 
 
@@ -27,6 +31,8 @@ class Options:
     build         a preset's name or a build directory; None together with `daemon`
     daemon        another program in the daemon's place, for tests of the simulator
     args          further arguments for the daemon
+    through       a program of the PC, and its arguments, that runs the daemon: an emulator for a
+                  build that this machine cannot run, or a tracer
     config        configuration settings that differ from the usual ones; None takes one out
     files         files to place, path in the handset to content: text, bytes, (content, mode),
                   a Path of the PC to copy, or None for no such file
@@ -54,6 +60,7 @@ class Options:
     build: str | Path | None = "release"
     daemon: Path | None = None
     args: Sequence[str] = ()
+    through: Sequence[str] = ()
     config: Mapping[str, str | None] = field(default_factory=dict)
     files: Mapping[str, Content] = field(default_factory=dict)
     properties: Mapping[str, str | None] = field(default_factory=dict)
@@ -96,7 +103,7 @@ class Options:
 
 def environment(options: Options, program: programs.Program) -> dict[str, str]:
     """The environment in which init starts the daemon."""
-    env = {"PATH": "/system/bin:/usr/sbin:/usr/bin:/sbin:/bin", "HOME": "/", "TZ": "UTC0",
+    env = {"PATH": f"/system/bin:{PROGRAM_PATH}", "HOME": "/", "TZ": "UTC0",
            "LD_LIBRARY_PATH": "/system/lib"}
     for name, file in (("LOG", "log.txt"), ("PROPERTIES", "properties"), ("CALLS", "calls.txt"),
                        ("ANSWERS", "answers"), ("DEVICES", "devices")):
@@ -108,14 +115,25 @@ def environment(options: Options, program: programs.Program) -> dict[str, str]:
     return {**env, **options.env}
 
 
+def runner(options: Options) -> list[str]:
+    """The words before the daemon's own: none, or the program that runs it by its whole path."""
+    if not options.through:
+        return []
+    path = shutil.which(options.through[0], path=PROGRAM_PATH)
+    if path is None or not Path(path).resolve().is_relative_to(PC_PROGRAMS):
+        raise HandsetError(f"{options.through[0]} cannot run the daemon: there is no such program "
+                           f"below {PC_PROGRAMS}, which is all that the handset has of the PC")
+    return [path, *options.through[1:]]
+
+
 def _orders(options: Options, program: programs.Program) -> dict[str, Any]:
     """What init is told."""
     kind = options.kind
     service = service_entry(kind.service)
     configured = settings(options.config)
+    words = [*runner(options), kind.program, *service.argv[1:], *options.args]
     return {
-        "daemon": {"argv": [kind.program, *service.argv[1:], *options.args],
-                   "program": kind.program, "env": environment(options, program),
+        "daemon": {"argv": words, "program": words[0], "env": environment(options, program),
                    "no_randomize": program.no_randomize},
         "start": options.start, "restart_pause": RESTART_SECONDS,
         "restart": not service.oneshot if options.restart is None else options.restart,

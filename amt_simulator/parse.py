@@ -1,6 +1,7 @@
 """Words of the `amt-handset` command line, as the values that they stand for."""
 
 import re
+import shlex
 from pathlib import Path
 from typing import Any
 
@@ -59,6 +60,20 @@ class CardSize(click.ParamType):
         if not match or int(match[1]) == 0:
             self.fail(f"{value!r} is not {self.name}", param, ctx)
         return int(match[1]) * FACTORS[match[2].lower()]
+
+
+class Words(click.ParamType):
+    """Words of a command line, quoted as for a shell."""
+
+    name = "WORDS"
+
+    def convert(self, value: Any, param: click.Parameter | None,
+                ctx: click.Context | None) -> list[str]:
+        """The words, none of an empty text."""
+        try:
+            return shlex.split(str(value))
+        except ValueError as error:
+            self.fail(f"{value!r}: {error}".rstrip("."), param, ctx)
 
 
 def pairs(given: tuple[tuple[str, str | None], ...]) -> dict[str, str | None]:

@@ -222,6 +222,9 @@ def test_following_the_log(up) -> None:
     (["up", "--screen", "0x9"], 2, "'0x9' is not WIDTHxHEIGHT"),
     (["up", "--card", "big"], 2, "'big' is not SIZE|none"),
     (["up", "--property", "=x"], 2, "'=x' is not KEY=VALUE"),
+    (["up", "--through", "env 'X=y"], 2, "Invalid value for '--through': \"env 'X=y\": "
+     "No closing quotation"),
+    (["up", "--through", "no-such-program -x"], 1, "no-such-program cannot run the daemon"),
     (["up", "--build", "nonsense"], 1, "is not there; ./dev build"),
     (["log", "-n", "-1"], 3, "no handset is up; `amt-handset up`"),
 ])
@@ -253,6 +256,13 @@ def test_errors_with_a_handset(up) -> None:
         assert (done.returncode, done.stdout) == (1, ""), words
         assert text in done.stderr and done.stderr.count("\n") == 1, done.stderr
         assert done.stderr.startswith("amt-handset: ")
+
+
+def test_through_another_program(up) -> None:
+    """The words are quoted as for a shell."""
+    up("--through", "env 'X=a b'")
+    told = output("show", "init")
+    assert "daemon: /usr/bin/env X=a b /system/bin/vx-kel-amt\n" in told
 
 
 def test_several_handsets(up) -> None:

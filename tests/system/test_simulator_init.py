@@ -80,6 +80,27 @@ def test_arguments(make_fake) -> None:
     assert handset.inspect().command[1:] == ["/system/bin/vx-kel-amt", "-u", "-z", "a b"]
 
 
+def test_through_another_program(make_fake) -> None:
+    """A program with its arguments stands before the daemon's words, which stay as they are."""
+    handset = make_fake("usb-inserted", args=["-z"], through=["env", "X=a b"])
+    assert handset.inspect().command[1:] == ["/system/bin/vx-kel-amt", "-u", "-z"]
+    environment = handset.run(["/usr/bin/cat", f"/proc/{handset.pid}/environ"]).stdout
+    assert b"X=a b" in environment.split(b"\0")
+    assert ": daemon: /usr/bin/env X=a b /system/bin/vx-kel-amt -u -z\n" in handset.text(
+        "/handset/init.txt")
+
+
+@pytest.mark.parametrize("word", ["no-such-program", "/bin", "{tmp}/own"])
+def test_through_a_program_that_the_handset_has_not(make_fake, tmp_path, word: str) -> None:
+    """That is refused before anything starts, also where the PC has such a program."""
+    own = tmp_path / "own"
+    own.write_text("#!/bin/sh\n")
+    own.chmod(0o755)
+    with pytest.raises(HandsetError, match="cannot run the daemon: there is no such program below "
+                                           "/usr, which is all that the handset has of the PC"):
+        make_fake(through=[word.format(tmp=tmp_path), "-x"])
+
+
 def test_commands_run_in_the_handset(fake: Handset) -> None:
     """With their output and status; in the daemon's environment; under another name if wanted."""
     done = fake.run(["/bin/sh", "-c", "echo $VX_HOST_LOG $X; echo no >&2; exit 4"],
