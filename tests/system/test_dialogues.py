@@ -10,7 +10,7 @@ A file tells one session, a statement a line, in order; a `#` begins a comment.
     station hears MESSAGE         exactly these bytes come next on the channel
     modem hears MESSAGE           exactly these bytes come next on the modem's line
     modem says MESSAGE            one read of the daemon; the next line is not done before it
-                                  (up to 1024 bytes; more may take several reads)
+                                  (of more than 1024 bytes nobody waits for the last read)
     modem adds MESSAGE            the same, but nobody waits for it to be read
     modem dies | returns          its line goes away, and is back
     daemon ends STATUS            the daemon ends by itself
@@ -18,7 +18,8 @@ A file tells one session, a statement a line, in order; a `#` begins a comment.
     handset off                   the handset powers off
     file PATH is BYTES            a file of the handset, byte for byte; `file PATH absent`: none
     property NAME is BYTES        a system property; `property NAME absent`: none
-    log BYTES                     a log text, since the last `log` statement or the start
+    log BYTES                     a log text, since the last `log` statement or the start; the next
+                                  line is not done before it
     log error FUNCTION CODE       the error line of a function
     file PATH becomes BYTES       done to the handset, until the end; `file PATH vanishes`
     property NAME becomes BYTES

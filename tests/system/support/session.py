@@ -7,10 +7,11 @@ from contextlib import ExitStack
 from typing import Callable
 
 from amt_simulator import Handset, Line
+from amt_simulator.waiting import wait_until
 from amt_station import wire
 from amt_station.trace.dialogue import Dialogue, Step
 from support.channels import AppChannel, Channel, PcChannel, packet
-from support.modem_desk import FENCE, NOT_SERVED, refusal
+from support.modem_desk import FENCE, NOT_SERVED, refusal, standing_still
 from support.trace import Trace, Wanted, error_line
 from support.traffic import PcTrace
 
@@ -32,6 +33,8 @@ class Session:
         self.trace = Trace(handset)
         self.said: PcTrace | None = None
         self.logged: list[Wanted] = []
+        # Every message that was expected and came, with the name of its line.
+        self.heard: list[tuple[str, bytes]] = []
         self._cleanup = cleanup
         self._is_over = False
         for path in FACTORY_FILES:
@@ -74,6 +77,7 @@ class Session:
     def _expect(self, line: Line, message: "wire.Packet | bytes") -> None:
         wanted = self._encode(message)
         got = line.read_exactly(len(wanted))
+        self.heard.append((line.name, got))
         assert got == wanted, f"{self._shown(got)} instead of {self._shown(wanted)}"
 
     def _shown(self, data: bytes) -> str:
@@ -104,12 +108,15 @@ class Session:
 
     def _do_modem_says(self, message: "wire.Packet | bytes") -> None:
         data = self._encode(message)
+        if len(data) > AWAITED:
+            # The kernel hands it over as one piece, but for what no terminal holds at once.
+            with standing_still(self.handset, len(data)):
+                self.modem.write(data)
+            return
         mark = self.handset.log.mark()
         self.modem.write(data)
-        if len(data) <= AWAITED:
-            read = "receive Modem data: : (data_len = {})" if self.is_pc else \
-                "read_at read_len_ptr[{}]"
-            self.handset.log.wait(read.format(len(data)), after=mark)
+        read = "receive Modem data: : (data_len = {})" if self.is_pc else "read_at read_len_ptr[{}]"
+        self.handset.log.wait(read.format(len(data)), after=mark)
 
     def _do_modem_adds(self, message: "wire.Packet | bytes") -> None:
         self.modem.write(self._encode(message))
@@ -166,4 +173,5 @@ class Session:
 
     def _do_log(self, wanted: "str | tuple[str, int]") -> None:
         self.logged.append(wanted if isinstance(wanted, str) else error_line(*wanted))
-        self.trace.expect(*self.logged)
+        wait_until(lambda: self.trace.has(*self.logged), f"{self.logged[-1]!r} in its place",
+                   explain=lambda: "\n".join(self.trace.texts()))

@@ -1,7 +1,7 @@
 """What a handset's daemon has logged and called since a moment, compared line by line."""
 
 import re
-from typing import Any
+from typing import Any, Sequence
 
 from amt_simulator import Handset
 
@@ -43,12 +43,21 @@ class Trace:
         """How often the file system was flushed."""
         return sum(call.startswith("sync(") for call in self.calls())
 
-    def expect(self, *wanted: Wanted) -> None:
-        """The texts WANTED are there in this order; others may stand between them."""
+    def _missing(self, wanted: Sequence[Wanted]) -> list[Wanted]:
+        """What of the texts WANTED is not there in this order; others may stand between them."""
         left = list(wanted)
         for text in self.texts():
             if left and _is(text, left[0]):
                 del left[0]
+        return left
+
+    def has(self, *wanted: Wanted) -> bool:
+        """Whether the texts WANTED are there already, as `expect` wants them."""
+        return not self._missing(wanted)
+
+    def expect(self, *wanted: Wanted) -> None:
+        """The texts WANTED are there in this order; others may stand between them."""
+        left = self._missing(wanted)
         assert not left, f"no {left[0]!r} in its place in:\n" + "\n".join(self.texts())
 
     def expect_none(self, *unwanted: Wanted) -> None:
