@@ -14,7 +14,7 @@ RELAXED_TYPES = ("--allow-untyped-defs", "--allow-incomplete-defs", "--allow-unt
                  "--allow-untyped-decorators", "--allow-any-generics", "--no-warn-return-any")
 
 # Whose support files a folder of tests uses beside its own.
-BORROWED = {"tests/line": ("tests/station",)}
+BORROWED = {"tests/line": ("tests/station",), "tests/cross": ("tests/system",)}
 
 
 def check_shell(files: list[str]) -> Verdict:

@@ -6,7 +6,7 @@ import shutil
 import tempfile
 from pathlib import Path
 
-from tools.cross import mirror, release
+from tools.cross.sysroot import mirror, release
 from tools.package.source import PackageFailed, run
 from tools.project import note, say
 

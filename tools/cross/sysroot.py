@@ -1,35 +1,20 @@
-"""The daemon for 32-bit Arm: what it links, and its unit tests under emulation: `./dev cross`."""
+"""What the daemon links and its tests use on 32-bit Arm, fetched from Debian."""
 
-import argparse
 import os
 import shutil
 import subprocess
 import tempfile
 from pathlib import Path
 
-from tools.build import build
-from tools.ctest import run_ctest
-from tools.project import PROJECT, note, say
+from tools.project import PROJECT, say
 
-BUILD = PROJECT / "build" / "armhf"
 SYSROOT = PROJECT / "build" / "armhf-sysroot"
 
 # What the cross compiler's own packages do not bring: the target's zlib and GoogleTest.
 PACKAGES = ("zlib1g", "zlib1g-dev", "libgtest-dev", "libgmock-dev")
 
-TEST_SECONDS = "120"
-
 MIRROR = "http://deb.debian.org/debian/"
 KEYRING = "/usr/share/keyrings/debian-archive-keyring.gpg"
-
-
-# Tests that cannot say anything under emulation, and why.
-LEFT_OUT = {
-    r"^platform\.devices_test\.": "start a program of their own, which is Arm code again",
-    r"^platform\.programs_test\.": "start the stand-in programs",
-    r"_death_test\.": "start themselves again",
-    r"^pub\..*serial_speed.*/(460801|3000000|2147483647)$": "the emulator does not know B921600",
-}
 
 
 def release() -> str:
@@ -97,22 +82,3 @@ def make_sysroot() -> None:
             unpack(package, root)
         # In one step: a sysroot that is there is complete.
         shutil.move(root, SYSROOT)
-
-
-def run_tests() -> int:
-    """Run the unit tests that can be run under emulation."""
-    say("unit tests under emulation; left out:")
-    for pattern, reason in LEFT_OUT.items():
-        note(f"{pattern:40} {reason}")
-    results = run_ctest(BUILD, "unit under emulation", "--timeout", TEST_SECONDS,
-                        "-E", "|".join(LEFT_OUT))
-    print(results.count if results.count.passed else "FAIL: no test ran")
-    return 1 if results.count.failed or not results.count.passed else 0
-
-
-def main() -> int:
-    """Fetch, build and test."""
-    argparse.ArgumentParser(prog="./dev cross", description=__doc__).parse_args()
-    make_sysroot()
-    build("armhf")
-    return run_tests()

@@ -1,0 +1,1 @@
+"""The daemon for 32-bit Arm under emulation: `./dev cross`."""
