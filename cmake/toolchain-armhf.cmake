@@ -15,5 +15,8 @@ set(CMAKE_FIND_ROOT_PATH_MODE_PACKAGE ONLY)
 # Where Debian keeps the headers that differ from machine to machine.
 set(CMAKE_CXX_FLAGS_INIT "-Wno-psabi -isystem ${VX_ARM_SYSROOT}/usr/include/arm-linux-gnueabihf")
 
+# A sanitizer looks for leaks as a tracer of its own process, which the emulator is not; it takes its options from the
+# environment of the emulator, not from what -E says.
 set(CMAKE_CROSSCOMPILING_EMULATOR
+    env ASAN_OPTIONS=detect_leaks=0
     qemu-arm -L /usr/arm-linux-gnueabihf -E LD_LIBRARY_PATH=${VX_ARM_SYSROOT}/lib/arm-linux-gnueabihf)
