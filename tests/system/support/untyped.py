@@ -51,6 +51,8 @@ UNTYPED: dict[str, Row] = {
     "./dev bench --all-cores": _LONG,
     "./dev build android": _LONG,
     "./dev build && ./dev test unit station": _LONG,
+    "./dev cross": _LONG,
+    "./dev cross dialogues": _LONG,
     "./dev package bundle --build android": _LONG,
     "tar -x --numeric-owner -f vx-kel-amt-1.1-handset-arm.tar.gz --strip-components=2 -C IMAGE "
     "vx-kel-amt-1.1-handset-arm/root": _BUNDLE,
