@@ -92,21 +92,14 @@ uint32_t read_count(const uint8_t **cursor, const step_st &step)
 
 int run_step(const uint8_t **cursor, uint8_t *packet, const step_st &step)
 {
-    switch (step.m_field) {
-    case field_en::INT:
+    if (step.m_field == field_en::INT) {
         return rsp_at_data_2_amt_data_atom_int(cursor, packet, step.m_atom_id);
-    case field_en::BOOL:
+    }
+    if (step.m_field == field_en::BOOL) {
         return rsp_at_data_2_amt_data_atom_bool(cursor, packet, step.m_atom_id);
-    case field_en::BYTES:
-    case field_en::BYTES_U16_LE:
-    case field_en::BYTES_U32_LE: {
-        const uint32_t count = read_count(cursor, step);
-        return rsp_at_data_2_amt_data_atom_byte(cursor, packet, count, step.m_atom_id);
     }
-    case field_en::NONE:
-        break;
-    }
-    return PUB_ERR_NONE;
+    const uint32_t count = read_count(cursor, step);
+    return rsp_at_data_2_amt_data_atom_byte(cursor, packet, count, step.m_atom_id);
 }
 
 int run_row(const uint8_t **cursor, uint8_t *packet, const row_st &row)
@@ -182,8 +175,9 @@ int amt_convert_rsp_at_data_2_amt_data(const uint8_t *block, uint32_t len, uint8
     const uint8_t *cursor = area_a;
     const uint8_t cmd = *cursor++;
     amt_packet_init(packet, cmd);
+    /* All that it needs is there. */
     const int status = rsp_at_data_2_amt_data_atom_int(&cursor, packet, AMT_ATOM_RESULT);
-    if (status != PUB_ERR_NONE || static_cast<uint32_t>(cursor - area_a) >= len) {
+    if (static_cast<uint32_t>(cursor - area_a) >= len) {
         return status;
     }
     const row_st *row_ptr = find_row(cmd);

@@ -121,8 +121,7 @@ int amt_convert_pc_2_app(amt_buf_st *buf_ptr)
 {
     pub_log_entry(g_amt_convert_log);
     if (buf_ptr == nullptr || buf_ptr->m_buf_len == 0) {
-        return pub_log_bad_param(g_amt_convert_log,
-                                 {buf_ptr == nullptr, buf_ptr != nullptr && buf_ptr->m_buf_len == 0});
+        return pub_log_bad_param(g_amt_convert_log, {buf_ptr == nullptr, buf_ptr != nullptr});
     }
     uint8_t *data = buf_ptr->m_buf_a;
     const uint32_t length = buf_ptr->m_buf_len;
