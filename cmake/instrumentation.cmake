@@ -12,7 +12,8 @@ if(VX_SANITIZE)
   endif()
 endif()
 if(VX_COVERAGE)
-  add_compile_options(--coverage -fprofile-update=atomic -g -O0)
+  # Not --coverage, which no later option takes back.
+  add_compile_options(-fprofile-arcs -ftest-coverage -fprofile-update=atomic -g -O0)
   add_link_options(--coverage)
 endif()
 
