@@ -11,8 +11,7 @@ import pytest
 from dev_copy import Copy
 
 COMMANDS = ("demo", "line", "test", "build", "handset", "station", "manual", "package", "bench",
-            "fuzz", "coverage", "soak", "stateful", "torture", "cross",
-            "lint", "setup")
+            "fuzz", "coverage", "mutate", "soak", "stateful", "torture", "cross", "lint", "setup")
 SECONDS = 120
 
 
