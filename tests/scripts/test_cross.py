@@ -80,7 +80,8 @@ def test_two_alike() -> None:
 
 def test_a_shut_down_may_be_cut_short() -> None:
     begun = ["D a: one", "D vx-kel-amt: signal_treatment()"]
-    whole, cut = (replace(BOTH, threads=[[*begun, *more]]) for more in (["D a: end"], []))
+    ends: list[list[str]] = [["D a: end"], []]
+    whole, cut = (replace(BOTH, threads=[begun + end]) for end in ends)
     assert differences(whole, cut) == []
     assert differences(whole, replace(BOTH, threads=[begun[:1]])) == [
         "the log:", "   0: D a: one", "  -0: D vx-kel-amt: signal_treatment()"]

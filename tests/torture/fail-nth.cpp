@@ -37,14 +37,19 @@ uintptr_t to_address(uintptr_t value)
     return value < g_torture_program.m_base ? value + g_torture_program.m_base : value;
 }
 
+template <typename object> object *to_object(uintptr_t place)
+{
+    return reinterpret_cast<object *>(place); // NOLINT(performance-no-int-to-ptr): a table of addresses
+}
+
 void take_entry(const ElfW(Dyn) & entry, tables_st *tables_ptr)
 {
     switch (entry.d_tag) {
     case DT_SYMTAB:
-        tables_ptr->m_symbol_ptr = reinterpret_cast<const ElfW(Sym) *>(to_address(entry.d_un.d_ptr));
+        tables_ptr->m_symbol_ptr = to_object<const ElfW(Sym)>(to_address(entry.d_un.d_ptr));
         break;
     case DT_STRTAB:
-        tables_ptr->m_text_ptr = reinterpret_cast<const char *>(to_address(entry.d_un.d_ptr));
+        tables_ptr->m_text_ptr = to_object<const char>(to_address(entry.d_un.d_ptr));
         break;
     case DT_JMPREL:
         tables_ptr->m_jump_place = to_address(entry.d_un.d_ptr);
@@ -82,15 +87,15 @@ void *find_stand_in(const char *name)
 void put_address(uintptr_t place, void *address)
 {
     const auto size = static_cast<uintptr_t>(sysconf(_SC_PAGESIZE));
-    mprotect(reinterpret_cast<void *>(place & ~(size - 1)), size, PROT_READ | PROT_WRITE);
-    *reinterpret_cast<void **>(place) = address;
+    mprotect(to_object<void>(place & ~(size - 1)), size, PROT_READ | PROT_WRITE);
+    *to_object<void *>(place) = address;
 }
 
 /* Both kinds of entries begin in the same way: where the address stands, and whose it is. */
 void replace(const tables_st &tables, uintptr_t place, uintptr_t size)
 {
     for (uintptr_t i = 0; i < size; i += tables.m_entry_size) {
-        const auto *const entry_ptr = reinterpret_cast<const ElfW(Rel) *>(place + i);
+        const auto *const entry_ptr = to_object<const ElfW(Rel)>(place + i);
 #if __SIZEOF_POINTER__ == 8
         const auto symbol = ELF64_R_SYM(entry_ptr->r_info);
 #else
@@ -115,7 +120,7 @@ int take_program(dl_phdr_info *info_ptr, size_t, void *)
             g_torture_program.m_size = part.p_vaddr + part.p_memsz;
         }
         if (part.p_type == PT_DYNAMIC) {
-            const auto *entry_ptr = reinterpret_cast<const ElfW(Dyn) *>(info_ptr->dlpi_addr + part.p_vaddr);
+            const auto *entry_ptr = to_object<const ElfW(Dyn)>(info_ptr->dlpi_addr + part.p_vaddr);
             for (; entry_ptr->d_tag != DT_NULL; entry_ptr++) {
                 take_entry(*entry_ptr, &tables);
             }
