@@ -2,7 +2,7 @@
 
 import pytest
 
-from tools.bench_figures import Figure, conclude, show
+from tools.bench.figures import Figure, conclude, show
 
 
 def figure(*values: float, sense: str = "at most", goal: float = 1.15, why: str = "") -> Figure:

@@ -5,9 +5,10 @@ from typing import Sequence
 
 import pytest
 
-from tools import fuzz, fuzz_properties, fuzz_targets
-from tools.fuzz_properties import Properties
-from tools.fuzz_targets import Figures
+from tools.fuzz import main as fuzz
+from tools.fuzz import properties, targets
+from tools.fuzz.properties import Properties
+from tools.fuzz.targets import Figures
 from tools.project import PROJECT
 
 SAID = b"""INFO: seed corpus: files: 7
@@ -40,8 +41,8 @@ def place_engine(monkeypatch: pytest.MonkeyPatch, folder: Path, status: int = 0)
     program = folder / "packet-fuzz"
     program.write_text(ENGINE.format(said=folder / "said", status=status))
     program.chmod(0o755)
-    monkeypatch.setattr(fuzz_targets, "PROGRAMS", folder)
-    monkeypatch.setattr(fuzz_targets, "CORPORA", folder / "corpus")
+    monkeypatch.setattr(targets, "PROGRAMS", folder)
+    monkeypatch.setattr(targets, "CORPORA", folder / "corpus")
     monkeypatch.setattr(fuzz, "FOUND", folder / "found")
 
 
@@ -66,13 +67,13 @@ def test_nonsense_is_refused(monkeypatch: pytest.MonkeyPatch, words: Sequence[st
 
 
 def test_the_engines_words_are_read() -> None:
-    figures = fuzz_targets.read_figures("packet", SAID)
+    figures = targets.read_figures("packet", SAID)
     assert (figures.executions, figures.edges_before, figures.edges) == (12960, 102, 105)
     assert figures.new_edges == 3 and not figures.is_finding
 
 
 def test_a_target_that_says_nothing_is_a_finding() -> None:
-    assert fuzz_targets.read_figures("packet", b"").is_finding
+    assert targets.read_figures("packet", b"").is_finding
     assert Figures("packet", status=77, executions=5).is_finding
 
 
@@ -113,11 +114,11 @@ def test_the_line_of_the_python_readers() -> None:
 
 
 def test_the_files_of_the_python_readers_are_there() -> None:
-    for name in fuzz_properties.FILES:
+    for name in properties.FILES:
         assert (PROJECT / name).is_file()
 
 
 def test_every_target_has_a_corpus() -> None:
-    for name in fuzz_targets.names():
-        inputs = list((fuzz_targets.CORPORA / name).iterdir())
+    for name in targets.names():
+        inputs = list((targets.CORPORA / name).iterdir())
         assert inputs and all(path.stat().st_size <= 8192 for path in inputs), name

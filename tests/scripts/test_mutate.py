@@ -10,9 +10,9 @@ import pytest
 PROJECT = Path(__file__).resolve().parents[2]
 sys.path.insert(0, str(PROJECT))
 
-from tools import mutate  # noqa: E402
 from tools.mutants import copy, draw  # noqa: E402
 from tools.mutants.daemon_workshop import DaemonWorkshop  # noqa: E402
+from tools.mutants import main as mutate  # noqa: E402
 from tools.mutants.fate import Fate, Trial  # noqa: E402
 from tools.mutants.masked import masked, masked_python  # noqa: E402
 from tools.mutants.operators import Mutant, mutants_of  # noqa: E402

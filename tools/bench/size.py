@@ -12,8 +12,8 @@ from datetime import datetime
 from pathlib import Path
 
 from amt_simulator import Completed, Handset
-from tools.bench_daemon import BUILD, DAEMON, daemon_pid, resident
-from tools.bench_figures import Figure, show
+from tools.bench.daemon import BUILD, DAEMON, daemon_pid, resident
+from tools.bench.figures import Figure, show
 from tools.project import PROJECT
 
 KIB = 1024

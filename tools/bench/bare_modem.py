@@ -31,7 +31,7 @@ def bare_modem() -> Iterator[int]:
     """The handset's end of a modem in a process of its own: a descriptor to write and read."""
     with tempfile.TemporaryDirectory() as folder:
         path = Path(folder) / "mux"
-        with subprocess.Popen([sys.executable, "-m", "tools.bare_modem", str(path)],
+        with subprocess.Popen([sys.executable, "-m", "tools.bench.bare_modem", str(path)],
                               stdout=subprocess.PIPE) as process:
             try:
                 assert process.stdout is not None

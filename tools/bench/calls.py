@@ -9,8 +9,8 @@ from typing import Callable
 
 from amt_simulator import Handset
 from amt_station import wire
-from tools.bench_daemon import daemon_pid
-from tools.bench_figures import Figure, show
+from tools.bench.daemon import daemon_pid
+from tools.bench.figures import Figure, show
 
 REQUESTS = 20
 ATTACHED = "attached"

@@ -4,8 +4,8 @@ import json
 import subprocess
 from typing import Any
 
-from tools.bench_daemon import BUILD
-from tools.bench_figures import Figure, show
+from tools.bench.daemon import BUILD
+from tools.bench.figures import Figure, show
 
 OTHERS = {"nanopb": "nanopb", "libcbor": "libcbor", "msgpack_c": "msgpack-c"}
 FRAME = "4096"

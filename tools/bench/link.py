@@ -7,9 +7,9 @@ import sys
 from typing import Any, Callable
 
 from amt_simulator import Handset
-from tools.bare_modem import bare_modem
-from tools.bench_daemon import BUILD, daemon_pid, log_tail
-from tools.bench_figures import Figure, show
+from tools.bench.bare_modem import bare_modem
+from tools.bench.daemon import BUILD, daemon_pid, log_tail
+from tools.bench.figures import Figure, show
 
 ROUNDS = "4000"
 TUNNEL_ROUNDS = "2000"

@@ -7,10 +7,11 @@ import shutil
 from concurrent.futures import ThreadPoolExecutor
 from typing import Sequence
 
-from tools import fuzz_properties, fuzz_targets
 from tools.build import build
-from tools.fuzz_properties import Properties
-from tools.fuzz_targets import Figures
+from tools.fuzz import properties as readers
+from tools.fuzz import targets
+from tools.fuzz.properties import Properties
+from tools.fuzz.targets import Figures
 from tools.project import CORES, PROJECT, note, say
 
 FOUND = PROJECT / "build" / "fuzz-found"
@@ -22,9 +23,9 @@ def run_target(name: str, seconds: int, is_grown: bool) -> Figures:
     """Run a target, and let its corpus grow by what it has found."""
     found = FOUND / name
     shutil.rmtree(found, ignore_errors=True)
-    figures = fuzz_targets.run(name, seconds, found)
+    figures = targets.run(name, seconds, found)
     if is_grown and not figures.is_finding:
-        figures.grown = fuzz_targets.grow(name, found)
+        figures.grown = targets.grow(name, found)
     note(f"{name}: {'FINDING' if figures.is_finding else 'done'}")
     return figures
 
@@ -51,7 +52,7 @@ def describe(runs: Sequence[Figures]) -> str:
 
 def describe_properties(properties: Properties) -> str:
     """The line of the Python readers."""
-    held = "all held" if properties.status == fuzz_properties.PASSED else "NOT ALL HELD"
+    held = "all held" if properties.status == readers.PASSED else "NOT ALL HELD"
     return (f"Python readers: {properties.examples:,} examples in {properties.rounds} rounds "
             f"of {properties.seconds:.0f} s: {held}")
 
@@ -67,7 +68,7 @@ def parse() -> argparse.Namespace:
                         help="targets at once (default: %(default)s)")
     parser.add_argument("--grow", action="store_true",
                         help="take inputs that reach new edges into tests/fuzz/corpus")
-    parser.add_argument("--target", action="append", choices=fuzz_targets.names(),
+    parser.add_argument("--target", action="append", choices=targets.names(),
                         help="only this one, and no Python; may be given again")
     options = parser.parse_args()
     if options.nightly is not None and options.seconds is not None:
@@ -88,7 +89,7 @@ def main() -> int:
     options = parse()
     build("fuzz")
     FOUND.mkdir(parents=True, exist_ok=True)
-    chosen = options.target or fuzz_targets.names()
+    chosen = options.target or targets.names()
     say(f"{len(chosen)} targets, {options.seconds} s each, {options.jobs} at once")
     pool = ThreadPoolExecutor(options.jobs)
     try:
@@ -102,8 +103,8 @@ def main() -> int:
     print(describe(runs), flush=True)
     if options.target:
         return 1 if wrong else 0
-    properties = fuzz_properties.run(options.seconds, options.jobs)
-    if properties.status != fuzz_properties.PASSED:
+    properties = readers.run(options.seconds, options.jobs)
+    if properties.status != readers.PASSED:
         print(properties.said.decode("utf-8", "replace"))
     print(describe_properties(properties))
-    return 1 if wrong or properties.status != fuzz_properties.PASSED else 0
+    return 1 if wrong or properties.status != readers.PASSED else 0

@@ -4,15 +4,14 @@ import argparse
 import os
 import sys
 
-from tools import (bench_calls, bench_codec, bench_link, bench_line, bench_size, bench_slots,
-                   bench_stats)
-from tools.bench_figures import Figure, conclude
+from tools.bench import calls, codec, line, link, size, slots, stats
+from tools.bench.figures import Figure, conclude
 from tools.build import build
 
 RUNS = 5
 
 # In the order in which they are measured: the stable figures come first.
-GROUPS = {**bench_link.GROUPS, **bench_codec.GROUPS, **bench_size.GROUPS, **bench_calls.GROUPS}
+GROUPS = {**link.GROUPS, **codec.GROUPS, **size.GROUPS, **calls.GROUPS}
 STATION = "station"
 
 
@@ -39,9 +38,9 @@ def arguments() -> argparse.Namespace:
 def main() -> int:
     """Measure everything. The log goes to its file, as in service."""
     if sys.argv[1:2] == ["line"]:
-        return bench_slots.main()
+        return slots.main()
     if sys.argv[1:2] == ["stats"]:
-        return bench_stats.main()
+        return stats.main()
     options = arguments()
     chosen = options.only or [*GROUPS, STATION]
     build("release", ("--target", "handset", "link-bench", "micro-bench", "codec-bench"))
@@ -59,7 +58,7 @@ def main() -> int:
         if name in chosen:
             figures += measure(options.runs)
     if STATION in chosen:
-        bench_line.bench_station()
+        line.bench_station()
     print("\nLeft out, because a pause is part of them: every write of a factory file"
           "\n(two pauses of 50 ms), power-off (2 s), the battery ADC (20 ms)."
           f"\nLoad when they ended: {os.getloadavg()[0]:.1f}.")

@@ -1,0 +1,1 @@
+"""What `./dev fuzz` runs."""
