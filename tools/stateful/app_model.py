@@ -45,9 +45,9 @@ def command_for(packet: wire.Packet) -> str | None:
     if command == 89:
         return f"AT^DATOMR=1,{number(packet, 39)}\r"
     if command == 91:
-        described = text(packet, 37, 126)
+        description = text(packet, 37, 126)
         shown = f"{number(packet, 39)},{number(packet, 36)}"
-        return f"AT^DATOMW={shown},{described}\r" if described else f"AT^DATOMW={shown}\r"
+        return f"AT^DATOMW={shown},{description}\r" if description else f"AT^DATOMW={shown}\r"
     if command == 232:
         return f"AT^DMPCHN={number(packet, 159)}\r"[:12]
     return None
@@ -153,17 +153,17 @@ class Exchange:
         return value_answer(self.packet, value)
 
     def _station_result(self, phone: Phone) -> Reply:
-        station, verdict, described = number(self.packet, 39), 0, ""
+        station, verdict, description = number(self.packet, 39), 0, ""
         _, _, behind = self.heard.partition(STATION_LINE)
         line, end, _ = behind.partition("\r\n")
         match = RESULT.match(line)
         if end and match:
             station = int(match[1]) if match[1] else station
             verdict = int(match[2] or "0")
-            described = (match[3] or "")[:127]
+            description = (match[3] or "")[:127]
         phone.store_result(handset.AMT_RESULTS, station, verdict)
         return answer(90, integer(39, station), integer(36, verdict),
-                      wire.Atom.string(37, described))
+                      wire.Atom.string(37, description))
 
 
 @dataclass

@@ -4,7 +4,6 @@ from __future__ import annotations
 
 import argparse
 import random
-import sys
 from pathlib import Path
 
 from tools.build import build
@@ -73,7 +72,3 @@ def main() -> int:
         return 1
     print(f"PASS: seed {seed}: {outcome}")
     return 0
-
-
-if __name__ == "__main__":
-    sys.exit(main())

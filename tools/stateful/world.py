@@ -43,8 +43,8 @@ class World:
     last_story: str = ""
 
     def __enter__(self) -> "World":
-        files = {path: text for path, text in FIRST_FILES.items()}
-        self._handsets = [Handset(path, self.build, files=files) for path in ("pc", "packet")]
+        self._handsets = [Handset(path, self.build, files=FIRST_FILES)
+                          for path in ("pc", "packet")]
         try:
             for handset in self._handsets:
                 handset.up()
