@@ -52,6 +52,13 @@ struct road_st
     size_t m_response_length;
 };
 
+/* A process and the line on which it is asked and answers. */
+struct side_st
+{
+    pid_t m_pid;
+    int m_fd;
+};
+
 /* What a road has been measured at. */
 struct result_st
 {
@@ -133,6 +140,17 @@ void end_floor(pid_t pid)
     end_companion(pid);
 }
 
+/* A line of the daemon's and one of the floor's, of processes that serve the same request; the floor ends. */
+int compare_with_floor(const floor_st &floor, const side_st &daemon, const side_st &other, int rounds)
+{
+    printf("{\"records\": %u, ", floor.m_record_count);
+    compare_roads({daemon.m_pid, daemon.m_fd, daemon.m_fd, floor.m_request, floor.m_response_length},
+                  {other.m_pid, other.m_fd, other.m_fd, floor.m_request, floor.m_response_length}, rounds);
+    printf("}\n");
+    end_floor(other.m_pid);
+    return 0;
+}
+
 int run_round_trip(char **argv)
 {
     const int line_fd = atoi(argv[3]);
@@ -141,12 +159,7 @@ int run_round_trip(char **argv)
     std::string path;
     const int floor_fd = open_pty(&path);
     const pid_t pid = start_floor(floor, open_slave(path), -1, atoi(argv[5]));
-    printf("{\"records\": %u, ", floor.m_record_count);
-    compare_roads({atoi(argv[2]), line_fd, line_fd, floor.m_request, floor.m_response_length},
-                  {pid, floor_fd, floor_fd, floor.m_request, floor.m_response_length}, atoi(argv[6]));
-    printf("}\n");
-    end_floor(pid);
-    return 0;
+    return compare_with_floor(floor, {atoi(argv[2]), line_fd}, {pid, floor_fd}, atoi(argv[6]));
 }
 
 /* The daemon holds the master of the app's line, and the slave of the modem's. */
@@ -161,12 +174,7 @@ int run_tunnel(char **argv)
     const int master = open_pty(&path);
     const int floor_fd = open_slave(path);
     const pid_t pid = start_floor(floor, master, modem_fd, 1);
-    printf("{\"records\": %u, ", floor.m_record_count);
-    compare_roads({atoi(argv[2]), app_fd, app_fd, floor.m_request, floor.m_response_length},
-                  {pid, floor_fd, floor_fd, floor.m_request, floor.m_response_length}, atoi(argv[5]));
-    printf("}\n");
-    end_floor(pid);
-    return 0;
+    return compare_with_floor(floor, {atoi(argv[2]), app_fd}, {pid, floor_fd}, atoi(argv[5]));
 }
 
 pid_t start_socat(const std::string &path_a, const std::string &path_b)
