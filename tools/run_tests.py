@@ -10,6 +10,7 @@ from pathlib import Path
 from typing import Sequence
 
 from tools import children
+from tools.arguments import positive, refuse_unknown
 from tools.builder import Builder
 from tools.coverage import parts
 from tools.ctest import run_ctest
@@ -118,20 +119,9 @@ def run_suites(suites: Sequence[Suite]) -> Count:
 
 def choose(parser: argparse.ArgumentParser, names: Sequence[str]) -> list[Suite]:
     """The suites that were asked for."""
-    unknown = sorted(set(names) - {suite.name for suite in SUITES})
-    if unknown:
-        parser.error(f"no such suite: {', '.join(unknown)} "
-                     f"(there are: {', '.join(suite.name for suite in SUITES)})")
+    refuse_unknown(parser, "suite", names, [suite.name for suite in SUITES])
     return [suite for suite in SUITES
             if (suite.name in names if names else not suite.is_extra)]
-
-
-def counted(word: str) -> int:
-    """A number of runs."""
-    number = int(word)
-    if number < 1:
-        raise ValueError(word)
-    return number
 
 
 def main() -> int:
@@ -140,9 +130,9 @@ def main() -> int:
     parser.add_argument("suite", nargs="*", help="only these: " + ", ".join(
         suite.name + (" (not run unless named)" if suite.is_extra else "")
         for suite in SUITES))
-    parser.add_argument("--repeat", type=counted, metavar="N",
+    parser.add_argument("--repeat", type=positive, metavar="N",
                         help="run them N times in a row, and count each time")
-    parser.add_argument("--beside", type=counted, metavar="M", default=0,
+    parser.add_argument("--beside", type=positive, metavar="M", default=0,
                         help="of these runs, the first M with a build running beside")
     parser.add_argument("--coverage", action="store_true",
                         help="count what they run of the code, too; fails below the floors")

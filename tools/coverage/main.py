@@ -2,6 +2,7 @@
 
 import argparse
 
+from tools.arguments import refuse_unknown
 from tools.coverage.parts import PARTS, count, hold
 from tools.results import Count
 from tools.run_tests import run_suites
@@ -17,9 +18,7 @@ def main() -> int:
                         help="report what the last run has counted")
     options = parser.parse_args()
     names = [part.name for part in PARTS]
-    unknown = [name for name in options.part if name not in names]
-    if unknown:
-        parser.error(f"no such part: {unknown[0]} (there are: {', '.join(names)})")
+    refuse_unknown(parser, "part", options.part, names)
     parts = [part for part in PARTS if part.name in (options.part or names)]
     total = Count()
     if not options.report_only:

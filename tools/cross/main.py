@@ -6,6 +6,7 @@ import time
 from typing import Callable, Mapping
 
 from tools import children
+from tools.arguments import refuse_unknown
 from tools.build import build
 from tools.cross import warnings
 from tools.cross.alike import NOT_PLAYED, ONLY_EMULATED, RULES
@@ -91,9 +92,7 @@ def main() -> int:
     parser.add_argument("part", nargs="*", metavar="PART",
                         help=f"only these: {', '.join(PARTS)} (default: all)")
     chosen = parser.parse_args().part
-    unknown = sorted(set(chosen) - set(PARTS))
-    if unknown:
-        parser.error(f"no such part: {', '.join(unknown)} (there are: {', '.join(PARTS)})")
+    refuse_unknown(parser, "part", chosen, PARTS)
     make_sysroot()
     told = {}
     for name, run in PARTS.items():

@@ -5,6 +5,7 @@ import itertools
 import time
 from typing import Callable, Iterator, Mapping, Protocol, Sequence
 
+from tools.arguments import positive
 from tools.mutants.daemon_workshop import DaemonWorkshop
 from tools.mutants.draw import EQUAL, drawn, known_equal, pc_sources, sources, without_line
 from tools.mutants.fate import Fate, Trial
@@ -74,14 +75,6 @@ def report(trials: Sequence[Trial], others: Sequence[Trial]) -> int:
         print(f"survived: {mutant}\n    ./dev mutate --of {subject(mutant)} --only {mutant.name}")
     print(score(trials, equal), flush=True)
     return 1 if lost else 0
-
-
-def positive(word: str) -> int:
-    """A number of mutants."""
-    number = int(word)
-    if number < 1:
-        raise ValueError(word)
-    return number
 
 
 def main() -> int:

@@ -6,6 +6,7 @@ import argparse
 import random
 from pathlib import Path
 
+from tools.arguments import positive
 from tools.build import build
 from tools.project import PROJECT, note
 from tools.stateful.run import Outcome, drawn, repeat, run, shorten_run
@@ -28,14 +29,6 @@ def describe(outcome: Outcome, seed: int, preset: str, shortening: float, folder
         *(f"  {step.as_line()}" for step in kept), "",
         f"again: ./dev stateful --build {preset} --replay {short}",
         f"all:   ./dev stateful --build {preset} --replay {whole}", "", outcome.story])
-
-
-def positive(word: str) -> int:
-    """A number of steps."""
-    number = int(word)
-    if number < 1:
-        raise ValueError(word)
-    return number
 
 
 def parse() -> argparse.Namespace:
