@@ -9,7 +9,7 @@ import pytest
 PROJECT = Path(__file__).resolve().parents[2]
 sys.path.insert(0, str(PROJECT))
 
-from tools.coverage import floors  # noqa: E402
+from tools.coverage import daemon, floors, parts, pc  # noqa: E402
 from tools.coverage.floors import FileCount, Floor, Share, judge  # noqa: E402
 
 FLOOR = Floor("checksum", ("amt/amt-checksum.",), 97, 90)
@@ -43,13 +43,25 @@ def test_almost_all_is_not_all() -> None:
 def test_a_floor_without_files_does_not_hold() -> None:
     result, = judge([FLOOR], [counted(1, 1, "amt/amt-packet.cpp")])
     assert not result.holds
-    assert str(result) == "checksum: no such file"
+    assert str(result) == "checksum: no file of it was counted"
 
 
 def test_nothing_to_branch_is_no_shortage() -> None:
     result, = judge([FLOOR], [FileCount("amt/amt-checksum.h", Share(3, 3), Share(0, 0))])
     assert result.holds
     assert str(result) == "checksum: lines 100.00 % (3 of 3), floor 97 %"
+
+
+def test_where_nothing_was_counted_nothing_is_held(tmp_path: Path,
+                                                   monkeypatch: pytest.MonkeyPatch,
+                                                   capsys: pytest.CaptureFixture[str]) -> None:
+    monkeypatch.setattr(daemon, "BUILD", tmp_path)
+    monkeypatch.setattr(pc, "WORK", tmp_path)
+    monkeypatch.setattr(pc, "DATA", tmp_path / "counts")
+    assert not parts.hold(parts.PARTS)
+    said = capsys.readouterr().out
+    assert "registry: no file of it was counted\n" in said
+    assert "daemon: nothing was counted\n" in said and "pc: nothing was counted\n" in said
 
 
 def test_every_floor_names_files_that_are_there() -> None:

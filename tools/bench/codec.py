@@ -1,6 +1,7 @@
 """The codec by itself: checksum and packets, beside a single table and beside other codecs."""
 
 import json
+import math
 import subprocess
 from typing import Any
 
@@ -44,7 +45,8 @@ def _pays_from(times: Times) -> Figure:
     for run in range(len(times[f"checksum/{FRAME}"])):
         slower = [length for length in lengths if times[f"checksum/{length}"][run]
                   > times[f"checksum_byte_by_byte/{length}"][run]]
-        figure.add(min(length for length in lengths if length > max(slower, default=0)))
+        longest = max(slower, default=0)
+        figure.add(min((length for length in lengths if length > longest), default=math.inf))
     return figure
 
 

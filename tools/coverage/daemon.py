@@ -45,7 +45,12 @@ def _gcovr(*options: str) -> None:
 
 
 def report() -> tuple[list[FileCount], str]:
-    """Write the report for people; what each file's counts are, and where the report is."""
+    """Write the report for people; what each file's counts are, and where the report is.
+
+    Where nothing was counted there are no files, and no report.
+    """
+    if not any(BUILD.rglob("*.gcda")):
+        return [], ""
     REPORT.mkdir(parents=True, exist_ok=True)
     page = REPORT / "index.html"
     _gcovr("--html-details", str(page), "--html-title", "vx-kel-amt",

@@ -76,7 +76,7 @@ class Result:
 
     def __str__(self) -> str:
         if self.is_empty:
-            return f"{self.floor.name}: no such file"
+            return f"{self.floor.name}: no file of it was counted"
         parts = [f"lines {self.lines}, floor {self.floor.lines:g} %"]
         if self.branches.total:
             parts.append(f"branches {self.branches}, floor {self.floor.branches:g} %")

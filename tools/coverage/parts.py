@@ -45,5 +45,5 @@ def hold(parts: Sequence[Part]) -> bool:
         for result in judge(part.floors, files):
             print(result)
             is_held = is_held and result.holds
-        print(f"file by file: {page}", flush=True)
+        print(f"file by file: {page}" if page else f"{part.name}: nothing was counted", flush=True)
     return is_held

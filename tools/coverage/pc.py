@@ -16,7 +16,7 @@ from tools.suites import Suite
 WORK = PROJECT / "build" / "coverage-pc"
 REPORT = PROJECT / "build" / "coverage-pc-report"
 PACKAGES = ("amt_station", "amt_line")
-SETTINGS, STARTER = WORK / "settings.ini", WORK / "start"
+SETTINGS, STARTER, DATA = WORK / "settings.ini", WORK / "start", WORK / "counts"
 
 # The suites whose tests run the packages, or start what runs them.
 NAMES = ("station",)
@@ -28,7 +28,7 @@ def _prepare() -> dict[str, str]:
     STARTER.mkdir(parents=True)
     sources = "\n    ".join(str(PROJECT / name) for name in PACKAGES)
     SETTINGS.write_text(
-        f"[run]\nparallel = true\nsigterm = true\ndata_file = {WORK / 'counts'}\n"
+        f"[run]\nparallel = true\nsigterm = true\ndata_file = {DATA}\n"
         f"concurrency = thread,multiprocessing\nsource =\n    {sources}\n"
         "[report]\nexclude_lines =\n    pragma: no cover\n    if TYPE_CHECKING:\n"
         "    raise NotImplementedError\n    ^\\s*\\.\\.\\.$\n")
@@ -56,9 +56,14 @@ def _path(name: str) -> str:
 
 
 def report() -> tuple[list[FileCount], str]:
-    """Write the report for people; what each file's counts are, and where the report is."""
+    """Write the report for people; what each file's counts are, and where the report is.
+
+    Where nothing was counted there are no files, and no report.
+    """
     if any(WORK.glob("counts.*")):
         _coverage("combine", "--quiet")
+    if not DATA.is_file():
+        return [], ""
     _coverage("html", "--quiet", "-d", str(REPORT))
     _coverage("json", "--quiet", "-o", str(REPORT / "summary.json"))
     summary = json.loads((REPORT / "summary.json").read_text())
