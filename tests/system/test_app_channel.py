@@ -6,6 +6,7 @@ from conftest import HandsetFactory
 from amt_simulator import Handset
 from amt_simulator.waiting import wait_until
 from support.channels import AppChannel, integer, packet
+from support.threads import threads_of, wait_calm
 from support.trace import Trace, error_line
 from support.traffic import APP_IN, APP_OUT, dump
 
@@ -123,13 +124,13 @@ def test_app_line_that_cannot_be_made_again(make_handset: HandsetFactory) -> Non
                            config={"vx.tty.app": f"{folder}/ttyAPP0"})
     app = AppChannel(handset)
     assert app.request(9).result == 0
-    threads = len(handset.inspect().threads)
+    wait_calm(handset)
     # Away goes the folder that the link lies in, and then the app.
     handset.path(folder).rename(handset.path("/data/other"))
     handset.path(folder).write_text("in its place\n")
     handset.app.close()
     handset.log.wait("pty disconnect: pts name(")
-    wait_until(lambda: len(handset.inspect().threads) == threads - 1 or None,
+    wait_until(lambda: len(handset.inspect().threads) == threads_of(handset) - 1 or None,
                "the end of the app's reader")
     assert [text for text in handset.log.texts(PTY_TAG) if text.endswith("failed")]
     # The daemon itself goes on, and ends as ever.

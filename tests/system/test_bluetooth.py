@@ -12,6 +12,7 @@ from amt_station import wire
 from support.channels import AppChannel, PcChannel, packet
 from support.handler import HandlerTrace, device_error, done, refusal
 from support.held import HeldCall
+from support.threads import wait_calm
 from support.trace import TAG
 from support.traffic import APP_OUT, PC_OUT, dump
 
@@ -33,19 +34,6 @@ def children(handset: Handset) -> list[int]:
 def child(handset: Handset) -> int:
     """The one child that switches the chip on, as soon as it is there."""
     return wait_until(lambda: children(handset) or None, "the child")[0]
-
-
-def wait_alone(handset: Handset) -> None:
-    """Wait until the daemon has no children and no threads of theirs."""
-    wait_until(lambda: not children(handset) or None, "the end of the children")
-    wait_until(lambda: len(handset.inspect().threads) == threads_of(handset) or None,
-               "the end of the threads that wait for children")
-
-
-def threads_of(handset: Handset) -> int:
-    """The main thread, the workers, and the one that ThreadSanitizer makes."""
-    own = {"packet": 2, "pc": 4}[handset.options.path]
-    return own + (handset.program.sanitizer == "tsan")
 
 
 def lines_of(handset: Handset, pid: int) -> list[str]:
@@ -75,7 +63,7 @@ def test_both_acknowledge(make_handset: HandsetFactory, path: str) -> None:
         trace.expect_handler(HANDLER)
         pid = handset.log.wait("BT-start start", after=mark).pid
         assert pid != handset.pid
-        wait_alone(handset)
+        wait_calm(handset)
         assert lines_of(handset, pid) == ["BT-start start", "BT-start end. return:0.",
                                           *sent(path, done(BT))]
 
@@ -99,7 +87,7 @@ def test_service_answers_while_the_chip_comes_up(make_handset: HandsetFactory, p
     assert children(handset) == [pid]
     held.release()
     assert channel.read_packet() == done(BT)
-    wait_alone(handset)
+    wait_calm(handset)
     # Only the service reads: no request is lost to the child, none is served twice.
     for _ in range(50):
         assert channel.request(GPS_TEST) == packet(175, *done(0).atoms)
@@ -117,7 +105,7 @@ def test_child_fails(make_handset: HandsetFactory, path: str) -> None:
         answers = [channel.request(BT), channel.read_packet()]
         assert answers in ([done(BT), refusal(BT)], [refusal(BT), done(BT)])
         assert trace.calls() == [CALL.format(6)]
-        wait_alone(handset)
+        wait_calm(handset)
         pid = handset.log.wait("BT-start start", after=mark).pid
         lines = lines_of(handset, pid)
         assert lines[:2] == ["BT-start start", "BT-start end. return:6."]
@@ -152,7 +140,7 @@ def test_starts_at_once(make_handset: HandsetFactory, path: str) -> None:
     held.release_until(lambda: handset.calls().count(CALL.format(0)) == 4)
     for _ in range(4):
         assert channel.read_packet() == done(BT)
-    wait_alone(handset)
+    wait_calm(handset)
     channel.expect_silence(0.1)
 
 
@@ -197,7 +185,7 @@ def test_service_outlives_the_child(make_handset: HandsetFactory, path: str, num
         pid = child(handset)
         wait_until(lambda: "BT-start start" in lines_of(handset, pid) or None, "the start")
         handset.signal(number, pid=pid)
-        wait_alone(handset)
+        wait_calm(handset)
         # The other two end the child by its own signal treatment.
         told = [record.text for record in handset.log.records(mark, TAG)
                 if record.pid == handset.pid and record.text.startswith("BT-start error")]

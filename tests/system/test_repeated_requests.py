@@ -14,6 +14,7 @@ from amt_simulator.waiting import wait_until
 from amt_station import wire
 from support.channels import AppChannel, PcChannel, flag, integer, raw, string
 from support.registrations import APP_ROWS, PC_ROWS
+from support.threads import wait_calm
 
 Channel = Union[AppChannel, PcChannel]
 
@@ -94,16 +95,6 @@ REFUSED = (
 )
 
 
-def settled(handset: Handset, threads: int = 0) -> ProcessInfo:
-    """A look at the daemon when no child and no thread of a child is left."""
-    def attempt() -> ProcessInfo | None:
-        info = handset.inspect()
-        return info if not info.children and threads in (0, len(info.threads)) else None
-
-    return wait_until(attempt, "the end of all that requests have started",
-                      explain=lambda: f"{handset.inspect()}")
-
-
 def repeat(channel: Channel, request: Request, count: int, failing: bool = False) -> None:
     """Repeat a request, and compare the daemon with what it was before."""
     handset = channel.handset
@@ -113,17 +104,15 @@ def repeat(channel: Channel, request: Request, count: int, failing: bool = False
             request.send(channel)
             request.expect_answers(channel, failing)
 
-    # A thread of a request that is just ending is none that stays.
-    calm = len(settled(handset).threads)
     serve(WARM_UP)
-    before = settled(handset, calm)
+    before = wait_calm(handset)
     serve(count)
     compare(handset, before, f"{request}")
 
 
 def compare(handset: Handset, before: ProcessInfo, what: str) -> None:
     """The daemon is what it was BEFORE."""
-    after = settled(handset, len(before.threads))
+    after = wait_calm(handset)
     assert after.pid == before.pid
     assert after.descriptors == before.descriptors, what
     assert set(after.threads) == set(before.threads), what
@@ -178,7 +167,7 @@ def test_requests_of_the_pc_with_a_pause(make_handset: HandsetFactory) -> None:
                 request.expect_answers(pc)
 
     serve(3)
-    before = [settled(handset) for handset in handsets]
+    before = [wait_calm(handset) for handset in handsets]
     serve(SELDOM)
     for (request, pc), info in zip(pairs, before):
         compare(pc.handset, info, f"{request}")

@@ -16,6 +16,7 @@ from amt_simulator.waiting import scaled, wait_until
 from amt_station import wire
 from support.channels import AppChannel, PcChannel, flag, integer
 from support.slow_shell import SlowShell
+from support.threads import wait_calm
 from support.trace import Trace
 
 NAMES = {2: "SIGINT", 15: "SIGTERM", 11: "SIGSEGV", 7: "SIGBUS", 12: "SIGUSR2"}
@@ -190,6 +191,7 @@ def test_signal_while_the_log_is_stuck(make_handset: HandsetFactory, number: int
 def hold_an_end(make_handset: HandsetFactory) -> Handset:
     """A packet path whose end waits for a worker that is in a slow command."""
     handset, shell = start_with_slow_shell(make_handset, "packet", "/system/bin/sync")
+    wait_calm(handset)
     AppChannel(handset).send_packet(219, integer(192, 1))
     shell.wait_held()
     return handset
@@ -220,7 +222,7 @@ def test_signals_behind_the_first_change_nothing(make_handset: HandsetFactory, f
 @pytest.mark.parametrize("numbers", [(15, 11), (11, 15), (7, 11), (2, 15, 12, 11, 7)])
 def test_signals_at_once_end_once(packet_handset: Handset, numbers: tuple[int, ...]) -> None:
     trace = Trace(packet_handset)
-    everywhere = [0, *threads(packet_handset)]
+    everywhere = [0, *sorted(wait_calm(packet_handset).threads)]
 
     def send() -> None:
         with suppress(HandsetError):

@@ -12,6 +12,7 @@ from amt_simulator.waiting import scaled
 from amt_station.requests.catalogue import command_name
 from support.channels import AppChannel, PcChannel, integer, packet
 from support.registrations import APP_ROWS, PC_ROWS
+from support.threads import wait_calm
 from support.trace import TAG, Trace, error_line
 
 REGISTER = re.compile(r"(PC|APP) register command id: (\d+)\(0x([0-9a-f]{2})\) - (.*)")
@@ -101,17 +102,14 @@ def test_simplified_mode_serves_the_pc(make_handset: HandsetFactory, path: str) 
 
 
 def test_pc_path_threads_and_descriptors(pc_handset: Handset) -> None:
-    info = pc_handset.inspect()
-    own = 1 if pc_handset.program.sanitizer == "tsan" else 0  # the sanitizer's own thread
-    assert len(info.threads) == 4 + own
+    info = wait_calm(pc_handset)
     ttys = [name for name in info.descriptors.values() if name.startswith("/dev/pts/")]
     assert len(ttys) == 2
     assert sum(name.startswith("socket:") for name in info.descriptors.values()) == 1
 
 
 def test_packet_path_threads_and_link(packet_handset: Handset) -> None:
-    own = 1 if packet_handset.program.sanitizer == "tsan" else 0
-    assert len(packet_handset.inspect().threads) == 2 + own
+    wait_calm(packet_handset)
     link = packet_handset.run(["/usr/bin/readlink", "/dev/ttyAPP0"]).stdout.decode().strip()
     assert link.startswith("/dev/pts/")
     state = packet_handset.run(["/usr/bin/stat", "-Lc", "%a", "/dev/ttyAPP0"]).stdout.decode()
