@@ -11,6 +11,7 @@ sys.path.insert(0, str(PROJECT))
 
 from tools.coverage import daemon, floors, parts, pc  # noqa: E402
 from tools.coverage.floors import FileCount, Floor, Share, judge  # noqa: E402
+from tools.suites import SUITES  # noqa: E402
 
 FLOOR = Floor("checksum", ("amt/amt-checksum.",), 97, 90)
 
@@ -70,6 +71,21 @@ def test_every_floor_names_files_that_are_there() -> None:
     for floor in (*floors.DAEMON, *floors.PC):
         for begin in floor.begins:
             assert any(path.startswith(begin) for path in listed), begin
+
+
+def test_what_counts_takes_its_place_among_the_suites(tmp_path: Path,
+                                                      monkeypatch: pytest.MonkeyPatch) -> None:
+    monkeypatch.setattr(daemon, "BUILD", tmp_path)
+    old = tmp_path / "amt" / "amt-cfg.gcda"
+    old.parent.mkdir()
+    old.write_bytes(b"")
+    ordinary = [suite for suite in SUITES if not suite.is_extra]
+    counted_by = daemon.counting(ordinary)
+    names = [suite.name for suite in ordinary]
+    assert [suite.name for suite in counted_by] == [
+        name.replace("unit", "unit-coverage") for name in names] + ["system-coverage"]
+    assert {suite.preset for suite in counted_by if "coverage" in suite.name} == {"coverage"}
+    assert not old.exists()
 
 
 def test_an_unknown_part_is_refused() -> None:

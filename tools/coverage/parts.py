@@ -24,7 +24,7 @@ class Part:
 
 
 PARTS = (
-    Part("daemon", daemon.counting, daemon.report, floors.DAEMON),
+    Part("daemon", daemon.counting, daemon.report, floors.DAEMON, (daemon.REPLACED,)),
     Part("pc", pc.counting, pc.report, floors.PC, pc.NAMES),
 )
 
