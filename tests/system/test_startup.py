@@ -12,6 +12,7 @@ from amt_simulator.waiting import scaled
 from amt_station.requests.catalogue import command_name
 from support.channels import AppChannel, PcChannel, integer, packet
 from support.registrations import APP_ROWS, PC_ROWS
+from support.replaced_cutils import replace_cutils
 from support.threads import wait_calm
 from support.trace import TAG, Trace, error_line
 
@@ -191,22 +192,16 @@ def test_start_against_a_dead_folder_fails_as_described(make_handset: HandsetFac
 
 # a system with one thread to give, by a library in the place of the usual one
 
-ONE_THREAD = Path(__file__).with_name("support") / "one_thread.c"
-CUTILS, OTHER = "/system/lib/libcutils.so", "/system/lib/libcutils-other.so"
-
 
 @pytest.mark.parametrize("mode, path, line", [
     ("pc", "init_for_amt_1_4", "pthread_create(): 11 - Resource temporarily unavailable"),
     ("packet", "init_for_amt_2_3", "pthread_create() fail: 11")])
 def test_start_without_a_thread_names_its_path(make_handset: HandsetFactory, tmp_path: Path,
                                                mode: str, path: str, line: str) -> None:
-    library = tmp_path / "libcutils.so"
-    subprocess.run(["cc", "-shared", "-fPIC", "-O1", "-o", library, ONE_THREAD], check=True)
     handset = make_handset(mode, ready=False, start=False, restart=False)
     if handset.program.sanitizer:
         pytest.skip("the sanitizer makes the threads itself")
-    handset.place(OTHER, handset.read(CUTILS))
-    handset.place(CUTILS, library)
+    replace_cutils(handset, tmp_path, "one_thread")
     handset.start()
     assert handset.wait_exit() == -118 & 0xFF
     texts = handset.log.texts(TAG)

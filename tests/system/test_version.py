@@ -1,7 +1,6 @@
 """Version queries: the fixed text, the modem's own versions, and the software text."""
 
 import re
-import subprocess
 from pathlib import Path
 
 import pytest
@@ -11,6 +10,7 @@ from amt_simulator import Handset
 from amt_station import wire
 from support.channels import ACK, PcChannel, integer, packet, raw
 from support.modem_desk import NOT_SERVED, OK, ModemDesk, refusal
+from support.replaced_cutils import replace_cutils
 from support.trace import Trace, error_line
 from support.traffic import APP_OUT, PC_OUT, PcTrace, dump
 
@@ -307,18 +307,12 @@ def test_any_other_brand(software: Software, customer: str | None, maker: str | 
 
 # Properties that cannot be read, by a library in the place of the usual one.
 
-SOURCE = Path(__file__).with_name("support") / "unreadable_properties.c"
-CUTILS, OTHER = "/system/lib/libcutils.so", "/system/lib/libcutils-other.so"
-
 
 @pytest.fixture
 def limited(make_handset: HandsetFactory, tmp_path: Path) -> Software:
     """As `software`, on a handset some of whose properties cannot be read."""
-    library = tmp_path / "libcutils.so"
-    subprocess.run(["cc", "-shared", "-fPIC", "-O1", "-o", library, SOURCE], check=True)
     handset = make_handset("pc", ready=False, start=False)
-    handset.place(OTHER, handset.read(CUTILS))
-    handset.place(CUTILS, library)
+    replace_cutils(handset, tmp_path, "unreadable_properties")
     handset.start()
     handset.wait_ready()
     return Software(handset)

@@ -1,17 +1,11 @@
 /*
  * The library of properties in a system that has one thread left to give, which the start itself runs on: every
- * later creation fails. Properties are the other library's, which lies beside it.
+ * later creation fails.
  */
 #define _GNU_SOURCE
-#include <dlfcn.h>
+#include "other_cutils.h"
+
 #include <errno.h>
-
-#define OTHER "/system/lib/libcutils-other.so"
-
-static void *find(const char *name)
-{
-    return dlsym(dlopen(OTHER, RTLD_NOW), name);
-}
 
 int pthread_create(void *thread, const void *attributes, void *(*body)(void *), void *argument)
 {
@@ -22,12 +16,5 @@ int pthread_create(void *thread, const void *attributes, void *(*body)(void *), 
 
 int property_get(const char *key, char *value, const char *default_value)
 {
-    int (*get)(const char *, char *, const char *) = find("property_get");
-    return get(key, value, default_value);
-}
-
-int property_set(const char *key, const char *value)
-{
-    int (*set)(const char *, const char *) = find("property_set");
-    return set(key, value);
+    return other_property_get(key, value, default_value);
 }
