@@ -1,6 +1,8 @@
 """Mode switching, the permission to enter by handshake, power-off, the boot-download flag."""
 
 import time
+from errno import EPERM
+from pathlib import Path
 
 import pytest
 
@@ -10,6 +12,7 @@ from amt_station import wire
 from support.channels import ACK, AppChannel, PcChannel, integer, packet
 from support.modem_desk import ERRORS, MODEM_FAILED, NOT_SERVED, OK, ModemDesk, refusal
 from support.moments import logged_at
+from support.replaced_cutils import replace_cutils
 from support.trace import Trace, error_line
 from support.traffic import APP_OUT, PC_OUT, PcTrace, dump
 
@@ -304,6 +307,24 @@ def test_power_off(make_handset: HandsetFactory, atoms: tuple[wire.Atom, ...]) -
     trace.expect("receive command id: 236(0xEC) - (undefined)", "amt_handle_power_off()",
                  dump(PC_OUT, wire.encode_envelope(packet(237, RESULT))))
     trace.expect_none("amt_handle_deinit()")
+
+
+def test_power_off_that_the_kernel_refuses(make_handset: HandsetFactory, tmp_path: Path) -> None:
+    handset = make_handset("pc", ready=False, start=False)
+    replace_cutils(handset, tmp_path, "no_power_off")
+    handset.start()
+    handset.wait_ready()
+    pc = PcChannel(handset)
+    trace = Trace(handset)
+    assert pc.request(236) == packet(237, RESULT)
+    pc.at("AT^DAMTOFF", OK.decode())
+    # Both are logged, and the daemon serves on.
+    pc.at("AT^DBTADDR=?", OK.decode())
+    failed = [f"sys call: reboot() failed! errno = {EPERM}",
+              error_line("amt_power_off_handset", -1, EPERM)]
+    trace.expect("amt_handle_power_off()", dump(PC_OUT, wire.encode_envelope(packet(237, RESULT))),
+                 *failed, *failed)
+    assert handset.exits() == []
 
 
 # boot download
