@@ -260,11 +260,14 @@ class Stage:
                 self.station.open(timeout=STEP_SECONDS)
                 return True
             except HandsetTimeout:
-                # Its reader has ended, and only the thread that takes signals is left.
-                self.given_up = len(self.look().threads) == 1
+                self.look_for_reader()
             except HandsetError:
                 return False  # the PC's line has been taken away
         return False
+
+    def look_for_reader(self) -> None:
+        """Note whether the app's reader has ended: only the thread that takes signals is left."""
+        self.given_up = self.is_app and len(self.look().threads) == 1
 
     def say(self, line: Line, data: bytes) -> None:
         """Say something to the daemon, and wait until it has done with it."""

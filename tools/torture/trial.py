@@ -202,6 +202,7 @@ class Trial:
         stage = self.stage
         if self._good.status is not None:
             # It was to end, and has not: a signal still ends it.
+            stage.look_for_reader()
             run.given_up = stage.given_up
             run.lives_on = not run.given_up
             if stage.terminate() != 0:
