@@ -99,6 +99,8 @@ RULES: tuple[Rule, ...] = (
     Rule(Kind.SILENT, "write", SEND, "a brightness is set, whoever is told", scene="app-lights"),
     *(Rule(Kind.SILENT, function, "", "a brightness that cannot be set is told nobody",
            scene="app-lights") for function in ("fopen", "fprintf", "fflush")),
+    Rule(Kind.SILENT, "write", SEND, "the handset is switched off, whoever is told",
+         scene="pc-power-off"),
     Rule(Kind.SILENT, "write", SEND, "nobody looks whether the satellite was told",
          scene="app-gps"),
     Rule(Kind.OTHERWISE, "getc", "", "a file that ends early says what it holds", "end"),
