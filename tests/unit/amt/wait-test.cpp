@@ -1,12 +1,16 @@
 #include "amt/amt-handle/channel/wait.h"
 
+#include <atomic>
 #include <chrono>
 #include <errno.h>
 #include <fcntl.h>
+#include <pthread.h>
+#include <sched.h>
 #include <signal.h>
 #include <string>
 #include <sys/select.h>
 #include <sys/time.h>
+#include <time.h>
 #include <unistd.h>
 
 #include <gtest/gtest.h>
@@ -16,6 +20,9 @@
 namespace {
 
 using steady_clock_t = std::chrono::steady_clock;
+
+/* Only what never happens takes so long. */
+constexpr time_t LATE_SECONDS = 20;
 
 long elapsed_ms(steady_clock_t::time_point start)
 {
@@ -166,6 +173,37 @@ TEST_F(wait_on_pipe, takes_its_time_whatever_signals_come)
     EXPECT_GE(elapsed_ms(begin), 150);
     EXPECT_LT(elapsed_ms(begin), 5000);
     EXPECT_GE(g_signal_count, 3);
+}
+
+std::atomic<bool> g_is_deferred;
+
+void *read_while_deferred(void *fd_ptr)
+{
+    pub_util_defer_thread_end();
+    g_is_deferred = true;
+    char byte = 0;
+    amt_wait_read(*static_cast<const int *>(fd_ptr), &byte, 1);
+    return fd_ptr;
+}
+
+TEST_F(wait_on_pipe, may_be_ended_in_a_read_though_its_end_is_deferred)
+{
+    struct sigaction action = {};
+    action.sa_handler = pub_util_handle_thread_signal;
+    ASSERT_EQ(sigaction(SIGUSR1, &action, nullptr), 0);
+    g_is_deferred = false;
+    pthread_t thread = 0;
+    ASSERT_EQ(pthread_create(&thread, nullptr, read_while_deferred, &m_fd_a[0]), 0);
+    while (!g_is_deferred) {
+        sched_yield();
+    }
+    ASSERT_EQ(pthread_kill(thread, SIGUSR1), 0);
+    timespec late = {};
+    clock_gettime(CLOCK_REALTIME, &late);
+    late.tv_sec += LATE_SECONDS;
+    void *returned = nullptr;
+    EXPECT_EQ(pthread_timedjoin_np(thread, &returned, &late), 0);
+    EXPECT_NE(returned, &m_fd_a[0]);
 }
 
 TEST_F(wait_on_pipe, keeps_whether_the_threads_end_is_deferred)
