@@ -34,6 +34,7 @@ struct value_st
     uint32_t m_length;
     char m_text_a[VALUE_LIMIT + 1];
 };
+static_assert(VALUE_LIMIT < sizeof(value_st::m_text_a));
 
 /* How a value is asked for and answered. */
 struct question_st

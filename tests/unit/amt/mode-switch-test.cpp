@@ -85,6 +85,15 @@ TEST_F(normal_to_amt, switches_the_modem_then_the_platform_then_ends)
     }
 }
 
+TEST_F(normal_to_amt, looks_for_the_ok_before_an_error)
+{
+    m_line.answer("\r\nERROR\r\n" + OK);
+    m_line.answer("\r\n+CMS ERROR: 1\r\n" + OK);
+    EXPECT_EQ(handle(2), PUB_ERR_NONE);
+    EXPECT_EQ(m_line.app_packets(), std::vector<std::string>{DONE});
+    EXPECT_EQ(g_end_count, 1);
+}
+
 TEST_F(normal_to_amt, leaves_a_serial_configuration_alone)
 {
     for (const char *const config : {"serial", "mtp,serial,adb"}) {

@@ -185,4 +185,23 @@ TEST(modem_tunnel, decodes_a_text_as_long_as_the_area)
     EXPECT_EQ(line.app_packets(), std::vector<std::string>{table_packet(std::string(2029, 'w'))});
 }
 
+TEST(modem_tunnel, shows_nothing_of_an_earlier_answer_behind_a_shorter_one)
+{
+    const modem_line_c line;
+    line.answer(table_answer("ED070000", std::string(4059, '7')) + OK);
+    EXPECT_EQ(line.handle(amt_modem_handle_req, REQUEST), PUB_ERR_NONE);
+    EXPECT_EQ(line.app_packets().size(), 1U);
+    line.answer(table_answer("EC0F0000", "41") + OK);
+    EXPECT_EQ(line.handle(amt_modem_handle_req, REQUEST), PUB_ERR_NONE);
+    EXPECT_EQ(line.app_packets(), std::vector<std::string>{table_packet("A" + std::string(4075, '\0'))});
+}
+
+TEST(modem_tunnel, looks_for_the_answer_and_the_ok_before_an_error)
+{
+    const modem_line_c line;
+    line.answer("\r\n+CME ERROR: 4\r\n" + table_answer("01000000", "31") + OK);
+    EXPECT_EQ(line.handle(amt_modem_handle_req, REQUEST), PUB_ERR_NONE);
+    EXPECT_EQ(line.app_packets(), std::vector<std::string>{table_packet("1")});
+}
+
 } // namespace

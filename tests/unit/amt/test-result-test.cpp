@@ -51,6 +51,14 @@ TEST(write_test_result, takes_126_characters_of_a_description)
     }
 }
 
+TEST(write_test_result, looks_for_the_ok_before_an_error)
+{
+    const modem_line_c line;
+    line.answer("\r\nERROR\r\n" + OK);
+    EXPECT_EQ(line.handle(amt_modem_write_test_result, verdict_request(91, 20, 1)), PUB_ERR_NONE);
+    EXPECT_EQ(line.app_packets(), std::vector<std::string>{wire_packet(92, int_atom(1, 0))});
+}
+
 TEST(write_test_result, goes_to_the_modem_when_the_mirror_fails)
 {
     const modem_line_c line;

@@ -206,6 +206,15 @@ TEST(modem_version_query, logs_its_command_and_its_result)
     EXPECT_TRUE(capture.has("get version success.type:17, version:[len:3 content:ABC]"));
 }
 
+TEST(modem_version_query, looks_for_the_ok_before_an_error)
+{
+    const modem_line_c line;
+    line.answer("\r\n+CME ERROR: 4\r\n\r\n^DCMR: 1,0D414243\r\n\r\nOK\r\n");
+    const log_capture_c capture;
+    EXPECT_EQ(line.handle(handle_amt_req_version, request(17)), PUB_ERR_NONE);
+    EXPECT_TRUE(capture.has("get version success.type:17, version:[len:3 content:ABC]"));
+}
+
 void expect_no_version(const std::string &answer, const std::string &expected_log)
 {
     const modem_line_c line;
