@@ -116,6 +116,12 @@ def test_the_mask_keeps_every_place(mask: Callable[[str], str], source: str) -> 
     assert [len(line) for line in code.split("\n")] == [len(line) for line in source.split("\n")]
 
 
+def test_what_a_type_checker_is_told_is_no_code() -> None:
+    source = "def f(a: int | None) -> int:\n    assert a is not None and a > 7\n    return a\n"
+    assert [(mutant.operator, mutant.line) for mutant in mutants_of("f.py", source)] == [
+        ("return", 3)]
+
+
 def test_the_mask_leaves_only_code() -> None:
     code = masked(SOURCE)
     assert "include" not in code and "LESS" not in code and "3" not in code and "40" in code

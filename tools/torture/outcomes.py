@@ -84,6 +84,11 @@ RULES: tuple[Rule, ...] = (
       for function in ("fopen", "getc") for scene in ("start-on-ac-power", "start-not-permitted")),
     Rule(Kind.OTHERWISE, "read", READ, "an answer of two pieces that has become one is understood",
          "nothing", "app-channel-switch-split"),
+    *(Rule(Kind.LIVES_ON, function, "", "without a timer nobody is too late")
+      for function in ("timer_create", "timer_settime")),
+    Rule(Kind.LIVES_ON, "write", "amt_modem_write_request",
+         "a modem that was not asked says nothing, and its word starts the timer",
+         scene="handshake-too-late"),
     Rule(Kind.LIVES_ON, "reboot", "", "a handset that may not be switched off goes on"),
     Rule(Kind.LIVES_ON, "read", READ, "a read of nothing never ends a reader", "nothing"),
     Rule(Kind.ENDED, "write", "amt_handle_read_modem_loop", "a PC that takes not all is gone"),
