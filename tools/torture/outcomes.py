@@ -74,7 +74,7 @@ RULES: tuple[Rule, ...] = (
     Rule(Kind.UNHEARD, "write", SEND, "a refusal that is lost is told when the next request comes"),
     Rule(Kind.OTHERWISE, "write", SEND, "a refusal behind an answer is lost as any other",
          scene="app-tunnel-packet-then-error"),
-    Rule(Kind.OTHERWISE, "read", READ, "what the modem says behind a loss is the rest of its answer",
+    Rule(Kind.OTHERWISE, "read", READ, "what a modem says behind a loss is the rest of its answer",
          "EIO", "app-modem-dies"),
     Rule(Kind.SILENT, "write", "amt_modem_write_request",
          "a modem's line that is lost is opened again", "EIO"),
