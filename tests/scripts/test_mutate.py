@@ -152,17 +152,17 @@ def test_of_the_code_itself(sources: Callable[[], dict[str, str]], path: str,
 @pytest.mark.parametrize("name", sorted(draw.known_equal(draw.EQUAL.read_text())))
 def test_what_is_known_to_be_equal_is_still_a_mutant(name: str) -> None:
     path = name.split(":", 1)[0]
-    assert name in {draw.without_line(mutant)
+    assert name in {mutant.listed
                     for mutant in mutants_of(path, (PROJECT / path).read_text())}
 
 
 def test_the_list_of_equal_ones() -> None:
-    text = "# a word\n\na.cpp: text: \"#\" -> \"x\" # nobody reads it\n"
-    assert draw.known_equal(text) == {'a.cpp: text: "#" -> "x"': "nobody reads it"}
+    text = "# a word\n\na.cpp: f(\"#\");: text: \"#\" -> \"x\" # nobody reads it\n"
+    assert draw.known_equal(text) == {'a.cpp: f("#");: text: "#" -> "x"': "nobody reads it"}
 
 
 def mutant(number: int) -> Mutant:
-    return Mutant("a.cpp", "constant", number, number + 1, "2", number, "1")
+    return Mutant("a.cpp", "constant", number, number + 1, "2", number, "1", "f(1);")
 
 
 def test_the_score(capsys: pytest.CaptureFixture[str], tmp_path: Path,
@@ -181,7 +181,7 @@ def test_the_score(capsys: pytest.CaptureFixture[str], tmp_path: Path,
         "survived: a.cpp:9: constant: 1 -> 2\n"
         "    ./dev mutate --of daemon --only a.cpp:9:constant\n"
         "3 of 4 mutants found, 75.0 %; 0 more are known to be equal\n")
-    equal.write_text("a.cpp: constant: 1 -> 2 # nobody can tell\n")
+    equal.write_text("a.cpp: f(1);: constant: 1 -> 2 # nobody can tell\n")
     assert mutate.report([*found, lost], []) == 0
     assert capsys.readouterr().out.endswith("\n3 of 3 mutants found, 100.0 %; 1 more are known to "
                                             "be equal\n")

@@ -54,14 +54,8 @@ def _by_kind(path: str, source: str) -> dict[str, list[Mutant]]:
 def known_equal(text: str) -> dict[str, str]:
     """Mutants that nobody can tell from the program, and why: `TEXT # REASON`, a line each.
 
-    The text is how a mutant shows itself, without its line's number: lines move.
+    The text is `listed` of the mutant.
     """
     rows = (line.rsplit(" # ", 1) for line in text.splitlines()
             if line.strip() and not line.startswith("#"))
     return {row[0].strip(): row[1].strip() for row in rows}
-
-
-def without_line(mutant: Mutant) -> str:
-    """How a list names a mutant."""
-    path, _line, rest = str(mutant).split(":", 2)
-    return f"{path}:{rest}"

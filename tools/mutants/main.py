@@ -7,7 +7,7 @@ from typing import Callable, Iterator, Mapping, Protocol, Sequence
 
 from tools.arguments import positive
 from tools.mutants.daemon_workshop import DaemonWorkshop
-from tools.mutants.draw import EQUAL, drawn, known_equal, pc_sources, sources, without_line
+from tools.mutants.draw import EQUAL, drawn, known_equal, pc_sources, sources
 from tools.mutants.fate import Fate, Trial
 from tools.mutants.operators import Mutant
 from tools.mutants.pc_workshop import PcWorkshop
@@ -61,7 +61,7 @@ def report(trials: Sequence[Trial], others: Sequence[Trial]) -> int:
     """Say what became of all; 1 when one has survived that is not known to be equal."""
     known = known_equal(EQUAL.read_text())
     equal = [trial.mutant for trial in trials
-             if trial.fate is Fate.SURVIVED and without_line(trial.mutant) in known]
+             if trial.fate is Fate.SURVIVED and trial.mutant.listed in known]
     say("mutants")
     for fate in Fate:
         count = sum(trial.fate is fate for trial in [*trials, *others])
@@ -70,7 +70,7 @@ def report(trials: Sequence[Trial], others: Sequence[Trial]) -> int:
     lost = [trial.mutant for trial in trials
             if trial.fate is Fate.SURVIVED and trial.mutant not in equal]
     for mutant in equal:
-        print(f"equal: {mutant} ({known[without_line(mutant)]})")
+        print(f"equal: {mutant} ({known[mutant.listed]})")
     for mutant in lost:
         print(f"survived: {mutant}\n    ./dev mutate --of {subject(mutant)} --only {mutant.name}")
     print(score(trials, equal), flush=True)

@@ -29,6 +29,8 @@ class Mutant:
     text: str
     line: int
     before: str
+    # The line of code that it is in, or begins in.
+    code: str = ""
 
     @property
     def name(self) -> str:
@@ -39,12 +41,20 @@ class Mutant:
         """The source with the defect."""
         return source[:self.start] + self.text + source[self.end:]
 
-    def __str__(self) -> str:
+    @property
+    def listed(self) -> str:
+        """How a list names it: without numbers, which move."""
+        return f"{self.path}: {self.code}: {self._change}"
+
+    @property
+    def _change(self) -> str:
         def short(text: str) -> str:
             return " ".join(text.split()) or "nothing"
 
-        return (f"{self.path}:{self.line}: {self.operator}: "
-                f"{short(self.before)} -> {short(self.text)}")
+        return f"{self.operator}: {short(self.before)} -> {short(self.text)}"
+
+    def __str__(self) -> str:
+        return f"{self.path}:{self.line}: {self._change}"
 
 
 def _swap(pairs: dict[str, str]) -> Replace:
@@ -156,6 +166,7 @@ def mutants_of(path: str, source: str) -> Iterator[Mutant]:
     """Every mutant of one file."""
     mask, operators = LANGUAGES[path.rpartition(".")[2]]
     code = mask(source)
+    lines = source.split("\n")
     for operator in operators:
         for match in operator.pattern.finditer(code):
             start, end = match.span("it") if "it" in match.groupdict() else match.span()
@@ -163,4 +174,5 @@ def mutants_of(path: str, source: str) -> Iterator[Mutant]:
             text = operator.replace(match, original)
             if text != original:
                 line = source.count("\n", 0, start) + 1
-                yield Mutant(path, operator.name, start, end, text, line, original)
+                yield Mutant(path, operator.name, start, end, text, line, original,
+                             lines[line - 1].strip())
