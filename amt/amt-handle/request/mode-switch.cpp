@@ -132,8 +132,9 @@ int amt_handle_not_permit_handshake(uint32_t channel, amt_buf_st *req_ptr, amt_b
     if (enter_with_any_request(channel, req_ptr, rsp_ptr) != PUB_ERR_NONE) {
         return PUB_ERR_PARAM;
     }
-    int flag = 0;
-    if (const int status = handle_amt_damt1_operation(static_cast<int>(amt_permission_en::FORBID), &flag);
+    int same_flag = 0;
+    if (const int status =
+            handle_amt_damt1_operation(static_cast<int>(amt_permission_en::FORBID), &same_flag);
         status != PUB_ERR_NONE)
     {
         return status;
