@@ -185,6 +185,17 @@ TEST(modem_tunnel, decodes_a_text_as_long_as_the_area)
     EXPECT_EQ(line.app_packets(), std::vector<std::string>{table_packet(std::string(2029, 'w'))});
 }
 
+TEST(modem_tunnel, fills_with_zeros_what_would_lie_behind_the_area)
+{
+    const modem_line_c line;
+    /* What is sent may lie there: digits would be seen. */
+    line.answer(table_answer("EC0F0000", std::string(4059, '7')) + OK); /* 4076 */
+    EXPECT_EQ(line.handle(amt_modem_handle_req, wire_packet(0x2F, bytes_atom(4, std::string(2000, '\x5A')))),
+              PUB_ERR_NONE);
+    const std::string data = std::string(2029, 'w') + '\x70' + std::string(2046, '\0');
+    EXPECT_EQ(line.app_packets(), std::vector<std::string>{table_packet(data)});
+}
+
 TEST(modem_tunnel, shows_nothing_of_an_earlier_answer_behind_a_shorter_one)
 {
     const modem_line_c line;
