@@ -183,7 +183,7 @@ def test_start_waits_a_second_for_the_pc_port(pc_handset: Handset) -> None:
     assert 0.99 <= paused % 86400 < scaled(3.0)
 
 
-def test_start_against_a_dead_folder_fails_as_described(make_handset: HandsetFactory) -> None:
+def test_start_against_a_dead_folder_ends_by_the_fatal_error(make_handset: HandsetFactory) -> None:
     handset = make_handset("packet", ready=False, restart=False,
                            config={"vx.tty.app": "/nowhere/ttyAPP0"})
     assert handset.wait_exit() == -118 & 0xFF
