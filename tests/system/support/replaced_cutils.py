@@ -15,7 +15,7 @@ def replace_cutils(handset: Handset, folder: Path, name: str) -> None:
     The handset must not have been started yet; the ordinary library stays beside the new one.
     """
     library = folder / "libcutils.so"
-    subprocess.run(["cc", "-shared", "-fPIC", "-O1", "-o", library, SOURCES / f"{name}.c"],
-                   check=True)
+    subprocess.run(["cc", "-shared", "-fPIC", "-O1", "-o", library, SOURCES / f"{name}.c",
+                    SOURCES / "other_cutils.c"], check=True)
     handset.place(OTHER, handset.read(CUTILS))
     handset.place(CUTILS, library)

@@ -1,7 +1,7 @@
 /* The library of properties in a system whose kernel will not be switched off: every such wish is refused. */
-#include "other_cutils.h"
-
 #include <errno.h>
+
+int other_property_get(const char *key, char *value, const char *default_value);
 
 int reboot(int command)
 {

@@ -3,9 +3,10 @@
  * later creation fails.
  */
 #define _GNU_SOURCE
-#include "other_cutils.h"
-
+#include <dlfcn.h>
 #include <errno.h>
+
+int other_property_get(const char *key, char *value, const char *default_value);
 
 int pthread_create(void *thread, const void *attributes, void *(*body)(void *), void *argument)
 {

@@ -2,10 +2,10 @@
  * The library of properties in which some cannot be read: those whose names /handset/unreadable.txt lists, a line
  * each, give neither a value nor the default.
  */
-#include "other_cutils.h"
-
 #include <stdio.h>
 #include <string.h>
+
+int other_property_get(const char *key, char *value, const char *default_value);
 
 static int is_unreadable(const char *key)
 {

@@ -1,6 +1,6 @@
 /*
- * For a library in the place of the one of properties: what it does not want to do itself it has the ordinary one
- * do, which lies beside it.
+ * Built into each library in the place of the one of properties: what that does not want to do itself it has the
+ * ordinary one do, which lies beside it.
  */
 #include <dlfcn.h>
 
@@ -11,7 +11,7 @@ static void *find(const char *name)
     return dlsym(dlopen(OTHER, RTLD_NOW), name);
 }
 
-static inline int other_property_get(const char *key, char *value, const char *default_value)
+int other_property_get(const char *key, char *value, const char *default_value)
 {
     int (*get)(const char *, char *, const char *) = find("property_get");
     return get(key, value, default_value);
