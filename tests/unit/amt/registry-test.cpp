@@ -174,7 +174,7 @@ TEST_F(registry, takes_ids_up_to_254)
     const log_capture_c capture;
     errno = 0;
     EXPECT_EQ(amt_handle_reg_handle_func(AMT_TABLE_PC, 254, serve_first), PUB_ERR_NONE);
-    EXPECT_EQ(g_handle_context.m_handle_pc_func_a[254], serve_first);
+    EXPECT_EQ(g_handle_context.m_handle_pc_func_a[254], &serve_first);
     for (const uint32_t id : {255U, 256U, 0xFFFFFFFFU}) {
         EXPECT_EQ(amt_handle_reg_handle_func(AMT_TABLE_PC, id, serve_first), PUB_ERR_PARAM);
         EXPECT_EQ(amt_handle_reg_handle_func(AMT_TABLE_APP, id, serve_first), PUB_ERR_PARAM);
@@ -202,7 +202,7 @@ TEST_F(registry, replaces_a_handler)
     amt_handle_reg_handle_func(AMT_TABLE_PC, 9, serve_first);
     const log_capture_c capture;
     EXPECT_EQ(amt_handle_reg_handle_func(AMT_TABLE_PC, 9, serve_second), PUB_ERR_NONE);
-    EXPECT_EQ(g_handle_context.m_handle_pc_func_a[9], serve_second);
+    EXPECT_EQ(g_handle_context.m_handle_pc_func_a[9], &serve_second);
     EXPECT_EQ(capture.texts(), (texts_t{"WARNING !", "re-register the handle function of request id: 9",
                                         "PC register command id: 9(0x09) - AMT_READ_BATTERY_CMD"}));
 }

@@ -69,7 +69,7 @@ TEST(priority, is_the_calling_thread_s_too)
 
 TEST(priority, refused_policy)
 {
-    const child_run_st run = run_in_child(pub_util_raise_process_priority, {SYS_sched_setscheduler, EPERM});
+    const child_run_st run = run_in_child(&pub_util_raise_process_priority, {SYS_sched_setscheduler, EPERM});
     if (!run.m_is_complete) {
         GTEST_SKIP() << "no system call can be refused here";
     }
@@ -82,7 +82,7 @@ TEST(priority, refused_policy)
 TEST(priority, unknown_range)
 {
     const child_run_st run =
-        run_in_child(pub_util_raise_process_priority, {SYS_sched_get_priority_max, EINVAL});
+        run_in_child(&pub_util_raise_process_priority, {SYS_sched_get_priority_max, EINVAL});
     if (!run.m_is_complete) {
         GTEST_SKIP() << "no system call can be refused here";
     }
