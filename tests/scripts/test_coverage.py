@@ -88,6 +88,22 @@ def test_what_counts_takes_its_place_among_the_suites(tmp_path: Path,
     assert not old.exists()
 
 
+def test_only_who_is_asked_to_counts(tmp_path: Path, monkeypatch: pytest.MonkeyPatch) -> None:
+    for name, path in (("WORK", tmp_path), ("STARTER", tmp_path / "start"),
+                       ("SETTINGS", tmp_path / "settings.ini"), ("DATA", tmp_path / "counts")):
+        monkeypatch.setattr(pc, name, path)
+    suite, = pc.counting([suite for suite in SUITES if suite.name in pc.NAMES])
+    code = "import sys; print('coverage' in sys.modules)"
+
+    def said(**more: str) -> str:
+        return subprocess.run([sys.executable, "-c", code], check=True, capture_output=True,
+                              text=True, env=more).stdout
+
+    assert said(**suite.environment) == "True\n"
+    assert list(tmp_path.glob("counts.*"))
+    assert said(PYTHONPATH=suite.environment["PYTHONPATH"]) == "False\n"
+
+
 def test_an_unknown_part_is_refused() -> None:
     ended = subprocess.run([sys.executable, "-P", "-m", "tools", "coverage.main", "everything"],
                            cwd=PROJECT, check=False, capture_output=True, text=True,

@@ -18,6 +18,9 @@ REPORT = PROJECT / "build" / "coverage-pc-report"
 PACKAGES = ("amt_station", "amt_line")
 SETTINGS, STARTER, DATA = WORK / "settings.ini", WORK / "start", WORK / "counts"
 
+# Where a process that counts finds its settings.
+STARTS = "COVERAGE_PROCESS_START"
+
 # The suites whose tests run the packages, or start what runs them.
 NAMES = ("station",)
 
@@ -32,9 +35,12 @@ def _prepare() -> dict[str, str]:
         f"concurrency = thread,multiprocessing\nsource =\n    {sources}\n"
         "[report]\nexclude_lines =\n    pragma: no cover\n    if TYPE_CHECKING:\n"
         "    raise NotImplementedError\n    ^\\s*\\.\\.\\.$\n")
-    (STARTER / "sitecustomize.py").write_text("import coverage\ncoverage.process_startup()\n")
+    # Who takes the variable away is not counted, and imports nothing for it either.
+    (STARTER / "sitecustomize.py").write_text(
+        f"import os\nif '{STARTS}' in os.environ:\n    import coverage\n"
+        "    coverage.process_startup()\n")
     paths = [str(STARTER), os.environ.get("PYTHONPATH", "")]
-    return {"COVERAGE_PROCESS_START": str(SETTINGS),
+    return {STARTS: str(SETTINGS),
             "PYTHONPATH": os.pathsep.join(path for path in paths if path)}
 
 
