@@ -36,6 +36,15 @@ def test_the_daemon_does_what_the_model_says(request: pytest.FixtureRequest, bui
     assert len(outcome.steps) >= FEWEST_STEPS
 
 
+def test_the_number_in_front_of_the_smallest_is_the_largest(build: str) -> None:
+    """A long run found the model to be wrong here."""
+    wrapping = Step(steps.APP_PACKET, command=230,
+                    atoms=(("int", 39, -2147483648), ("int", 36, 2)))
+    outcome = repeat(build, [wrapping])
+    assert not outcome.error, outcome.error
+    assert outcome.steps == [wrapping]
+
+
 def test_a_difference_is_found_told_and_shortened(build: str, tmp_path: Path,
                                                   monkeypatch: pytest.MonkeyPatch) -> None:
     """A model that is wrong in one place stands for a daemon that is."""

@@ -6,7 +6,8 @@ from typing import Callable, Mapping
 
 from amt_station import wire
 from tools.stateful import phone as handset
-from tools.stateful.phone import REFUSED, Phone, Reply, answer, content, integer, number, text
+from tools.stateful.phone import (REFUSED, Phone, Reply, answer, content, integer, number, signed,
+                                  text)
 
 Handler = Callable[[Phone, wire.Packet], Reply]
 
@@ -163,8 +164,8 @@ def read_item(phone: Phone, packet: wire.Packet) -> Reply:
 
 
 def write_item(phone: Phone, packet: wire.Packet) -> Reply:
-    """Stored in front of the station's number."""
-    stored = phone.store_result(handset.PRODUCT_RESULTS, number(packet, 39) - 1,
+    """Stored in front of the station's number; in front of the smallest one is the largest."""
+    stored = phone.store_result(handset.PRODUCT_RESULTS, signed(number(packet, 39) - 1),
                                 number(packet, 36))
     return answer(231, result=0 if stored else 10)
 
