@@ -78,6 +78,8 @@ bool parse_options(int argc, char **argv, int *exit_status_ptr)
 
 void set_paths(const char *cfg_folder, const char *pid_folder)
 {
+    memset(g_cfg_path_a, 0, sizeof(g_cfg_path_a));
+    memset(g_pid_path_a, 0, sizeof(g_pid_path_a));
     snprintf(g_cfg_path_a, sizeof(g_cfg_path_a), "%s/%s.cfg", cfg_folder, PROGRAM);
     snprintf(g_pid_path_a, sizeof(g_pid_path_a), "%s/%s.pid", pid_folder, PROGRAM);
 }
