@@ -143,7 +143,7 @@ int start(int mode)
 void start_up()
 {
     /* A shell command has SIGINT ignored: it must not begin before the main thread waits for its signals. */
-    amt_signal_settle();
+    amt_signal_await_taker();
     int exit_status = 0;
     if (!parse_options(g_argument_count, g_argument_ptr, &exit_status)) {
         _exit(exit_status);

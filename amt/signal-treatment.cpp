@@ -4,12 +4,15 @@
 #include <errno.h>
 #include <pthread.h>
 #include <signal.h>
+#include <stdio.h>
+#include <string.h>
 #include <time.h>
 #include <unistd.h>
 
 #include "amt/amt-handle/channel/process-end.h"
 #include "amt/amt-handle/startup.h"
 #include "amt/amt-log.h"
+#include "pub/file/file.h"
 #include "pub/util/signal-table.h"
 #include "pub/util/thread-end.h"
 
@@ -18,12 +21,18 @@ namespace {
 /* Seconds of one sleep of the main thread, which sleeps for ever. */
 constexpr time_t SLEEP_SECONDS = 0xFFFFFFF;
 constexpr uint32_t SETTLE_PAUSE_MS = 1;
+constexpr uint32_t STAT_PATH_SIZE = 48;
+constexpr uint32_t STAT_LINE_SIZE = 128;
+constexpr char ASLEEP[] = ") S ";
 
 constexpr int treated_signal_a[] = {SIGINT, SIGTERM, SIGSEGV, SIGBUS, SIGUSR2};
 static_assert(SIGUSR2 == 12); /* the number is what counts for who sends it */
 
 pthread_t g_main_thread;
 amt_worker_st *g_starter_ptr = nullptr;
+
+/* Set by the main thread when nothing but its wait for signals is left to it. */
+std::atomic<bool> g_is_taking{false};
 
 /* Set by the starter, with a SIGUSR1 behind it; cleared by the main thread. */
 std::atomic<bool> g_is_to_settle{false};
@@ -109,6 +118,23 @@ void install_signal_treatment()
     }
 }
 
+/*
+ * Whether the main thread sleeps. Its state stands behind the program's name, in parentheses, which may hold some
+ * itself. Where the system does not tell, it counts as asleep. (/proc/self/stat holds the state too, but an
+ * emulator may put its own file there.)
+ */
+bool is_main_thread_asleep()
+{
+    char path_a[STAT_PATH_SIZE];
+    char line_a[STAT_LINE_SIZE];
+    snprintf(path_a, sizeof(path_a), "/proc/self/task/%d/stat", static_cast<int>(getpid()));
+    if (pub_file_read_line(path_a, line_a, sizeof(line_a)) != pub_file_step_en::DONE) {
+        return true;
+    }
+    const char *const end_ptr = strrchr(line_a, ')');
+    return end_ptr == nullptr || strncmp(end_ptr, ASLEEP, sizeof(ASLEEP) - 1) == 0;
+}
+
 void answer_starter()
 {
     if (!g_is_to_settle) {
@@ -142,6 +168,7 @@ void amt_signal_take(amt_worker_st *starter_ptr)
 {
     g_starter_ptr = starter_ptr;
     const sigset_t taken = get_taken_set();
+    g_is_taking = true;
     for (;;) {
         const timespec time = {SLEEP_SECONDS, 0};
         const int signal_number = sigtimedwait(&taken, nullptr, &time);
@@ -150,6 +177,14 @@ void amt_signal_take(amt_worker_st *starter_ptr)
         } else if (signal_number > 0) {
             end_by_signal(signal_number);
         }
+    }
+}
+
+void amt_signal_await_taker()
+{
+    /* One that is about to wait may be displaced just before, so it must be seen asleep; but an end sleeps, too. */
+    while (!g_is_taking || !is_main_thread_asleep() || amt_process_end_has_begun()) {
+        pub_util_sleep_ms(SETTLE_PAUSE_MS);
     }
 }
 

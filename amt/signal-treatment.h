@@ -29,6 +29,12 @@ void amt_signal_prepare();
 [[noreturn]] void amt_signal_take(amt_worker_st *starter_ptr);
 
 /*
+ * For the starter, before its first shell command: waits until the main thread waits for signals. If one that
+ * ends the process was sent before, this call does not return.
+ */
+void amt_signal_await_taker();
+
+/*
  * For the starter: waits until the main thread has looked at the signals sent so far. If there was one that
  * ends the process, this call does not return.
  */

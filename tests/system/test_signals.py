@@ -6,6 +6,7 @@ import signal
 import time
 from collections.abc import Callable
 from contextlib import suppress
+from pathlib import Path
 
 import pytest
 
@@ -15,12 +16,17 @@ from amt_simulator.errors import HandsetError
 from amt_simulator.waiting import scaled, wait_until
 from amt_station import wire
 from support.channels import AppChannel, PcChannel, flag, integer
+from support.replaced_cutils import replace_cutils
 from support.slow_shell import SlowShell
 from support.threads import wait_calm
 from support.trace import Trace
 
 NAMES = {2: "SIGINT", 15: "SIGTERM", 11: "SIGSEGV", 7: "SIGBUS", 12: "SIGUSR2"}
 SOON = 1.0
+# The library late_wait lets nobody wait for signals for a while, and while the first file is
+# there; it makes the second when somebody would.
+DISPLACED, DISPLACED_NOW = "/tmp/displaced", "/tmp/displaced-now"
+DISPLACED_S = 0.5
 APP_LINK = "/dev/ttyAPP0"
 PID_FILE = "vx-kel-amt.pid"
 PROGRAM = "/system/bin/vx-kel-amt"
@@ -90,6 +96,37 @@ def test_interrupt_while_a_start_s_command_runs(make_handset: HandsetFactory, pa
     handset, shell = start_with_slow_shell(make_handset, path, text, ready=False)
     shell.wait_held()
     end_by(handset, signal.SIGINT)
+
+
+@pytest.mark.parametrize("path", ["pc", "packet"])
+def test_interrupt_while_a_displaced_start_s_command_runs(make_handset: HandsetFactory, path: str,
+                                                          tmp_path: Path) -> None:
+    handset = make_handset(path, ready=False, start=False)
+    replace_cutils(handset, tmp_path, "late_wait")
+    shell = SlowShell(handset, PID_FILE)
+    shell.hold()
+    handset.start()
+    shell.wait_held()
+    end_by(handset, signal.SIGINT)
+
+
+@pytest.mark.parametrize("number", [signal.SIGINT, signal.SIGTERM])
+def test_signal_before_the_first_wait_leaves_nothing_of_the_start(
+        make_handset: HandsetFactory, number: int, tmp_path: Path) -> None:
+    handset = make_handset("pc", ready=False, start=False)
+    replace_cutils(handset, tmp_path, "late_wait")
+    handset.place(DISPLACED, "")
+    handset.start()
+    handset.wait_file(DISPLACED_NOW)
+
+    def send_and_let_wait() -> None:
+        handset.signal(number)
+        handset.place(DISPLACED, None)
+
+    expect_end(handset, send_and_let_wait, soon=SOON + DISPLACED_S)
+    texts = handset.log.texts()
+    assert texts[:2] == ["signal_treatment()", f"receive signal: {number} - {NAMES[number]}"]
+    assert "pub_util_get_pid_and_check_run()" not in texts
 
 
 def test_interrupt_in_the_pause_before_the_station_s_port_is_set(
