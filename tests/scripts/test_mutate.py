@@ -171,19 +171,19 @@ def test_the_score(capsys: pytest.CaptureFixture[str], tmp_path: Path,
     equal.write_text("")
     monkeypatch.setattr(mutate, "EQUAL", equal)
     found = [Trial(mutant(number), fate) for number, fate in
-             enumerate((Fate.UNIT, Fate.AREA, Fate.SYSTEM))]
+             enumerate((Fate.UNIT, Fate.AREA, Fate.SYSTEM, Fate.SANITIZED))]
     lost = Trial(mutant(9), Fate.SURVIVED)
     assert mutate.report(found, [Trial(mutant(8), Fate.SAME)]) == 0
     assert capsys.readouterr().out == (
-        "3 of 3 mutants found, 100.0 %; 0 more are known to be equal\n")
+        "4 of 4 mutants found, 100.0 %; 0 more are known to be equal\n")
     assert mutate.report([*found, lost], []) == 1
     assert capsys.readouterr().out == (
         "survived: a.cpp:9: constant: 1 -> 2\n"
         "    ./dev mutate --of daemon --only a.cpp:9:constant\n"
-        "3 of 4 mutants found, 75.0 %; 0 more are known to be equal\n")
+        "4 of 5 mutants found, 80.0 %; 0 more are known to be equal\n")
     equal.write_text("a.cpp: f(1);: constant: 1 -> 2 # nobody can tell\n")
     assert mutate.report([*found, lost], []) == 0
-    assert capsys.readouterr().out.endswith("\n3 of 3 mutants found, 100.0 %; 1 more are known to "
+    assert capsys.readouterr().out.endswith("\n4 of 4 mutants found, 100.0 %; 1 more are known to "
                                             "be equal\n")
 
 
@@ -194,6 +194,27 @@ def test_the_area_of_a_source() -> None:
     assert workshop.area("amt/amt-handle/at/at-radio.cpp")[0] == "tests/system/test_at_commands.py"
     assert all(name.startswith("tests/system/") for name in
                workshop.area("amt/amt-handle/at/at-radio.cpp"))
+
+
+@pytest.mark.parametrize("finder, fate", [
+    ("unit release", Fate.UNIT), ("a.py", Fate.AREA), ("tests/system", Fate.SYSTEM),
+    ("unit asan", Fate.SANITIZED), ("nobody", Fate.SURVIVED)])
+def test_the_stages(finder: str, fate: Fate, monkeypatch: pytest.MonkeyPatch) -> None:
+    """In this order, each only when the one before has found nothing."""
+    workshop = DaemonWorkshop.__new__(DaemonWorkshop)
+    tried: list[str] = []
+
+    def run(stage: str) -> str:
+        tried.append(stage)
+        return "a test" if stage == finder else ""
+
+    monkeypatch.setattr(workshop, "area", lambda path: ["a.py"])
+    monkeypatch.setattr(workshop, "_build", lambda preset: (0, ""))
+    monkeypatch.setattr(workshop, "_unit", lambda preset="release": run(f"unit {preset}"))
+    monkeypatch.setattr(workshop, "_system", lambda tests: run(*tests))
+    assert workshop._tested(mutant(1)).fate is fate
+    stages = ["unit release", "a.py", "tests/system", "unit asan"]
+    assert tried == stages[:stages.index(finder) + 1 if finder in stages else None]
 
 
 def test_the_area_of_a_package(monkeypatch: pytest.MonkeyPatch) -> None:

@@ -46,11 +46,12 @@ def quietly(command: Sequence[str],
     return status, b"".join(said).decode(errors="replace")
 
 
-def failing_test(*arguments: str) -> str:
+def failing_test(*arguments: str, environment: Mapping[str, str] | None = None) -> str:
     """The name of a test in Python that fails; empty when all pass, or there is none."""
     status, said = quietly(
         [sys.executable, "-m", "pytest", "-q", "-x", "-p", "no:cacheprovider",
-         f"--timeout={TEST_SECONDS}", *arguments], {"CI": "1"})
+         f"--timeout={TEST_SECONDS}", *arguments],
+        {"CI": "1", **(environment or {})})
     if status in (0, 5):
         return ""
     found = re.search(r"^(?:FAILED|ERROR) (\S+)", said, re.MULTILINE)

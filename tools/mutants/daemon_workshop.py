@@ -9,12 +9,15 @@ from tools.mutants.copy import COPY, TEST_SECONDS, bring_up_to_date, failing_tes
 from tools.mutants.fate import Fate, Trial
 from tools.mutants.operators import Mutant
 from tools.project import CORES, PROJECT, die
-from tools.suites import SYSTEM_WORKERS
+from tools.suites import PATIENCE, SYSTEM_WORKERS
 
 PRESET = "release"
-BUILD = COPY / "build" / PRESET
-PROGRAM = BUILD / "bin" / "vx-kel-amt"
+# What reads or writes one byte too far may do it without a trace elsewhere.
+SANITIZED_PRESET = "asan"
+BUILDS = COPY / "build"
+PROGRAM = BUILDS / PRESET / "bin" / "vx-kel-amt"
 UNIT_PROGRAMS = ("amt-unit-tests", "pub-unit-tests")
+TARGETS = {PRESET: ("handset", *UNIT_PROGRAMS), SANITIZED_PRESET: UNIT_PROGRAMS}
 # Most of a unit test is waiting, too.
 UNIT_JOBS = 4 * CORES
 
@@ -26,25 +29,25 @@ class DaemonWorkshop:
         self._note = note
         self._rows = read_rows((PROJECT / DOCUMENT).read_text())
         bring_up_to_date()
-        self._build_all()
+        self._note("building what the mutants are made of")
+        for preset in (PRESET, SANITIZED_PRESET):
+            self._make(preset)
         self._whole = PROGRAM.read_bytes()
 
-    def _build_all(self) -> None:
-        self._note("building what the mutants are made of")
-        status, said = quietly(["cmake", "--preset", PRESET])
+    def _make(self, preset: str) -> None:
+        status, said = quietly(["cmake", "--preset", preset])
         if status == 0:
-            status, said = self._build()
+            status, said = self._build(preset)
         if status != 0:
             die(f"the copy cannot be built:\n{said[-2000:]}")
 
-    def _build(self) -> tuple[int, str]:
-        return quietly(["cmake", "--build", "--preset", PRESET, "--target", "handset",
-                        *UNIT_PROGRAMS])
+    def _build(self, preset: str = PRESET) -> tuple[int, str]:
+        return quietly(["cmake", "--build", "--preset", preset, "--target", *TARGETS[preset]])
 
     def check(self) -> None:
         """Everything passes as it is; else a found mutant says nothing."""
         self._note("testing what the mutants are made of")
-        failed = self._unit() or self._system(["tests/system"])
+        failed = self._unit() or self._system(["tests/system"]) or self._sanitized()
         if failed:
             die(f"without any mutant {failed} fails already")
 
@@ -67,7 +70,8 @@ class DaemonWorkshop:
         stages: list[tuple[Fate, Callable[[], str]]] = [(Fate.UNIT, self._unit)]
         if area:
             stages.append((Fate.AREA, lambda: self._system(area)))
-        stages.append((Fate.SYSTEM, lambda: self._system(["tests/system"])))
+        stages += [(Fate.SYSTEM, lambda: self._system(["tests/system"])),
+                   (Fate.SANITIZED, self._sanitized)]
         for fate, run in stages:
             failed = run()
             if failed:
@@ -84,10 +88,16 @@ class DaemonWorkshop:
                   sorted((COPY / "tests" / "system").glob(f"test_*{stem}*.py"))]
         return list(dict.fromkeys(tests))
 
-    def _unit(self) -> str:
+    def _sanitized(self) -> str:
+        """The same with the sanitizer's build, which is made only here: it takes its time."""
+        if self._build(SANITIZED_PRESET)[0] != 0:
+            return ""
+        return self._unit(SANITIZED_PRESET)
+
+    def _unit(self, preset: str = PRESET) -> str:
         """The name of a unit test that fails; empty when all pass."""
         status, said = quietly(
-            ["ctest", "--test-dir", str(BUILD), "--no-tests=error", "-j", str(UNIT_JOBS),
+            ["ctest", "--test-dir", str(BUILDS / preset), "--no-tests=error", "-j", str(UNIT_JOBS),
              "--stop-on-failure", "--timeout", str(TEST_SECONDS), "-R", r"^(amt|pub)\."])
         if status == 0:
             return ""
@@ -97,4 +107,4 @@ class DaemonWorkshop:
     def _system(self, tests: Sequence[str]) -> str:
         """The same with system tests; those of the programs on the PC say nothing."""
         return failing_test("-n", str(SYSTEM_WORKERS), "-m", "not pc_side",
-                            f"--handset-build={BUILD}", *tests)
+                            f"--handset-build={BUILDS / PRESET}", *tests, environment=PATIENCE)

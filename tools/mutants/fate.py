@@ -14,12 +14,13 @@ class Fate(Enum):
     UNIT = "found by the unit tests"
     AREA = "found by the tests of its area"
     SYSTEM = "found by the other tests"
+    SANITIZED = "found by the sanitized unit tests"
     SURVIVED = "survived"
 
     @property
     def is_found(self) -> bool:
         """Whether a test has found it."""
-        return self in (Fate.UNIT, Fate.AREA, Fate.SYSTEM)
+        return self in (Fate.UNIT, Fate.AREA, Fate.SYSTEM, Fate.SANITIZED)
 
 
 @dataclass(frozen=True)

@@ -82,7 +82,7 @@ def main() -> int:
     parser = argparse.ArgumentParser(
         prog="./dev mutate", description="Put small defects into a copy of the project, one at a "
         "time, and see whether the tests find them: the unit tests, then those of the area, then "
-        "all.")
+        "all, then the unit tests with a sanitizer.")
     parser.add_argument("number", nargs="?", type=positive, default=30, metavar="N",
                         help="how many (default: %(default)s; one takes half a minute, one that "
                         "survives four)")
