@@ -160,6 +160,15 @@ TEST(log, flags_line)
     EXPECT_THAT(capture.texts(), testing::ElementsAre("1", "0, 1, 0", "1, 1, 1, 1, 1, 1, 1, 1"));
 }
 
+TEST(log, flags_line_holds_eleven)
+{
+    const log_capture_c capture;
+    pub_log_flags(g_test_log, {true, true, true, true, true, true, true, true, true, true, false});
+    pub_log_flags(g_test_log, {true, true, true, true, true, true, true, true, true, true, false, true});
+    EXPECT_THAT(capture.texts(),
+                testing::ElementsAre("1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 0", "1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 0"));
+}
+
 TEST(log, dump_shows_up_to_250_bytes)
 {
     EXPECT_EQ(dump_text(0), "title: (data_len = 0) -- ");
