@@ -37,6 +37,15 @@ def no_folder(desk: ModemDesk) -> Iterator[None]:
     away.rename(folder)
 
 
+@pytest.fixture
+def read_only_folder(desk: ModemDesk, no_folder: None) -> Iterator[None]:
+    """The folder of the factory files cannot be written to."""
+    folder = desk.handset.path("/amt")
+    folder.symlink_to("/usr")
+    yield
+    folder.unlink()
+
+
 def file_of(count: int, **items: int) -> bytes:
     """A file of verdicts: untested, but for the items given as i3=2."""
     digits = {int(name[1:]): digit for name, digit in items.items()}
@@ -455,6 +464,11 @@ def test_items_without_their_folder(desk: ModemDesk, no_folder: None) -> None:
         error_line("readProductResult", -1, 2),
         "access folder(/amt) failure. errorr: 2 - No such file or directory",
         "amt_item_read_test_result station_num[2] station_result[-1]")
+
+
+def test_items_in_a_folder_that_cannot_be_written(desk: ModemDesk, read_only_folder: None) -> None:
+    write_item(desk, 2, 1, ITEM_WRITE_FAILED).expect(
+        error_line("saveProductResult", -1, 30), "Save fail: Directory access deny\\n")
 
 
 def test_items_that_are_no_file(desk: ModemDesk) -> None:
