@@ -1,13 +1,11 @@
 """The app's line on the running daemon: dispatch, refusals, and an app that comes and goes."""
 
 import re
-from pathlib import Path
 
 from conftest import HandsetFactory
 from amt_simulator import Handset
 from amt_simulator.waiting import wait_until
 from support.channels import AppChannel, integer, packet
-from support.replaced_cutils import replace_cutils
 from support.threads import threads_of, wait_calm
 from support.trace import Trace, error_line
 from support.traffic import APP_IN, APP_OUT, dump
@@ -135,33 +133,6 @@ def test_app_line_that_cannot_be_made_again(make_handset: HandsetFactory) -> Non
     wait_until(lambda: len(handset.inspect().threads) == threads_of(handset) - 1 or None,
                "the end of the app's reader")
     assert [text for text in handset.log.texts(PTY_TAG) if text.endswith("failed")]
-    # The daemon itself goes on, and ends as ever.
-    assert handset.exits() == []
-    assert handset.stop() == 0
-
-
-def test_app_line_whose_read_fails(make_handset: HandsetFactory, tmp_path: Path) -> None:
-    handset = make_handset("packet", ready=False, start=False, restart=False)
-    replace_cutils(handset, tmp_path, "app_read_error")
-    handset.start()
-    handset.wait_ready()
-    app = AppChannel(handset)
-    assert app.request(9).result == 0
-    before = set(wait_calm(handset).threads)
-    master = next(number for number, name in handset.inspect().descriptors.items()
-                  if "ptmx" in name)
-    name = link(handset)
-    trace = Trace(handset)
-    handset.place("/handset/app-read-error", "")
-    app.send_packet(9)
-    gone = wait_until(lambda: before - set(handset.inspect().threads) or None,
-                      "the end of the app's reader")
-    assert len(gone) == 1
-    trace.expect("sys call: read() failed! errno = 19",
-                 error_line("amt_handle_read_app_loop", -1, 19),
-                 f"pty disconnect: pts name({name}), pts mapping name(/dev/ttyAPP0), "
-                 f"thread id({gone.pop()}), PTM fd({master})")
-    assert link(handset) == ""
     # The daemon itself goes on, and ends as ever.
     assert handset.exits() == []
     assert handset.stop() == 0

@@ -39,7 +39,7 @@ def test_bt_address_write_and_read(pc: PcChannel) -> None:
     assert not pc.handset.path(BT_FILE_2).exists()
     assert trace.calls() == ["sync() = 0", "sync() = 0"]
     trace.expect(error_line("get_bt_addr_file", -118, NO_ENTRY),
-                 f'can not access file "{BT_FILE}" or "{BT_FILE_2}"')
+                 f'can not access file "{BT_FILE}" or "{BT_FILE_2}"', f"write BT address: {MAC}")
     pc.at("AT^DBTADDR?", value("DBTADDR", MAC))
     pc.at("AT^DBTADDR=?", OK)
     # The new address is shorter than the old one.
@@ -54,7 +54,9 @@ def test_bt_address_comes_from_the_first_file_that_exists(pc: PcChannel) -> None
     pc.handset.place(BT_FILE, " \n\tfirst\nmore\n")
     pc.at("AT^DBTADDR?", value("DBTADDR", "first"))
     pc.handset.place(BT_FILE, "")
+    trace = Trace(pc.handset)
     pc.at("AT^DBTADDR?", CME)
+    trace.expect("get_bt_addr_file()", error_line("read_bt_address", -100), "read not completed")
 
 
 def test_bt_address_is_written_where_one_is(pc: PcChannel) -> None:
@@ -87,10 +89,15 @@ def test_bt_address_write_failures(pc: PcChannel) -> None:
     trace = Trace(pc.handset)
     pc.at('AT^DBTADDR="1"', CME)
     assert trace.calls() == []
+    trace.expect(error_line("write_bt_address", -118, IS_DIRECTORY),
+                 f'open("{BT_FILE}") fail: 21 - Is a directory')
     pc.handset.path(BT_FILE).rmdir()
     pc.handset.path(BT_FILE).symlink_to("/dev/full")
+    trace = Trace(pc.handset)
     pc.at('AT^DBTADDR="1"', CME)
     assert trace.syncs == 2
+    trace.expect(error_line("write_bt_address", -118, NO_SPACE), "fputs() fail")
+    trace.expect_none("write BT address: 1")
 
 
 # Wi-Fi address

@@ -1,66 +1,177 @@
 /*
- * The library of properties in a system in which single calls fail: each while its file in /handset/fail is there.
- * memory: what is as large as the picture. inflate: every piece. timer: its id is -1, as a system may number it.
- * station: a text that begins with a line called REFUSED cannot be written.
+ * The library of properties in a system in which single calls fail, each while its file in /handset/fail is there.
+ * With an errno where the call has one:
+ *
+ *   app-read      what a pseudo-terminal's master has is lost          app-empty   it has nothing, at once
+ *   fopen         of the file whose path the file holds                ptmx        no pseudo-terminal can be opened
+ *   pts-name      it is what the file holds
+ *   station       a text whose first line is REFUSED cannot be written
+ *   tcgetattr, tcsetattr, thread, fork, system                         always
+ *   timer         its id is -1, as a system may number it
+ *   memory        for what is as large as the picture
+ *   inflate-init, inflate                                              always
  */
 #define _GNU_SOURCE
 #include <dlfcn.h>
 #include <errno.h>
-#include <stddef.h>
+#include <fcntl.h>
+#include <stdarg.h>
+#include <stdio.h>
 #include <string.h>
-#include <sys/types.h>
 #include <unistd.h>
 
+#define FAIL "/handset/fail/"
 #define PICTURE_SIZE (346 * 390 * 2)
 #define STREAM_DAMAGED (-3)
+#define STREAM_MEMORY (-4)
 #define REFUSED "\r\nREFUSED"
+#define OTHER(type, name, ...) ((type(*)(__VA_ARGS__))dlsym(RTLD_NEXT, name))
 
 int other_property_get(const char *key, char *value, const char *default_value);
 void *__libc_malloc(size_t size);
 
-static int is_to_fail(const char *path)
+/* Whether the call is to fail; errno is its then. */
+static int is_to_fail(const char *path, int error)
 {
     const int saved_errno = errno;
     const int is_there = access(path, F_OK) == 0;
-    errno = saved_errno;
+    errno = is_there ? error : saved_errno;
     return is_there;
 }
 
-void *malloc(size_t size)
+static int is_master(int descriptor)
 {
-    if (size == PICTURE_SIZE && is_to_fail("/handset/fail/memory")) {
-        errno = ENOMEM;
-        return NULL;
-    }
-    return __libc_malloc(size);
+    char path[48];
+    char target[64] = "";
+    snprintf(path, sizeof(path), "/proc/self/fd/%d", descriptor);
+    return readlink(path, target, sizeof(target) - 1) > 0 && strstr(target, "ptmx") != NULL;
 }
 
-int inflate(void *stream, int flush)
+ssize_t read(int descriptor, void *buffer, size_t size)
 {
-    int (*other)(void *, int) = dlsym(RTLD_NEXT, "inflate");
-    return is_to_fail("/handset/fail/inflate") ? STREAM_DAMAGED : other(stream, flush);
+    if (is_to_fail(FAIL "app-empty", 0) && is_master(descriptor)) {
+        return 0;
+    }
+    const ssize_t count = OTHER(ssize_t, "read", int, void *, size_t)(descriptor, buffer, size);
+    if (count > 0 && is_master(descriptor) && is_to_fail(FAIL "app-read", ENODEV)) {
+        return -1;
+    }
+    return count;
+}
+
+ssize_t write(int descriptor, const void *data, size_t size)
+{
+    if (size >= strlen(REFUSED) && memcmp(data, REFUSED, strlen(REFUSED)) == 0 &&
+        is_to_fail(FAIL "station", ENOSPC))
+    {
+        return -1;
+    }
+    return OTHER(ssize_t, "write", int, const void *, size_t)(descriptor, data, size);
+}
+
+/* What the file holds; empty without one. */
+static void get_wish(const char *path, char *text, size_t size)
+{
+    const int descriptor = open(path, O_RDONLY | O_CLOEXEC);
+    text[0] = '\0';
+    if (descriptor >= 0) {
+        const ssize_t count = OTHER(ssize_t, "read", int, void *, size_t)(descriptor, text, size - 1);
+        text[count < 0 ? 0 : count] = '\0';
+        close(descriptor);
+    }
+}
+
+static int is_unopenable(const char *path)
+{
+    char wanted[128];
+    get_wish(FAIL "fopen", wanted, sizeof(wanted));
+    return wanted[0] != '\0' && strcmp(path, wanted) == 0;
+}
+
+int ptsname_r(int descriptor, char *name, size_t size)
+{
+    get_wish(FAIL "pts-name", name, size);
+    return name[0] != '\0' ? 0 : OTHER(int, "ptsname_r", int, char *, size_t)(descriptor, name, size);
+}
+
+FILE *fopen(const char *path, const char *mode)
+{
+    if (is_unopenable(path)) {
+        errno = EMFILE;
+        return NULL;
+    }
+    return OTHER(FILE *, "fopen", const char *, const char *)(path, mode);
+}
+
+int open(const char *path, int flags, ...)
+{
+    va_list arguments;
+    va_start(arguments, flags);
+    const int mode = va_arg(arguments, int);
+    va_end(arguments);
+    if (strcmp(path, "/dev/ptmx") == 0 && is_to_fail(FAIL "ptmx", ENOSPC)) {
+        return -1;
+    }
+    return OTHER(int, "open", const char *, int, ...)(path, flags, mode);
+}
+
+int tcgetattr(int descriptor, void *attributes)
+{
+    return is_to_fail(FAIL "tcgetattr", EIO) ? -1 : OTHER(int, "tcgetattr", int, void *)(descriptor, attributes);
+}
+
+int tcsetattr(int descriptor, int when, const void *attributes)
+{
+    return is_to_fail(FAIL "tcsetattr", EIO)
+               ? -1
+               : OTHER(int, "tcsetattr", int, int, const void *)(descriptor, when, attributes);
+}
+
+int pthread_create(void *thread, const void *attributes, void *(*body)(void *), void *argument)
+{
+    const int saved_errno = errno;
+    if (is_to_fail(FAIL "thread", saved_errno)) {
+        return EAGAIN;
+    }
+    return OTHER(int, "pthread_create", void *, const void *, void *(*)(void *), void *)(thread, attributes,
+                                                                                         body, argument);
+}
+
+pid_t fork(void)
+{
+    return is_to_fail(FAIL "fork", EAGAIN) ? -1 : OTHER(pid_t, "fork", void)();
+}
+
+int system(const char *command)
+{
+    return is_to_fail(FAIL "system", EAGAIN) ? -1 : OTHER(int, "system", const char *)(command);
 }
 
 int timer_create(int clock, void *event, void **timer)
 {
-    int (*other)(int, void *, void **) = dlsym(RTLD_NEXT, "timer_create");
-    if (!is_to_fail("/handset/fail/timer")) {
-        return other(clock, event, timer);
+    const int saved_errno = errno;
+    if (!is_to_fail(FAIL "timer", saved_errno)) {
+        return OTHER(int, "timer_create", int, void *, void **)(clock, event, timer);
     }
     *timer = (void *)-1L;
     return 0;
 }
 
-ssize_t write(int descriptor, const void *data, size_t size)
+void *malloc(size_t size)
 {
-    ssize_t (*other)(int, const void *, size_t) = dlsym(RTLD_NEXT, "write");
-    if (size >= strlen(REFUSED) && memcmp(data, REFUSED, strlen(REFUSED)) == 0 &&
-        is_to_fail("/handset/fail/station"))
-    {
-        errno = ENOSPC;
-        return -1;
-    }
-    return other(descriptor, data, size);
+    return size == PICTURE_SIZE && is_to_fail(FAIL "memory", ENOMEM) ? NULL : __libc_malloc(size);
+}
+
+int inflateInit2_(void *stream, int bits, const char *version, int size)
+{
+    return is_to_fail(FAIL "inflate-init", ENOMEM)
+               ? STREAM_MEMORY
+               : OTHER(int, "inflateInit2_", void *, int, const char *, int)(stream, bits, version, size);
+}
+
+int inflate(void *stream, int flush)
+{
+    return is_to_fail(FAIL "inflate", 0) ? STREAM_DAMAGED : OTHER(int, "inflate", void *, int)(stream, flush);
 }
 
 int property_get(const char *key, char *value, const char *default_value)
