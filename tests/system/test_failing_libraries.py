@@ -20,7 +20,7 @@ from test_screen import PREPARED, Operator
 FAILURES = "/handset/fail"
 TIME = "%m-%d %H:%M:%S.%f"
 IO_ERROR, AGAIN, NO_DEVICE, TOO_MANY_FILES, NO_SPACE = 5, 11, 19, 24, 28
-VOLTAGE, CARD, BT, CALIBRATE, READ_ITEM = 9, 137, 170, 226, 228
+VOLTAGE, CARD, CAMERA, BT, CALIBRATE, READ_ITEM = 9, 137, 139, 170, 226, 228
 CALIBRATE_HANDLER = "amt_device_battery_voltage_check"
 
 
@@ -183,6 +183,18 @@ def test_bluetooth_without_a_child(make_handset: HandsetFactory, tmp_path: Path)
     trace.expect_handler("amt_device_bt", device_error("amt_device_bt", -118, AGAIN),
                          "error to exec: hciattach")
     assert trace.calls() == []
+
+
+def test_camera_as_descriptor_0(make_handset: HandsetFactory, tmp_path: Path) -> None:
+    handset = served(make_handset, tmp_path, "packet")
+    app = AppChannel(handset)
+    assert app.request(CAMERA).result == 0
+    fail(handset, "camera")
+    assert 0 in handset.inspect().descriptors
+    trace = HandlerTrace(handset)
+    assert app.request(CAMERA) == refusal(CAMERA)
+    trace.expect_handler("amt_device_camera", device_error("amt_device_camera", -100))
+    assert 0 not in handset.inspect().descriptors
 
 
 def test_card_without_the_list_of_mounts(make_handset: HandsetFactory, tmp_path: Path) -> None:

@@ -3,6 +3,7 @@
  * With an errno where the call has one:
  *
  *   app-read      what a pseudo-terminal's master has is lost          app-empty   it has nothing, at once
+ *   camera        its descriptor is 0, as where nobody has one
  *   fopen         of the file whose path the file holds                ptmx        no pseudo-terminal can be opened
  *   pts-name      it is what the file holds
  *   station       a text whose first line is REFUSED cannot be written
@@ -112,7 +113,13 @@ int open(const char *path, int flags, ...)
     if (strcmp(path, "/dev/ptmx") == 0 && is_to_fail(FAIL "ptmx", ENOSPC)) {
         return -1;
     }
-    return OTHER(int, "open", const char *, int, ...)(path, flags, mode);
+    const int descriptor = OTHER(int, "open", const char *, int, ...)(path, flags, mode);
+    if (descriptor > 0 && strcmp(path, "/dev/video0") == 0 && is_to_fail(FAIL "camera", errno)) {
+        dup2(descriptor, 0);
+        close(descriptor);
+        return 0;
+    }
+    return descriptor;
 }
 
 int tcgetattr(int descriptor, void *attributes)
