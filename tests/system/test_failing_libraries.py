@@ -105,6 +105,9 @@ def test_timer_whose_id_says_that_there_is_none(make_handset: HandsetFactory,
     handset.log.wait(invalid)
     trace.expect("timer_create, error, id is -1.", invalid)
     trace.expect_none(re.compile("createTimer success.*"))
+    # The real-time clock, a thread for the notice, and what nobody looks at.
+    assert handset.text(f"{FAILURES}/timer") == (
+        "clock 0 notify 2 signal 32 value 111 attributes (nil)\n")
 
 
 # the lines

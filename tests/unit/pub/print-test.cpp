@@ -1,12 +1,68 @@
 #include "pub/log/print.h"
 
+#include <atomic>
 #include <errno.h>
+#include <fcntl.h>
+#include <signal.h>
 #include <string>
+#include <sys/time.h>
+#include <thread>
 #include <unistd.h>
 
 #include <gtest/gtest.h>
 
 namespace {
+
+constexpr int PIPE_SIZE = 4096;
+constexpr int ALARM_COUNT = 3;
+
+std::atomic<int> g_alarm_count{0};
+
+void count_alarm(int)
+{
+    g_alarm_count++;
+}
+
+/* Interrupts the thread that makes it every few milliseconds while it lives; those made meanwhile are spared. */
+class alarms_c {
+public:
+    alarms_c()
+    {
+        g_alarm_count = 0;
+        struct sigaction action = {};
+        action.sa_handler = count_alarm; /* no SA_RESTART: a waiting write ends */
+        sigaction(SIGALRM, &action, &m_saved_action);
+        set(5000);
+    }
+    ~alarms_c()
+    {
+        set(0);
+        sigaction(SIGALRM, &m_saved_action, nullptr);
+    }
+    alarms_c(const alarms_c &) = delete;
+    alarms_c &operator=(const alarms_c &) = delete;
+
+private:
+    static void set(suseconds_t us)
+    {
+        const itimerval value = {{0, us}, {0, us}};
+        setitimer(ITIMER_REAL, &value, nullptr);
+    }
+
+    struct sigaction m_saved_action = {};
+};
+
+/* A thread that takes no alarm. */
+template <typename body_t> std::thread start_spared(body_t body)
+{
+    sigset_t alarm;
+    sigemptyset(&alarm);
+    sigaddset(&alarm, SIGALRM);
+    pthread_sigmask(SIG_BLOCK, &alarm, nullptr);
+    std::thread thread(body);
+    pthread_sigmask(SIG_UNBLOCK, &alarm, nullptr);
+    return thread;
+}
 
 /* Puts another descriptor in the place of standard output while it lives. */
 class stdout_swap_c {
@@ -67,6 +123,37 @@ TEST_F(print, long_text_is_cut_at_4607_bytes)
     EXPECT_EQ(take(), std::string(4607, 'a'));
     pub_print("%s", std::string(4608, 'b').c_str());
     EXPECT_EQ(take(), std::string(4607, 'b'));
+}
+
+TEST_F(print, text_is_whole_though_its_writes_are_interrupted)
+{
+    if (fcntl(m_pipe_a[1], F_SETPIPE_SZ, PIPE_SIZE) != PIPE_SIZE) {
+        GTEST_SKIP() << "no pipe of " << PIPE_SIZE << " bytes";
+    }
+    std::string text;
+    for (int i = 0; text.size() < PIPE_SIZE + 400; i++) {
+        text += std::to_string(i) + " ";
+    }
+    std::string taken;
+    std::thread reader = start_spared([&] {
+        while (g_alarm_count < ALARM_COUNT) {
+            std::this_thread::yield();
+        }
+        for (std::string piece = take(); !piece.empty(); piece = take()) {
+            taken += piece;
+        }
+    });
+    {
+        const stdout_swap_c swap(m_pipe_a[1]);
+        const alarms_c alarms;
+        pub_print("%s", text.c_str());
+    }
+    EXPECT_GE(g_alarm_count, ALARM_COUNT);
+    g_alarm_count = ALARM_COUNT; /* the reader must not wait where nobody was interrupted */
+    close(m_pipe_a[1]);
+    m_pipe_a[1] = -1;
+    reader.join();
+    EXPECT_EQ(taken, text);
 }
 
 TEST_F(print, errno_survives_a_closed_output)

@@ -8,7 +8,7 @@
  *   pts-name      it is what the file holds
  *   station       a text whose first line is REFUSED cannot be written
  *   tcgetattr, tcsetattr, thread, fork, system                         always
- *   timer         its id is -1, as a system may number it
+ *   timer         its id is -1, as a system may number it; what was wished for is written into the file
  *   memory        for what is as large as the picture
  *   inflate-init, inflate                                              always
  */
@@ -16,6 +16,7 @@
 #include <dlfcn.h>
 #include <errno.h>
 #include <fcntl.h>
+#include <signal.h>
 #include <stdarg.h>
 #include <stdio.h>
 #include <string.h>
@@ -154,11 +155,17 @@ int system(const char *command)
     return is_to_fail(FAIL "system", EAGAIN) ? -1 : OTHER(int, "system", const char *)(command);
 }
 
-int timer_create(int clock, void *event, void **timer)
+int timer_create(int clock, struct sigevent *event, void **timer)
 {
     const int saved_errno = errno;
     if (!is_to_fail(FAIL "timer", saved_errno)) {
-        return OTHER(int, "timer_create", int, void *, void **)(clock, event, timer);
+        return OTHER(int, "timer_create", int, struct sigevent *, void **)(clock, event, timer);
+    }
+    FILE *stream = OTHER(FILE *, "fopen", const char *, const char *)(FAIL "timer", "w");
+    if (stream != NULL) {
+        fprintf(stream, "clock %d notify %d signal %d value %d attributes %p\n", clock, event->sigev_notify,
+                event->sigev_signo, event->sigev_value.sival_int, event->sigev_notify_attributes);
+        fclose(stream);
     }
     *timer = (void *)-1L;
     return 0;
