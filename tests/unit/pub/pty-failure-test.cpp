@@ -250,6 +250,15 @@ TEST_F(pty, mapping_of_what_is_no_terminal)
     EXPECT_FALSE(is_link(m_mapping));
 }
 
+TEST_F(pty, descriptor_0_is_open_but_no_terminal_s_master)
+{
+    m_pty.m_ptm_fd = 0;
+    const log_capture_c capture;
+    EXPECT_EQ(create_pts_mapping(&m_pty), PUB_ERR_FILE);
+    EXPECT_EQ(capture.count_containing("[PTY]"), 0);
+    m_pty.m_ptm_fd = -1;
+}
+
 TEST_F(pty, mapping_of_a_closed_or_absent_channel)
 {
     m_pty.m_ptm_fd = -1;
