@@ -193,6 +193,19 @@ def test_start_against_a_dead_folder_ends_by_the_fatal_error(make_handset: Hands
 # a system with one thread to give, by a library in the place of the usual one
 
 
+@pytest.mark.parametrize("path, loops", [
+    ("pc", ["amt_handle_read_pc_loop()", "amt_handle_read_modem_loop()"]),
+    ("packet", ["amt_handle_read_app_loop()"])])
+def test_readers_say_that_they_have_begun(make_handset: HandsetFactory, path: str,
+                                          loops: list[str]) -> None:
+    handset = make_handset(path)
+    for loop in loops:
+        handset.log.wait(loop)
+    begun = [text for text in handset.log.texts(TAG)
+             if re.fullmatch(r"amt_handle_read_\w+_loop\(\)", text)]
+    assert sorted(begun) == sorted(loops)
+
+
 @pytest.mark.parametrize("mode, path, line", [
     ("pc", "init_for_amt_1_4", "pthread_create(): 11 - Resource temporarily unavailable"),
     ("packet", "init_for_amt_2_3", "pthread_create() fail: 11")])
