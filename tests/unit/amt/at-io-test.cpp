@@ -16,6 +16,7 @@
 #include "tests/unit/amt/modem-pty.h"
 #include "tests/unit/amt/small-file.h"
 #include "tests/unit/support/log-lines.h"
+#include "tests/unit/support/temp-folder.h"
 
 namespace {
 
@@ -312,6 +313,20 @@ TEST(at_read, of_nothing_after_a_hang_up_is_a_loss)
     EXPECT_EQ(channel.m_tty.hear(10), SILENCE);
     EXPECT_TRUE(capture.has("read_at read_len_ptr[-1] buf_ptr[]"));
     EXPECT_TRUE(capture.has("read_at ret_val[-118]"));
+}
+
+TEST(at_read, of_nothing_after_the_reopening_has_no_errno)
+{
+    const lost_channel_c channel;
+    const temp_folder_c folder;
+    /* A file in the place of the tty: the wish for silence goes over its beginning, and nothing is behind the consent. */
+    write_whole_file(folder.path("tty"), std::string(SILENCE) + CONSENT);
+    snprintf(g_amt_cfg.m_tty_at_mux_a, sizeof(g_amt_cfg.m_tty_at_mux_a), "%s", folder.path("tty").c_str());
+    const log_capture_c capture;
+    const read_st result = read_some(100);
+    EXPECT_EQ(result.m_status, PUB_ERR_FAIL);
+    EXPECT_EQ(result.m_count, 0);
+    EXPECT_EQ(without_line_numbers(capture).back(), fail_line("read_at", -100, 0));
 }
 
 TEST(at_read, a_tty_that_stays_lost_gives_the_error_of_its_opening)

@@ -38,6 +38,18 @@ TEST(context, never_closes_descriptor_0)
     EXPECT_TRUE(is_open(STDIN_FILENO));
 }
 
+TEST(context, closes_descriptor_1)
+{
+    const int saved_fd = dup(STDOUT_FILENO);
+    ASSERT_GT(saved_fd, STDOUT_FILENO);
+    std::atomic<int> fd{STDOUT_FILENO};
+    amt_handle_close_fd(&fd);
+    const bool is_closed = !is_open(STDOUT_FILENO);
+    dup2(saved_fd, STDOUT_FILENO);
+    close(saved_fd);
+    EXPECT_TRUE(is_closed);
+}
+
 TEST(context, closes_once_for_two_threads)
 {
     for (int i = 0; i < 200; i++) {

@@ -1,6 +1,8 @@
 #include "amt/amt-handle/request/nvram-file.h"
 
 #include <errno.h>
+#include <stdio.h>
+#include <string>
 
 #include <gtest/gtest.h>
 
@@ -30,6 +32,19 @@ copy_st copy(const std::string &source, const char *address)
     const pub_file_st out(folder.path("copy").c_str(), pub_file_mode_en::RENEW);
     const int status = amt_nvram_copy(in, out, address);
     return {status, read_whole_file(folder.path("copy"))};
+}
+
+/* Writes into a std::string, but says that the first piece could not be written. */
+ssize_t lose_first_piece(void *taken_ptr, const char *data, size_t size)
+{
+    std::string &taken = *static_cast<std::string *>(taken_ptr);
+    if (taken.empty()) {
+        taken = "lost ";
+        errno = ENOSPC;
+        return 0;
+    }
+    taken.append(data, size);
+    return static_cast<ssize_t>(size);
 }
 
 std::string make_lines(int count)
@@ -161,6 +176,21 @@ TEST(nvram_file, a_full_file_system_is_a_failure)
               (std::vector<std::string>{
                   error_line("amt/amt-handle", "amt_write_wifi_to_nvram_file", PUB_ERR_FAIL, ENOSPC),
                   "sys call: fputs() failed! errno = " + std::to_string(ENOSPC)}));
+}
+
+TEST(nvram_file, a_piece_that_is_lost_is_a_failure_though_the_rest_is_written)
+{
+    const temp_folder_c folder;
+    write_whole_file(folder.path("source"), "a=1\nb=2\n");
+    const pub_file_st in(folder.path("source").c_str(), pub_file_mode_en::READ);
+    pub_file_st out("/dev/null", pub_file_mode_en::RENEW);
+    fclose(out.m_stream_ptr);
+    std::string taken;
+    const cookie_io_functions_t functions = {nullptr, lose_first_piece, nullptr, nullptr};
+    out.m_stream_ptr = fopencookie(&taken, "w", functions);
+    setvbuf(out.m_stream_ptr, nullptr, _IONBF, 0);
+    EXPECT_EQ(amt_nvram_copy(in, out, ""), PUB_ERR_FAIL);
+    EXPECT_EQ(taken, "lost b=2\n");
 }
 
 TEST(nvram_file, address_lines_are_not_counted)
