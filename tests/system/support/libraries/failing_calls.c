@@ -29,7 +29,6 @@
 #define REFUSED "\r\nREFUSED"
 #define OTHER(type, name, ...) ((type(*)(__VA_ARGS__))dlsym(RTLD_NEXT, name))
 
-int other_property_get(const char *key, char *value, const char *default_value);
 void *__libc_malloc(size_t size);
 
 /* Whether the call is to fail; errno is its then. */
@@ -186,9 +185,4 @@ int inflateInit2_(void *stream, int bits, const char *version, int size)
 int inflate(void *stream, int flush)
 {
     return is_to_fail(FAIL "inflate", 0) ? STREAM_DAMAGED : OTHER(int, "inflate", void *, int)(stream, flush);
-}
-
-int property_get(const char *key, char *value, const char *default_value)
-{
-    return other_property_get(key, value, default_value);
 }

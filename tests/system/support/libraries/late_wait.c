@@ -12,8 +12,6 @@
 #define WISH "/tmp/displaced"
 #define BEGUN "/tmp/displaced-now"
 
-int other_property_get(const char *key, char *value, const char *default_value);
-
 static long long now_ns(void)
 {
     struct timespec now;
@@ -28,9 +26,4 @@ int sigtimedwait(const void *set, void *info, const struct timespec *timeout)
     for (long long end = now_ns() + DISPLACED_NS; now_ns() < end || access(WISH, F_OK) == 0;) {
     }
     return wait(set, info, timeout);
-}
-
-int property_get(const char *key, char *value, const char *default_value)
-{
-    return other_property_get(key, value, default_value);
 }

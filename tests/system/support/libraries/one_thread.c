@@ -6,16 +6,9 @@
 #include <dlfcn.h>
 #include <errno.h>
 
-int other_property_get(const char *key, char *value, const char *default_value);
-
 int pthread_create(void *thread, const void *attributes, void *(*body)(void *), void *argument)
 {
     static int given = 0;
     int (*create)(void *, const void *, void *(*)(void *), void *) = dlsym(RTLD_NEXT, "pthread_create");
     return given++ == 0 ? create(thread, attributes, body, argument) : EAGAIN;
-}
-
-int property_get(const char *key, char *value, const char *default_value)
-{
-    return other_property_get(key, value, default_value);
 }

@@ -17,6 +17,12 @@ int other_property_get(const char *key, char *value, const char *default_value)
     return get(key, value, default_value);
 }
 
+/* Weak: a library that replaces other calls only need not have its own. */
+__attribute__((weak)) int property_get(const char *key, char *value, const char *default_value)
+{
+    return other_property_get(key, value, default_value);
+}
+
 int property_set(const char *key, const char *value)
 {
     int (*set)(const char *, const char *) = find("property_set");
