@@ -9,8 +9,9 @@ import pytest
 from conftest import HandsetFactory
 from amt_simulator import Handset
 from amt_simulator.waiting import wait_until
-from support.channels import OK, AppChannel, PcChannel, integer
-from support.handler import DEVICE, HandlerTrace, device_error, done, refusal
+from support.channels import OK, AppChannel, PcChannel, integer, packet
+from support.handler import (DEVICE, IO_ERROR, NO_DEVICE, NO_SPACE, HandlerTrace, device_error,
+                             done, refusal)
 from support.replaced_cutils import replace_cutils
 from support.threads import wait_calm
 from support.trace import Trace, error_line
@@ -19,7 +20,7 @@ from test_screen import PREPARED, Operator
 
 FAILURES = "/handset/fail"
 TIME = "%m-%d %H:%M:%S.%f"
-IO_ERROR, AGAIN, NO_DEVICE, TOO_MANY_FILES, NO_SPACE = 5, 11, 19, 24, 28
+AGAIN, TOO_MANY_FILES = 11, 24
 VOLTAGE, CARD, CAMERA, BT, CALIBRATE, READ_ITEM = 9, 137, 139, 170, 226, 228
 CALIBRATE_HANDLER = "amt_device_battery_voltage_check"
 
@@ -78,6 +79,16 @@ def test_pseudo_terminal_that_cannot_be_had(make_handset: HandsetFactory, tmp_pa
     assert status == -118 & 0xFF
     trace.expect("pub_pty_open m_ptm_fd[-1]", "sys call: open() failed! errno = 28",
                  error_line("pub_pty_open", -1, NO_SPACE, "pty/pty"), "FATAL ERROR!!!")
+
+
+def test_start_where_the_system_does_not_tell_who_sleeps(make_handset: HandsetFactory,
+                                                         tmp_path: Path) -> None:
+    handset = prepare(make_handset("packet", ready=False, start=False), tmp_path)
+    fail(handset, "fopen", "/proc/self/task/2/stat")  # the first process behind init
+    handset.start()
+    handset.wait_ready()
+    assert handset.pid == 2
+    assert AppChannel(handset).request(VOLTAGE).result == 0
 
 
 @pytest.mark.parametrize("length", [39, 40, 41])
@@ -214,10 +225,11 @@ def test_card_without_the_list_of_mounts(make_handset: HandsetFactory, tmp_path:
 def test_item_whose_file_cannot_be_opened(make_handset: HandsetFactory, tmp_path: Path) -> None:
     handset = served(make_handset, tmp_path, "packet")
     app = AppChannel(handset)
-    assert app.request(READ_ITEM, integer(71, 2)).result is not None
+    assert app.request(READ_ITEM, integer(39, 2)) == packet(229, integer(39, 2), integer(36, 0),
+                                                            integer(1, 0))
     fail(handset, "fopen", "/amt/product.txt")
     trace = Trace(handset)
-    app.request(READ_ITEM, integer(71, 2))
+    assert app.request(READ_ITEM, integer(39, 2)).result != 0
     trace.expect(error_line("readProductResult", -1, TOO_MANY_FILES),
                  "open file(/amt/product.txt) failure. errorr: 24 - Too many open files")
 
