@@ -73,6 +73,7 @@ def test_permission_file_refuses(make_handset: HandsetFactory, text: str) -> Non
     assert f"readed success from file({PERMISSION}). flag: {shown}." in texts
     assert "do not permit to enter amt by handshake. will exit" in texts
     assert handset.get_property(PROPERTY) == "1"
+    assert b"init over" not in handset.stdout()
 
 
 @pytest.mark.parametrize("text", ["1\n", "7", None, ""])
@@ -172,6 +173,18 @@ def test_configured_event_makes_ready(make_handset: HandsetFactory) -> None:
                  re.compile(r"delete timer\.timerId:-?\d+\."))
     handset.modem.write(b"x")
     handset.log.wait("will create timer.")
+
+
+def test_disconnected_event_makes_it_wait_for_the_link_again(make_handset: HandsetFactory) -> None:
+    handset = start(make_handset, modem="held", usb_state="CONNECTED")
+    handset.usb.send("USB_STATE=CONFIGURED")
+    handset.log.wait("get usb CONFIGURED event")
+    handset.usb.send("USB_STATE=DISCONNECTED")
+    handset.log.wait("get usb disconnect event")
+    handset.modem.write(b"\r\nRING\r\n")
+    handset.log.wait(f"readed success from file({STATE}). value: CONNECTED\\n.")
+    handset.log.wait("write to pc, m_buf_len=8, write_len=8")
+    assert not handset.log.find("will create timer.")
 
 
 # the time limits

@@ -59,6 +59,12 @@ def test_bt_address_comes_from_the_first_file_that_exists(pc: PcChannel) -> None
     trace.expect("get_bt_addr_file()", error_line("read_bt_address", -100), "read not completed")
 
 
+def test_bt_address_is_a_word_of_at_most_99_characters(pc: PcChannel) -> None:
+    for text in ("y" * 99, "y" * 100, "y" * 300):
+        pc.handset.place(BT_FILE, f"{text} z\n")
+        pc.at("AT^DBTADDR?", value("DBTADDR", "y" * 99))
+
+
 def test_bt_address_is_written_where_one_is(pc: PcChannel) -> None:
     pc.handset.place(BT_FILE_2, "old\n")
     pc.at(f'AT^DBTADDR="{MAC}"', OK)
@@ -208,7 +214,8 @@ def test_pcba_failures_are_answered(pc: PcChannel) -> None:
     trace.expect(error_line("amt_read_pcba_sn", -118, NO_ENTRY), "read error.")
     for operation in (0, 3, 77):
         pc.at(f"AT^DPCBACTRL={operation}", ERROR)
-        trace.expect(f"unknown operation type: {operation}")
+        trace.expect(error_line("amt_at_control_pcba", -101),
+                     f"unknown operation type: {operation}")
     pc.handset.path(PCBA_FILE).mkdir()
     pc.at("AT^DPCBACTRL=2,A", ERROR)
     trace.expect(error_line("amt_write_pcba_sn", -118, IS_DIRECTORY), "write error.")

@@ -180,6 +180,15 @@ TEST(at_write, a_lost_tty_is_opened_silenced_and_told_again)
                         "(0/30)try to open device \"" + channel.m_tty.path() + "\"", "send ==> AT^DMSN\r"}));
 }
 
+TEST(at_write, what_the_reopened_tty_does_not_take_is_a_failure)
+{
+    const lost_channel_c channel;
+    snprintf(g_amt_cfg.m_tty_at_mux_a, sizeof(g_amt_cfg.m_tty_at_mux_a), "/dev/full");
+    const log_capture_c capture;
+    EXPECT_EQ(write_at("AT\r", 3), PUB_ERR_FAIL);
+    EXPECT_EQ(without_line_numbers(capture).back(), fail_line("write_at", -100, ENOSPC));
+}
+
 TEST(at_write, a_refusal_to_be_silent_is_no_hindrance)
 {
     const lost_channel_c channel;

@@ -2,10 +2,13 @@
 
 #include <atomic>
 #include <chrono>
+#include <dlfcn.h>
 #include <errno.h>
 #include <fcntl.h>
+#include <sys/resource.h>
 #include <sys/socket.h>
 #include <thread>
+#include <time.h>
 #include <unistd.h>
 
 #include <gtest/gtest.h>
@@ -13,6 +16,7 @@
 #include "amt/amt-handle/channel/context.h"
 #include "pub/error.h"
 #include "tests/unit/amt/modem-line.h"
+#include "tests/unit/amt/modem-pty.h"
 #include "tests/unit/amt/small-file.h"
 #include "tests/unit/support/log-lines.h"
 
@@ -57,7 +61,9 @@ TEST(at_silence, sees_no_result_across_pieces)
     EXPECT_EQ(silence({"\r\nO", "K\r\n", "OK\r\n", "\r\nOK", "\r\nERR", "OR\r\n",
                        "\r\n+CME ERROR:", "\r\nERROR\r\n"}),
               PUB_ERR_FAIL);
+    const log_capture_c capture;
     EXPECT_EQ(silence({"\r\nOK", "\r\n", "", "\r\nOK\r\n"}), PUB_ERR_NONE);
+    EXPECT_EQ(capture.texts(), texts_t{});
 }
 
 TEST(at_silence, logs_a_refusal)
@@ -176,4 +182,84 @@ TEST(at_silence, a_failing_read_is_no_end)
     close(fd);
 }
 
+/* While it lives, the kernel lets nobody wait for a descriptor. */
+class no_waits_c {
+public:
+    no_waits_c()
+    {
+        EXPECT_EQ(getrlimit(RLIMIT_NOFILE, &m_limit), 0);
+        const rlimit none = {0, m_limit.rlim_max};
+        EXPECT_EQ(setrlimit(RLIMIT_NOFILE, &none), 0);
+    }
+    ~no_waits_c()
+    {
+        EXPECT_EQ(setrlimit(RLIMIT_NOFILE, &m_limit), 0);
+    }
+    no_waits_c(const no_waits_c &) = delete;
+    no_waits_c &operator=(const no_waits_c &) = delete;
+
+private:
+    rlimit m_limit = {};
+};
+
+constexpr char NO_WAIT_LINE[] = "sys call: select() failed! errno = 22";
+
+TEST(at_silence, a_failing_wait_is_no_end)
+{
+    const modem_pty_c tty;
+    const int fd = open(tty.path().c_str(), O_RDWR | O_NOCTTY | O_CLOEXEC);
+    const log_capture_c capture;
+    std::thread modem([&] {
+        EXPECT_EQ(tty.hear(10), SILENCE);
+        {
+            const no_waits_c no_waits;
+            tty.say("noise");
+            while (!capture.has(NO_WAIT_LINE)) {
+                usleep(1000);
+            }
+            usleep(150000);
+        }
+        tty.say("\r\nOK\r\n");
+    });
+    EXPECT_EQ(disable_unsolicited_code(fd), PUB_ERR_NONE);
+    modem.join();
+    EXPECT_GE(capture.count_containing("FUNC-disable_unsolicited_code(), error_code=-118, errno=22"), 1);
+    EXPECT_LE(capture.count_containing(NO_WAIT_LINE), 10) << "it is not tried again at once";
+    close(fd);
+}
+
+std::atomic<bool> g_does_time_stand_still;
+
+/* Whoever sets the clock back while the modem is silent has not made it answer late. */
+TEST(at_silence, a_clock_that_is_set_back_tells_no_time_out)
+{
+    const modem_pty_c tty;
+    const int fd = open(tty.path().c_str(), O_RDWR | O_NOCTTY | O_CLOEXEC);
+    g_does_time_stand_still = true;
+    const auto begin = std::chrono::steady_clock::now();
+    std::thread modem([&] {
+        EXPECT_EQ(tty.hear(10), SILENCE);
+        usleep(5500000);
+        tty.say("\r\nOK\r\n");
+    });
+    const log_capture_c capture;
+    EXPECT_EQ(disable_unsolicited_code(fd), PUB_ERR_NONE);
+    modem.join();
+    g_does_time_stand_still = false;
+    EXPECT_GE(std::chrono::steady_clock::now() - begin, std::chrono::milliseconds(5400));
+    EXPECT_EQ(capture.texts(), texts_t{});
+    close(fd);
+}
+
 } // namespace
+
+extern "C" int clock_gettime(clockid_t clock, timespec *time_ptr) noexcept
+{
+    if (clock == CLOCK_REALTIME && g_does_time_stand_still) {
+        *time_ptr = {1000, 0};
+        return 0;
+    }
+    using clock_func = int (*)(clockid_t, timespec *);
+    static const clock_func next = reinterpret_cast<clock_func>(dlsym(RTLD_NEXT, "clock_gettime"));
+    return next(clock, time_ptr);
+}

@@ -6,6 +6,7 @@
 #include <signal.h>
 #include <string.h>
 #include <sys/mman.h>
+#include <sys/time.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -71,6 +72,39 @@ void *end_process(void *)
 {
     amt_process_end_begin(3);
     wait_for_ever();
+}
+
+/* A shut-down that takes the watchdog's time away: nobody else ends the process. */
+int shut_down_the_watchdog()
+{
+    const itimerval never = {};
+    return setitimer(ITIMER_REAL, &never, nullptr);
+}
+
+[[noreturn]] void end_without_a_watchdog()
+{
+    amt_process_end_set_shut_down(shut_down_the_watchdog);
+    amt_process_end();
+}
+
+/* The main thread comes late to an end that another thread has begun. */
+[[noreturn]] void end_behind_another_thread()
+{
+    amt_process_end_set_shut_down(shut_down_audibly);
+    pthread_t thread = 0;
+    pthread_create(
+        &thread, nullptr,
+        [](void *) -> void * {
+            amt_process_end_begin(4);
+            usleep(100000);
+            shut_down_audibly();
+            amt_process_end_finish();
+        },
+        nullptr);
+    while (!amt_process_end_has_begun()) {
+        usleep(100);
+    }
+    amt_process_end();
 }
 
 [[noreturn]] void end_twice_on_one_thread()
@@ -178,6 +212,16 @@ TEST(process_end, that_gets_stuck_ends_within_a_second)
     EXPECT_GE(steady_clock_t::now() - begin, std::chrono::milliseconds(700));
 }
 
+TEST(process_end, needs_no_watchdog)
+{
+    EXPECT_EXIT(end_without_a_watchdog(), testing::ExitedWithCode(0), "");
+}
+
+TEST(process_end, is_that_of_the_thread_that_began_it)
+{
+    EXPECT_EXIT(end_behind_another_thread(), testing::ExitedWithCode(4), "^shut down\n$");
+}
+
 TEST(process_end, that_fails_itself_ends_at_once)
 {
     EXPECT_EXIT(end_twice_on_one_thread(), testing::ExitedWithCode(4), "");
@@ -245,6 +289,22 @@ TEST(service_process, that_was_never_marked_is_nobody_s_child)
 TEST(service_process, knows_its_children_from_itself)
 {
     EXPECT_EXIT(mark_and_fork(), testing::ExitedWithCode(0), "");
+}
+
+[[noreturn]] void mark_and_end_in_a_child()
+{
+    amt_service_process_mark();
+    const int status = try_in_child([] {
+        amt_process_end_begin(9);
+        return false;
+    });
+    _exit(status == 0 && !amt_process_end_has_begun() ? 0 : 1);
+}
+
+/* The lines are the service's: what a child could shut down would be missing there. */
+TEST(service_process, is_not_ended_by_a_child)
+{
+    EXPECT_EXIT(mark_and_end_in_a_child(), testing::ExitedWithCode(0), "");
 }
 
 TEST(shut_down, happens_once)

@@ -124,6 +124,7 @@ TEST(child_reaper, never_waits_itself)
     }
     const log_capture_c capture;
     const pid_t second_pid = start_hanging_child();
+    errno = EINTR; /* of another call: what did not fail says nothing by it */
     amt_child_reap(second_pid);
     EXPECT_EQ(kill(hanging_pid, 0), 0) << "it still hangs, and nobody waits";
     ASSERT_EQ(kill(hanging_pid, SIGKILL), 0);
@@ -136,6 +137,33 @@ TEST(child_reaper, never_waits_itself)
         ASSERT_EQ(kill(pid, SIGKILL), 0);
         EXPECT_TRUE(is_waited_for(pid));
     }
+}
+
+/* What another part of the process has started keeps its status for that part. */
+TEST(child_reaper, leaves_other_children_alone)
+{
+    const pid_t other_pid = fork();
+    if (other_pid == 0) {
+        _exit(3);
+    }
+    ASSERT_TRUE(is_zombie(other_pid));
+    const pid_t pid = start_hanging_child();
+    amt_child_reap(pid);
+    int status = 0;
+    EXPECT_EQ(waitpid(other_pid, &status, WNOHANG), other_pid);
+    EXPECT_EQ(WEXITSTATUS(status), 3);
+    ASSERT_EQ(kill(pid, SIGKILL), 0);
+    EXPECT_TRUE(is_waited_for(pid));
+}
+
+TEST(child_reaper, a_child_does_not_outlive_its_parent)
+{
+    EXPECT_EXIT(amt_child_die_with(getpid()), testing::ExitedWithCode(0), "");
+    const auto stay = [] {
+        amt_child_die_with(getppid());
+        _exit(7);
+    };
+    EXPECT_EXIT(stay(), testing::ExitedWithCode(7), "");
 }
 
 TEST(child_reaper, tells_of_a_child_too_many)

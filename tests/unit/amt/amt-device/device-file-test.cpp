@@ -85,6 +85,9 @@ TEST(device_file, writes_the_bare_number_over_what_was_there)
     EXPECT_EQ(amt_device_file_write_int(folder.path("enable").c_str(), -1, {g_amt_device_log, HANDLER}),
               PUB_ERR_NONE);
     EXPECT_EQ(read_whole_file(folder.path("enable")), "-1");
+    EXPECT_EQ(amt_device_file_write_int(folder.path("enable").c_str(), 0, {g_amt_device_log, HANDLER}),
+              PUB_ERR_NONE);
+    EXPECT_EQ(read_whole_file(folder.path("enable")), "0");
     EXPECT_TRUE(capture.texts().empty());
 }
 

@@ -110,17 +110,17 @@ TEST(picture, refuses_what_is_no_whole_picture)
 {
     const bytes member = gzip(test_picture());
     bytes pixel;
-    EXPECT_NE(unpack(bytes(member.begin(), member.begin() + static_cast<long>(member.size() / 2)), &pixel),
-              0);
-    EXPECT_NE(unpack(gzip(bytes(AMT_PICTURE_SIZE - 1, 7)), &pixel), 0);
-    EXPECT_NE(unpack(bytes(member.begin(), member.begin() + 10), &pixel), 0);
-    EXPECT_NE(unpack(bytes{0}, &pixel), 0);
+    EXPECT_EQ(unpack(bytes(member.begin(), member.begin() + static_cast<long>(member.size() / 2)), &pixel),
+              -1);
+    EXPECT_EQ(unpack(gzip(bytes(AMT_PICTURE_SIZE - 1, 7)), &pixel), -1);
+    EXPECT_EQ(unpack(bytes(member.begin(), member.begin() + 10), &pixel), -1);
+    EXPECT_EQ(unpack(bytes{0}, &pixel), -1);
     bytes broken_header = member;
     broken_header[0] = 0;
-    EXPECT_NE(unpack(broken_header, &pixel), 0);
+    EXPECT_EQ(unpack(broken_header, &pixel), -1);
     bytes broken_checksum = member;
     broken_checksum[member.size() - 6] ^= 1;
-    EXPECT_NE(unpack(broken_checksum, &pixel), 0);
+    EXPECT_EQ(unpack(broken_checksum, &pixel), -1);
 }
 
 /* A screen in memory, of exactly the given length, with guards behind it. */
