@@ -22,16 +22,16 @@ int reply_result(int32_t result)
     return result == 0 ? amt_at_reply_ok() : amt_at_reply_error();
 }
 
-/* Whether the request has a parameter behind prefix; its number goes to *number_ptr. */
-bool get_number(const char *prefix, int *number_ptr)
+/* What a request without a number asks for: no device, and no state, has this one. */
+constexpr int NO_NUMBER = -1;
+
+/* The number behind prefix in the request, or NO_NUMBER. */
+int get_number(const char *prefix)
 {
     char text_a[AMT_AT_PARA_SIZE + 1] = {};
     uint32_t length = 0;
-    if (handle_amt_get_at_para(prefix, text_a, &length) != PUB_ERR_NONE || length == 0) {
-        return false;
-    }
-    *number_ptr = atoi(text_a);
-    return true;
+    const int status = handle_amt_get_at_para(prefix, text_a, &length);
+    return status == PUB_ERR_NONE && length > 0 ? atoi(text_a) : NO_NUMBER;
 }
 
 /* Takes the next operand as a number. A missing one is logged under its name. */
@@ -150,9 +150,7 @@ int control_wifi_test(const char *operands, const char *func, int32_t (*stop)(),
 
 int amt_at_check_device(const char *)
 {
-    int device = -1;
-    get_number("AT^DDEVCONNCHK=", &device);
-    switch (device) {
+    switch (get_number("AT^DDEVCONNCHK=")) {
     case 0:
         return reply_result(ldt_wifiCheck());
     case 1:
@@ -166,8 +164,7 @@ int amt_at_check_device(const char *)
 
 int amt_at_control_bt(const char *)
 {
-    int on = -1;
-    get_number("AT^DBTCTRL=", &on);
+    const int on = get_number("AT^DBTCTRL=");
     const bool is_known = on == LDT_STOP || on == LDT_START;
     return is_known ? reply_result(ldt_btCtrl(on)) : amt_at_reply_error();
 }
