@@ -133,6 +133,7 @@ def test_app_line_that_cannot_be_made_again(make_handset: HandsetFactory) -> Non
     wait_until(lambda: len(handset.inspect().threads) == threads_of(handset) - 1 or None,
                "the end of the app's reader")
     assert [text for text in handset.log.texts(PTY_TAG) if text.endswith("failed")]
+    assert not handset.log.find("sys call: read() failed!"), "of a line that is not there"
     # The daemon itself goes on, and ends as ever.
     assert handset.exits() == []
     assert handset.stop() == 0

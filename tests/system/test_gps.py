@@ -105,11 +105,14 @@ def test_signals(make_handset: HandsetFactory, path: str) -> None:
 
 @both_lines
 def test_signal_that_cannot_be_read(make_handset: HandsetFactory, path: str) -> None:
-    channel = PATHS[path](make_handset(path, answers={"ldt_gpsCtrl": "-7 12"}))
-    trace = HandlerTrace(channel.handset)
-    assert channel.request(READ, integer(141, 2)) == refusal(READ)
-    trace.expect_handler(READ_HANDLER, "GPS-READ-SIGNAL start. index:2",
-                         "GPS-READ-SIGNAL end. return:-7; svid:12; cnr:0.",
-                         gps_error(READ_HANDLER, -100),
-                         "GPS-READ-SIGNAL error. call ldt_gpsCtrl fail: -7")
+    channel = PATHS[path](make_handset(path))
+    # What the library does not store is 0.
+    for answer, svid in (("-7 12", 12), ("-7", 0)):
+        channel.handset.answer("ldt_gpsCtrl", answer)
+        trace = HandlerTrace(channel.handset)
+        assert channel.request(READ, integer(141, 2)) == refusal(READ)
+        trace.expect_handler(READ_HANDLER, "GPS-READ-SIGNAL start. index:2",
+                             f"GPS-READ-SIGNAL end. return:-7; svid:{svid}; cnr:0.",
+                             gps_error(READ_HANDLER, -100),
+                             "GPS-READ-SIGNAL error. call ldt_gpsCtrl fail: -7")
     channel.expect_silence(0.1)

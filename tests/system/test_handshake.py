@@ -56,6 +56,9 @@ def test_ac_power_refuses(make_handset: HandsetFactory, text: str) -> None:
     assert "receive signal: 15 - SIGTERM" in texts[begin:]
     assert handset.get_property(PROPERTY) == "1"
     assert texts.count(f"set property({PROPERTY}) to 1.") == 1
+    # It is refused at once: no limit of time has to end it.
+    assert not handset.log.find("usb enum timeout")
+    assert b"init over" not in handset.stdout()
 
 
 @pytest.mark.parametrize("text", ["0", "0\n", "2", "", "11", "1 "])
@@ -73,6 +76,7 @@ def test_permission_file_refuses(make_handset: HandsetFactory, text: str) -> Non
     assert f"readed success from file({PERMISSION}). flag: {shown}." in texts
     assert "do not permit to enter amt by handshake. will exit" in texts
     assert handset.get_property(PROPERTY) == "1"
+    assert not handset.log.find("usb enum timeout")
     assert b"init over" not in handset.stdout()
 
 
@@ -81,6 +85,7 @@ def test_permission_file_permits(make_handset: HandsetFactory, text: str | None)
     handset = start(make_handset, files={PERMISSION: text})
     assert "permit to enter amt by handshake." in handset.log.texts(TAG)
     assert handset.get_property(PROPERTY) is None
+    assert bool(handset.log.find(f"readed success from file({PERMISSION})")) == bool(text)
 
 
 def test_other_starts_do_not_ask(make_handset: HandsetFactory) -> None:

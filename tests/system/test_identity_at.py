@@ -211,14 +211,16 @@ def test_pcba_takes_29_characters(pc: PcChannel) -> None:
 def test_pcba_failures_are_answered(pc: PcChannel) -> None:
     trace = Trace(pc.handset)
     pc.at("AT^DPCBACTRL=1", ERROR)
-    trace.expect(error_line("amt_read_pcba_sn", -118, NO_ENTRY), "read error.")
+    trace.expect(error_line("amt_read_pcba_sn", -118, NO_ENTRY),
+                 error_line("reply_pcba_sn", -100, NO_ENTRY), "read error.")
     for operation in (0, 3, 77):
         pc.at(f"AT^DPCBACTRL={operation}", ERROR)
         trace.expect(error_line("amt_at_control_pcba", -101),
                      f"unknown operation type: {operation}")
     pc.handset.path(PCBA_FILE).mkdir()
     pc.at("AT^DPCBACTRL=2,A", ERROR)
-    trace.expect(error_line("amt_write_pcba_sn", -118, IS_DIRECTORY), "write error.")
+    trace.expect(error_line("amt_write_pcba_sn", -118, IS_DIRECTORY),
+                 error_line("write_pcba_sn", -100, IS_DIRECTORY), "write error.")
     assert trace.calls() == []
 
 

@@ -38,7 +38,8 @@ def test_pcba_write_and_read(pc: PcChannel) -> None:
     trace = Trace(pc.handset)
     assert pc.request(PCBA, READ) == packet(194, string(191, "PCBA-0001"), integer(1, 0))
     assert trace.calls() == []
-    trace.expect(f"{PCBA_HANDLER}()", "pcba op-type: 1.", "read pcba-sn: PCBA-0001",
+    trace.expect(f"{PCBA_HANDLER}()", "pcba op-type: 1.", "amt_read_pcba_sn()",
+                 "read pcba-sn: PCBA-0001",
                  "readed pcba-sn: PCBA-0001.")
 
 

@@ -341,7 +341,8 @@ def test_boot_download_flag(share_handset: HandsetFactory, verdict: int) -> None
     assert pc.read_frame() == answer
     trace.wait_served()
     trace.expect(
-        "receive command id: 244(0xF4) - (undefined)", "amt_modem_boot_dl_fin_read.",
+        "receive command id: 244(0xF4) - (undefined)", "amt_modem_boot_dl_fin_read()",
+        "amt_modem_boot_dl_fin_read.",
         "amt_boot_dl_fin_read start.", "will call amt_check_system_sanity.",
         f"stop call amt_check_system_sanity. return value:{verdict}.",
         f"amt_modem_boot_dl_fin_read finished. flag:{verdict}; ret_val:0.", dump(PC_OUT, answer))

@@ -125,7 +125,8 @@ def test_log_of_a_serial_number(desk: ModemDesk) -> None:
 
 @pytest.mark.parametrize("text", [b"\xff", b"\xff" * 8, b"\xff20130121", b"\xff" * 14])
 def test_erased_out_date(desk: ModemDesk, text: bytes) -> None:
-    query(desk, 65, b"AT^DMFD??\r", value(b"^DMFD: ", text), refusal(65, MODEM_FAILED))
+    query(desk, 65, b"AT^DMFD??\r", value(b"^DMFD: ", text), refusal(65, MODEM_FAILED)).expect(
+        error_line("amt_modem_handle_read_outdate", -100))
 
 
 def test_out_date_with_the_mark_elsewhere(desk: ModemDesk) -> None:
@@ -242,7 +243,8 @@ def test_temperature_without_a_file(desk: ModemDesk) -> None:
     trace = Trace(desk.handset)
     desk.app.send_packet(55)
     desk.expect(refusal(55, MODEM_FAILED))
-    trace.expect("amt_modem_handle_temperature()", "fopen error: errno=2")
+    trace.expect("amt_modem_handle_temperature()",
+                 error_line("amt_modem_handle_temperature", -118, 2), "fopen error: errno=2")
 
 
 def test_temperature_keeps_no_descriptor(desk: ModemDesk) -> None:

@@ -114,6 +114,7 @@ def test_modem_tty_vanishes_and_comes_back(pc_handset: Handset) -> None:
     place = texts.index(EMPTY, texts.index(EMPTY) + 1)
     assert re.fullmatch(r"read_modem_loop, read ready, m_fd_modem=\d+", texts[place - 2])
     assert texts[place - 1] == "WARNING !"
+    assert not [text for text in texts if text.startswith("write to pc")], "of nothing"
     # What needs no modem is served meanwhile.
     pc.at("AT^DBTADDR=?", OK)
     assert pc.request(176).result == 0

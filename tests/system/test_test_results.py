@@ -77,7 +77,8 @@ def test_verdict_goes_to_the_file_and_the_modem(desk: ModemDesk) -> None:
     name = "amt_modem_write_test_result"
     trace.expect(
         "receive command id: 91(0x5B) - AMT_WRITE_TEST_RESULT_CMD", f"{name}()",
-        "saveAmtResult()", f"initTestFile . path:{AMT}; count: 20\\n", "updateTestItem()",
+        "saveAmtResult()", "initTestFile()", f"initTestFile . path:{AMT}; count: 20\\n",
+        "updateTestItem()",
         "write item [3], result= 1\\n",
         "write amt_result success amt station_num: 3, station_result: 1.\\n",
         f"{name} m_buf_a[AT^DATOMW=3,1,good\\r] m_buf_len[19]", "write_at()",

@@ -170,15 +170,21 @@ TEST(at_exchange, traces_each_read)
                                                          nullptr};
     static constexpr amt_at_exchange_st status_exchange = {"name", amt_at_trace_en::STATUS, AMT_AT_OK, false,
                                                            nullptr};
+    static constexpr amt_at_exchange_st untraced_exchange = {"name", amt_at_trace_en::NONE, AMT_AT_OK, false,
+                                                             nullptr};
     modem_line_c line;
-    for (const std::string chunk : {"\r\nO", "K\r\n", "\r\nOK\r\n"}) {
+    for (const std::string chunk : {"\r\nOK\r\n", "\r\nO", "K\r\n", "\r\nOK\r\n"}) {
         line.answer(chunk);
     }
     const log_capture_c capture;
     amt_at_set_command("AT\r");
+    EXPECT_EQ(amt_at_exchange(untraced_exchange, nullptr), PUB_ERR_NONE);
+    EXPECT_EQ(capture.count_containing("name "), 0);
+    amt_at_set_command("AT\r");
     EXPECT_EQ(amt_at_exchange(text_exchange, nullptr), PUB_ERR_NONE);
     EXPECT_TRUE(capture.has("name :\r\nO"));
     EXPECT_TRUE(capture.has("name :\r\nOK\r\n"));
+    EXPECT_EQ(capture.count_containing("name "), 2);
     amt_at_set_command("AT\r");
     EXPECT_EQ(amt_at_exchange(status_exchange, nullptr), PUB_ERR_NONE);
     EXPECT_TRUE(capture.has("name  ret_val[0] m_buf_a[\r\nOK\r\n]"));

@@ -1,7 +1,11 @@
 #include "amt/amt-handle/channel/at-io.h"
 
+#include <atomic>
+#include <chrono>
+#include <dlfcn.h>
 #include <errno.h>
 #include <fcntl.h>
+#include <poll.h>
 #include <stdio.h>
 #include <string.h>
 #include <sys/socket.h>
@@ -138,6 +142,9 @@ TEST(at_write, has_a_text)
 
 TEST(at_write, fails_on_a_closed_channel)
 {
+    const small_file_c file(100); /* what descriptor 0 is does not count */
+    const int kept_fd = dup(0);
+    ASSERT_EQ(dup2(file.fd(), 0), 0);
     for (const int fd : {0, -1}) {
         g_handle_context.m_fd_at = fd;
         const log_capture_c capture;
@@ -146,6 +153,10 @@ TEST(at_write, fails_on_a_closed_channel)
                   (texts_t{"write_at()", "write_at write_len[-1]", "write_at ret_val[-100]",
                            fail_line("write_at", -100, EBADF)}));
     }
+    if (dup2(kept_fd, 0) < 0) {
+        close(0);
+    }
+    close(kept_fd);
     g_handle_context.m_fd_at = 0;
 }
 
@@ -234,6 +245,8 @@ TEST(at_read, reads_no_more_than_there_is_room)
     tty.say("abcdef");
     EXPECT_EQ(read_some(4).m_text, "abcd");
     EXPECT_EQ(read_some(4).m_text, "ef");
+    tty.say("g");
+    EXPECT_EQ(read_some(4).m_text, "g");
     amt_handle_close_fd(&g_handle_context.m_fd_at);
 }
 
@@ -338,6 +351,37 @@ TEST(at_read, of_nothing_after_the_reopening_has_no_errno)
     EXPECT_EQ(without_line_numbers(capture).back(), fail_line("read_at", -100, 0));
 }
 
+TEST(at_read, of_one_byte_after_the_reopening_is_a_good_one)
+{
+    const lost_channel_c channel;
+    channel.m_tty.say(std::string(CONSENT) + "x");
+    const read_st result = read_some(100);
+    EXPECT_EQ(result.m_status, PUB_ERR_NONE);
+    EXPECT_EQ(result.m_count, 1);
+    EXPECT_EQ(result.m_text, "x");
+}
+
+std::atomic<bool> g_hangs_up;
+
+/* Each opening finds a modem that consents, and a line that has hung up behind it. */
+TEST(at_open, a_line_that_is_lost_again_and_again_is_given_up)
+{
+    const lost_channel_c channel;
+    const temp_folder_c folder;
+    const std::string path = folder.path("tty");
+    write_whole_file(path, std::string(SILENCE) + CONSENT);
+    snprintf(g_amt_cfg.m_tty_at_mux_a, sizeof(g_amt_cfg.m_tty_at_mux_a), "%s", path.c_str());
+    const log_capture_c capture;
+    g_hangs_up = true;
+    errno = 0;
+    const auto begin = std::chrono::steady_clock::now();
+    EXPECT_EQ(amt_at_open(), PUB_ERR_FILE);
+    g_hangs_up = false;
+    EXPECT_EQ(errno, EIO);
+    EXPECT_EQ(capture.count_containing("(0/30)try to open device \"" + path + "\""), 30);
+    EXPECT_GE(std::chrono::steady_clock::now() - begin, std::chrono::milliseconds(2900));
+}
+
 TEST(at_read, a_tty_that_stays_lost_gives_the_error_of_its_opening)
 {
     const lost_channel_c channel;
@@ -346,3 +390,14 @@ TEST(at_read, a_tty_that_stays_lost_gives_the_error_of_its_opening)
 }
 
 } // namespace
+
+extern "C" int poll(pollfd *fd_ptr, nfds_t count, int timeout_ms)
+{
+    if (g_hangs_up) {
+        fd_ptr->revents = POLLHUP;
+        return 1;
+    }
+    using poll_func = int (*)(pollfd *, nfds_t, int);
+    static const poll_func next = reinterpret_cast<poll_func>(dlsym(RTLD_NEXT, "poll"));
+    return next(fd_ptr, count, timeout_ms);
+}

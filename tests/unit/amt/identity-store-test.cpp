@@ -3,6 +3,7 @@
 #include <errno.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <memory>
 #include <string.h>
 #include <sys/stat.h>
 
@@ -133,6 +134,23 @@ TEST(read_data_from_file, refuses_an_absent_argument)
     EXPECT_EQ(amt_read_data_from_file(text_a, 0, "/dev/null"), PUB_ERR_PARAM);
     EXPECT_EQ(amt_read_data_from_file(text_a, 8, nullptr), PUB_ERR_PARAM);
     EXPECT_STREQ(text_a, "old");
+}
+
+TEST(read_cut_line, cuts_the_last_character)
+{
+    const temp_folder_c folder;
+    const log_capture_c capture;
+    for (const auto &[content, wanted] :
+         {std::pair(std::string("12:34\n"), "12:34"), std::pair(std::string("12:34"), "12:3"),
+          std::pair(std::string("\n"), ""), std::pair(std::string("\0\n", 2), "")})
+    {
+        write_whole_file(folder.path("line"), content);
+        /* Of its own size on the heap, where a byte beside it would be found. */
+        const auto buf = std::make_unique<char[]>(16);
+        EXPECT_EQ(amt_read_cut_line(folder.path("line").c_str(), buf.get(), 16, "length"), PUB_ERR_NONE);
+        EXPECT_STREQ(buf.get(), wanted);
+    }
+    EXPECT_THAT(capture.texts(), testing::IsSupersetOf({"length: 6", "length: 5", "length: 1", "length: 0"}));
 }
 
 TEST(make_folder, makes_a_missing_folder_that_all_may_write)

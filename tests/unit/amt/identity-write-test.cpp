@@ -1,9 +1,14 @@
 #include "amt/amt-handle/reader/identity-write.h"
 
 #include <algorithm>
+#include <dlfcn.h>
+#include <functional>
+#include <stdio.h>
+#include <string.h>
 #include <string>
 #include <thread>
 #include <unistd.h>
+#include <utility>
 
 #include <gtest/gtest.h>
 
@@ -51,6 +56,9 @@ std::string to_pc(const std::string &packet)
     EXPECT_EQ(amt_convert_app_2_pc(&buf), PUB_ERR_NONE);
     return {reinterpret_cast<const char *>(buf.m_buf_a), buf.m_buf_len};
 }
+
+/* Run once, when an identity's file is opened. */
+std::function<void()> g_in_open;
 
 /* The handset's folder is not there, so each writing fails and says what it would have written where. */
 class identity_write : public testing::Test {
@@ -139,6 +147,26 @@ TEST_F(identity_write, of_at_text)
     expect_saved(SN, "KEL 1 ", 0);
     capture_text("AT^DCGSNW=3500\r");
     expect_saved(IMEI, "3500", 0);
+}
+
+/* Text goes before what the packet around it is. */
+TEST_F(identity_write, a_channel_in_a_packet_s_text_is_no_identity)
+{
+    put(&g_handle_context.m_pc, wire_packet(87, text_atom(38, "KEL-2")));
+    capture_text("AT^DMPCHN=1\r", 87);
+    expect_none_pending();
+    capture_text("AT^DMSN=KEL-1\r");
+    expect_saved(SN, "KEL-1", 1);
+}
+
+/* A write that comes while the one before it is being saved waits for its own answer. */
+TEST_F(identity_write, of_the_same_kind_meanwhile_stays_pending)
+{
+    capture_text("AT^DCGSNW=3500\r");
+    g_in_open = [] { capture_text("AT^DCGSNW=3600\r"); };
+    EXPECT_EQ(complete(ACCEPTED).back(), "write imei error.");
+    EXPECT_EQ(g_in_open, nullptr) << "the file was opened";
+    expect_saved(IMEI, "3600", 0);
 }
 
 TEST_F(identity_write, of_at_text_behind_zero_bytes)
@@ -313,3 +341,14 @@ TEST_F(identity_write, is_saved_as_it_was_captured)
 }
 
 } // namespace
+
+extern "C" FILE *fopen(const char *path, const char *mode)
+{
+    if (g_in_open != nullptr && strncmp(path, "/amt/", 5) == 0) {
+        const std::function<void()> in_open = std::exchange(g_in_open, nullptr);
+        in_open();
+    }
+    using fopen_func = FILE *(*)(const char *, const char *);
+    static const fopen_func next = reinterpret_cast<fopen_func>(dlsym(RTLD_NEXT, "fopen"));
+    return next(path, mode);
+}

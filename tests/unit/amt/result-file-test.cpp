@@ -32,8 +32,9 @@ TEST_F(result_file, is_created_with_every_item_untested)
         const log_capture_c capture;
         EXPECT_EQ(initTestFile(m_path.c_str(), count), 0);
         EXPECT_EQ(read_whole_file(m_path), items(std::string(static_cast<size_t>(count), '0')));
-        EXPECT_TRUE(
-            capture.has("initTestFile . path:" + m_path + "; count: " + std::to_string(count) + "\n"));
+        EXPECT_EQ(capture.texts(),
+                  (std::vector<std::string>{"initTestFile()", "initTestFile . path:" + m_path + "; count: " +
+                                                                  std::to_string(count) + "\n"}));
     }
 }
 
@@ -72,7 +73,7 @@ TEST_F(result_file, is_updated_in_place)
     ASSERT_EQ(initTestFile(m_path.c_str(), 4), 0);
     const log_capture_c capture;
     EXPECT_EQ(updateTestItem(m_path.c_str(), 1, 1), 0);
-    EXPECT_EQ(capture.texts().back(), "write item [1], result= 1\n");
+    EXPECT_EQ(capture.texts(), (std::vector<std::string>{"updateTestItem()", "write item [1], result= 1\n"}));
     EXPECT_EQ(updateTestItem(m_path.c_str(), 3, 2), 0);
     EXPECT_EQ(read_whole_file(m_path), items("0102"));
     EXPECT_EQ(updateTestItem(m_path.c_str(), 0, 2), 0);

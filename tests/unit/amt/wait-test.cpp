@@ -104,6 +104,18 @@ TEST_F(wait_on_pipe, no_descriptor)
     EXPECT_EQ(errno, EBADF);
 }
 
+TEST_F(wait_on_pipe, descriptor_0_is_one)
+{
+    const int kept_fd = dup(0);
+    say("x");
+    ASSERT_EQ(dup2(m_fd_a[0], 0), 0);
+    EXPECT_EQ(amt_wait_readable(0, 30000), 1);
+    if (dup2(kept_fd, 0) < 0) {
+        close(0);
+    }
+    close(kept_fd);
+}
+
 TEST_F(wait_on_pipe, read_takes_what_is_there)
 {
     say("abcdef");

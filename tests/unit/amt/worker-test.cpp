@@ -259,8 +259,20 @@ TEST_F(worker, begins_with_an_empty_mask_whatever_its_starter_blocks)
                                }),
               0);
     wait_for(g_step, STEP_RETURNED);
-    pthread_sigmask(SIG_SETMASK, &own_mask, nullptr);
+    sigset_t starters_mask;
+    pthread_sigmask(SIG_SETMASK, &own_mask, &starters_mask);
+    EXPECT_EQ(sigismember(&starters_mask, SIGTERM), 1) << "the starter's own is as it was";
     EXPECT_EQ(g_released, 0);
+    expect_ended();
+}
+
+TEST_F(worker, leaves_its_starter_the_signals_that_it_takes)
+{
+    ASSERT_EQ(amt_worker_start(g_worker_ptr, [] { g_step = STEP_RETURNED; }), 0);
+    sigset_t mask;
+    pthread_sigmask(SIG_SETMASK, nullptr, &mask);
+    EXPECT_EQ(sigismember(&mask, SIGUSR1), 0);
+    wait_for(g_step, STEP_RETURNED);
     expect_ended();
 }
 

@@ -311,6 +311,19 @@ TEST(serial_attr, no_terminal)
     close(fd);
 }
 
+TEST(serial_attr, descriptor_0_is_one)
+{
+    const int kept_fd = dup(0);
+    const int fd = open("/dev/null", O_RDWR);
+    ASSERT_EQ(dup2(fd, 0), 0);
+    EXPECT_EQ(pub_util_set_serial_dev_attr(0, 230400), PUB_ERR_SYS_CALL);
+    if (dup2(kept_fd, 0) < 0) {
+        close(0);
+    }
+    close(kept_fd);
+    close(fd);
+}
+
 TEST(serial_attr, attributes_that_cannot_be_written)
 {
     const serial_port_c port;

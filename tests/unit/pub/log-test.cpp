@@ -126,6 +126,8 @@ TEST(log, the_text_of_a_failure_holds_a_whole_command)
     const std::string command(4096, 'x');
     pub_log_fail(g_test_log, -1, "system(%s)", command.c_str());
     EXPECT_EQ(capture.texts()[1], "system(" + command + ")");
+    pub_log_fail(g_test_log, -1, "%s", std::string(5000, 'y').c_str());
+    EXPECT_EQ(capture.texts()[3], std::string(4351, 'y'));
 }
 
 TEST(log, the_lines_of_a_failed_call_come_in_the_order_of_the_name)

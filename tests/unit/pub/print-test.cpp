@@ -114,6 +114,8 @@ TEST_F(print, text_is_in_the_pipe_at_once)
     EXPECT_EQ(take(), "no line end yet: 5");
     pub_print("%s", "one line\n");
     EXPECT_EQ(take(), "one line\n");
+    pub_print("%c", 'x');
+    EXPECT_EQ(take(), "x");
 }
 
 TEST_F(print, long_text_is_cut_at_4607_bytes)

@@ -6,6 +6,7 @@
 #include <string>
 #include <sys/syscall.h>
 #include <unistd.h>
+#include <vector>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -14,6 +15,7 @@
 #include "pub/log/log.h"
 #include "tests/unit/pub/support/child-process.h"
 #include "tests/unit/pub/support/lines.h"
+#include "tests/unit/support/log-capture.h"
 
 namespace {
 
@@ -22,7 +24,34 @@ std::string priority_error(int error_number)
     return error_line("util/util", "pub_util_raise_process_priority", PUB_ERR_SYS_CALL, error_number);
 }
 
+/* A kernel that permits what few machines do, and keeps what it was asked for. */
+std::vector<std::string> *g_permitted_ptr = nullptr;
+
 } // namespace
+
+extern "C" int sched_setscheduler(pid_t pid, int policy, const sched_param *param_ptr) noexcept
+{
+    if (g_permitted_ptr != nullptr) {
+        const std::string who = pid == 0 ? "the thread" : pid == getpid() ? "the process" : "another";
+        g_permitted_ptr->push_back(who + " " + std::to_string(policy) + " " +
+                                   std::to_string(param_ptr->sched_priority));
+        return 0;
+    }
+    return static_cast<int>(syscall(SYS_sched_setscheduler, pid, policy, param_ptr));
+}
+
+TEST(priority, is_asked_for_the_process_and_for_the_thread)
+{
+    std::vector<std::string> asked;
+    const log_capture_c capture;
+    g_permitted_ptr = &asked;
+    const int status = pub_util_raise_process_priority();
+    g_permitted_ptr = nullptr;
+    EXPECT_EQ(status, PUB_ERR_NONE);
+    const std::string wanted = "1 " + std::to_string(sched_get_priority_max(SCHED_FIFO) - 4);
+    EXPECT_THAT(asked, testing::ElementsAre("the process " + wanted, "the thread " + wanted));
+    EXPECT_THAT(capture.texts(), testing::ElementsAre("pub_util_raise_process_priority()"));
+}
 
 TEST(priority, is_real_time_four_below_the_highest)
 {

@@ -4,8 +4,6 @@
 #include <errno.h>
 #include <fcntl.h>
 #include <limits.h>
-#include <pthread.h>
-#include <signal.h>
 #include <stdio.h>
 #include <string.h>
 #include <string>
@@ -25,7 +23,6 @@
 
 namespace {
 
-constexpr int INTERRUPT_COUNT = 10;
 const std::string CHECK_RUN = "pub_util_get_pid_and_check_run";
 
 std::string util_error(const std::string &func, int error_code, int error_number)
@@ -437,41 +434,4 @@ TEST(process_path, unreadable_command_line_is_passed_on)
     EXPECT_EQ(run.m_result, PUB_ERR_FILE);
     ASSERT_EQ(run.m_text_list.size(), 4U);
     EXPECT_EQ(run.m_text_list[2], util_error("pub_util_get_cmd_line", -118, EMFILE));
-}
-
-TEST(run_shell, gives_the_commands_status)
-{
-    const log_capture_c capture;
-    EXPECT_EQ(pub_util_run_shell("exit 0"), 0);
-    EXPECT_EQ(WEXITSTATUS(pub_util_run_shell("exit 7")), 7);
-    EXPECT_THAT(capture.texts(), testing::IsEmpty());
-}
-
-TEST(run_shell, lets_an_interrupt_on_its_way_get_there_first)
-{
-    const child_run_st run = run_in_child([] {
-        sigset_t interrupt;
-        sigemptyset(&interrupt);
-        sigaddset(&interrupt, SIGINT);
-        pthread_sigmask(SIG_BLOCK, &interrupt, nullptr);
-        int taken = 0;
-        for (int i = 0; i < INTERRUPT_COUNT; i++) {
-            /* On its way before the command begins; it is taken only when the command has had time to begin. */
-            kill(getpid(), SIGINT);
-            pthread_t thread = 0;
-            const auto run_one = [](void *) -> void * {
-                pub_util_run_shell(":");
-                return nullptr;
-            };
-            pthread_create(&thread, nullptr, run_one, nullptr);
-            const timespec head_start = {0, 5000000};
-            nanosleep(&head_start, nullptr);
-            const timespec no_time = {};
-            taken += sigtimedwait(&interrupt, nullptr, &no_time) == SIGINT ? 1 : 0;
-            pthread_join(thread, nullptr);
-        }
-        return taken;
-    });
-    ASSERT_TRUE(run.m_is_complete);
-    EXPECT_EQ(run.m_result, INTERRUPT_COUNT);
 }

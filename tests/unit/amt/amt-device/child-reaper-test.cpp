@@ -2,6 +2,9 @@
 
 #include <dlfcn.h>
 #include <errno.h>
+#include <filesystem>
+#include <fstream>
+#include <map>
 #include <pthread.h>
 #include <signal.h>
 #include <sys/wait.h>
@@ -89,7 +92,44 @@ TEST(child_reaper, tells_the_signal_that_ended_a_child)
         EXPECT_TRUE(is_waited_for(pid));
         const std::string line = signal_line(pid, text);
         EXPECT_TRUE(wait_until([&] { return capture.has(line); })) << line;
+        EXPECT_EQ(capture.texts().size(), 1U);
     }
+}
+
+/* The signals that the threads of this process have blocked, as bits, by thread. */
+std::map<std::string, uint64_t> blocked_signals()
+{
+    constexpr char NAME[] = "SigBlk:";
+    std::map<std::string, uint64_t> masks;
+    for (const auto &task : std::filesystem::directory_iterator("/proc/self/task")) {
+        std::ifstream status(task.path() / "status");
+        for (std::string line; std::getline(status, line);) {
+            if (line.rfind(NAME, 0) == 0) {
+                masks[task.path().filename()] = std::stoull(line.substr(sizeof(NAME) - 1), nullptr, 16);
+            }
+        }
+    }
+    return masks;
+}
+
+/* Signals are for those who serve lines: who waits for a child takes none. */
+TEST(child_reaper, waits_where_no_signal_comes)
+{
+    const auto before = blocked_signals();
+    const pid_t pid = start_hanging_child();
+    amt_child_reap(pid);
+    usleep(20000); /* while a thread is made, it takes no signals anyway */
+    const auto after = blocked_signals();
+    ASSERT_EQ(after.size(), before.size() + 1);
+    for (const auto &[task, mask] : after) {
+        if (before.count(task) == 0) {
+            for (const int signal_number : {SIGHUP, SIGINT, SIGUSR1, SIGUSR2, SIGALRM, SIGTERM, SIGCHLD}) {
+                EXPECT_NE(mask & 1ULL << (signal_number - 1), 0U) << signal_number;
+            }
+        }
+    }
+    ASSERT_EQ(kill(pid, SIGKILL), 0);
+    EXPECT_TRUE(is_waited_for(pid));
 }
 
 TEST(child_reaper, says_nothing_of_a_child_that_ends_by_itself)

@@ -3,6 +3,8 @@
 #include <dlfcn.h>
 #include <errno.h>
 #include <fcntl.h>
+#include <fstream>
+#include <iterator>
 #include <stdarg.h>
 #include <string.h>
 #include <string>
@@ -152,6 +154,13 @@ void expect_first_show_sets_the_layer_up(screen_st *screen_ptr)
     EXPECT_EQ(screen_ptr->first_byte_of_picture(HEIGHT), 0x11);
 }
 
+bool is_screen_mapped()
+{
+    std::ifstream maps("/proc/self/maps");
+    const std::string text{std::istreambuf_iterator<char>(maps), {}};
+    return text.find("memfd:screen") != std::string::npos;
+}
+
 void expect_later_shows_only_pan(screen_st *screen_ptr)
 {
     EXPECT_EQ(show(0x22), 0);
@@ -219,10 +228,17 @@ TEST(framebuffer, the_set_up_outlasts_closing)
 {
     in_a_process([](screen_st *screen_ptr) {
         expect_first_show_sets_the_layer_up(screen_ptr);
+        EXPECT_TRUE(is_screen_mapped());
         amt_framebuffer_close();
         EXPECT_EQ(fcntl(screen_ptr->m_opened_fd, F_GETFD), -1);
+        EXPECT_FALSE(is_screen_mapped());
         EXPECT_EQ(show(0x44), -1) << "it is closed";
         EXPECT_THAT(screen_ptr->take_requests(), IsEmpty());
+        const int other_fd = dup(0); /* gets the number that is free now */
+        EXPECT_EQ(other_fd, screen_ptr->m_opened_fd);
+        amt_framebuffer_close();
+        EXPECT_NE(fcntl(other_fd, F_GETFD), -1) << "it is another's now";
+        close(other_fd);
         /* The page is what the driver says, not what was shown last. */
         screen_ptr->m_y_offset = 0;
         EXPECT_EQ(amt_framebuffer_open(), 0);

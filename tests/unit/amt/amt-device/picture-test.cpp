@@ -25,11 +25,12 @@ bytes test_picture()
     return pixel;
 }
 
-bytes gzip(const bytes &content)
+/* A member in gzip's frame, or in another that inflate knows. */
+bytes gzip(const bytes &content, int window_bits = 31)
 {
     bytes member(content.size() + 1024);
     z_stream stream = {};
-    deflateInit2(&stream, 9, Z_DEFLATED, 31, 8, Z_DEFAULT_STRATEGY);
+    deflateInit2(&stream, 9, Z_DEFLATED, window_bits, 8, Z_DEFAULT_STRATEGY);
     stream.next_in = const_cast<uint8_t *>(content.data());
     stream.avail_in = static_cast<uInt>(content.size());
     stream.next_out = member.data();
@@ -115,6 +116,7 @@ TEST(picture, refuses_what_is_no_whole_picture)
     EXPECT_EQ(unpack(gzip(bytes(AMT_PICTURE_SIZE - 1, 7)), &pixel), -1);
     EXPECT_EQ(unpack(bytes(member.begin(), member.begin() + 10), &pixel), -1);
     EXPECT_EQ(unpack(bytes{0}, &pixel), -1);
+    EXPECT_EQ(unpack(gzip(test_picture(), 15), &pixel), -1);
     bytes broken_header = member;
     broken_header[0] = 0;
     EXPECT_EQ(unpack(broken_header, &pixel), -1);
@@ -225,6 +227,16 @@ TEST(picture, a_smaller_screen_would_be_written_outside)
     EXPECT_FALSE(amt_picture_fits(screen_st(480, 0, 0, plenty).m_target));
 }
 
+/* On a screen that is narrower by two pixels the last row ends a pixel behind it, where the memory may end, too. */
+TEST(picture, a_narrower_screen_would_be_written_behind_its_end)
+{
+    constexpr uint32_t width = AMT_PICTURE_WIDTH - 2;
+    constexpr uint32_t length = width * 4 + width * AMT_PICTURE_HEIGHT * 2;
+    EXPECT_FALSE(amt_picture_fits(screen_st(width, AMT_PICTURE_HEIGHT, 1, length).m_target));
+    EXPECT_FALSE(amt_picture_fits(screen_st(width, AMT_PICTURE_HEIGHT, 1, length + 1).m_target));
+    EXPECT_TRUE(amt_picture_fits(screen_st(width, AMT_PICTURE_HEIGHT, 1, length + 2).m_target));
+}
+
 /* Without clipping the picture begins before a smaller screen's second page; there is memory there to take
  * it. */
 TEST(picture, a_smaller_screen_overlaps_its_second_page)
@@ -239,6 +251,21 @@ TEST(picture, a_smaller_screen_overlaps_its_second_page)
     amt_picture_draw(screen.m_target, picture.data());
     EXPECT_EQ(count_guards(screen, 0, first), first);
     EXPECT_EQ(memcmp(screen.m_area.data() + first, picture.data(), AMT_PICTURE_WIDTH * 2), 0);
+}
+
+TEST(picture, has_a_largest_screen)
+{
+    constexpr uint32_t side_max = 0xFFFF;
+    const amt_picture_target_st wide = {nullptr, 0xFFFFFFFFU, side_max, AMT_PICTURE_HEIGHT, 0};
+    const amt_picture_target_st high = {nullptr, 0xFFFFFFFFU, AMT_PICTURE_WIDTH, side_max, 0};
+    const amt_picture_target_st low = {nullptr, 0xFFFFFFFFU, AMT_PICTURE_WIDTH, AMT_PICTURE_HEIGHT, side_max};
+    for (amt_picture_target_st target : {wide, high, low}) {
+        EXPECT_TRUE(amt_picture_fits(target));
+        target.m_width += target.m_width == side_max ? 1 : 0;
+        target.m_height += target.m_height == side_max ? 1 : 0;
+        target.m_y_offset += target.m_y_offset == side_max ? 1 : 0;
+        EXPECT_FALSE(amt_picture_fits(target));
+    }
 }
 
 TEST(picture, sizes_that_overflow_are_refused)
