@@ -14,6 +14,7 @@ from support.shell import break_shell
 from support.trace import Wanted
 
 RING, RING_HANDLER = 33, "amt_device_audio"
+VOLTAGE, VOLTAGE_FILE = 9, "/sys/class/power_supply/battery/voltage_now"
 PLAYER, PID_FILE = "/system/bin/amt-audio", "/tmp/amt-audio.pid"
 SOUND = "/system/media/audio/amt/sweep.wav"
 START, STOP, SWITCH = flag(15, 1), flag(15, 0), 15
@@ -154,6 +155,13 @@ def test_ring_player_that_fails(app: AppChannel) -> None:
     trace.expect_handler(RING_HANDLER, *failure)
     assert trace.calls() == [PLAY_CALL.replace("= 0", "= 3")]
     assert not app.handset.path(PID_FILE).exists()
+
+    # What another request has failed with is not told as its reason.
+    app.handset.place(VOLTAGE_FILE, None)
+    refused(app, VOLTAGE)
+    trace = HandlerTrace(app.handset)
+    refused(app, RING, START)
+    trace.expect_handler(RING_HANDLER, *failure)
 
     # It is run once: nobody tries again.
     app.handset.answer("amt-audio")

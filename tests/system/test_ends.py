@@ -161,6 +161,7 @@ def test_pc_line_lost_ends_the_daemon(make_handset: HandsetFactory) -> None:
     handset.pc.hang_up()
     assert handset.wait_exit() == 0
     trace.expect("amt_handle_deinit()")
+    assert not handset.log.find("receive signal"), "its reader ends it"
 
 
 def test_usb_disconnect_ends_the_daemon(make_handset: HandsetFactory) -> None:

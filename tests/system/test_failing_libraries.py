@@ -74,6 +74,26 @@ def test_station_s_port_that_cannot_be_set(make_handset: HandsetFactory, tmp_pat
                  error_line("set_serial_dev_attr", -1, IO_ERROR), "FATAL ERROR!!!")
 
 
+def test_first_thread_that_cannot_be_had(make_handset: HandsetFactory, tmp_path: Path) -> None:
+    status, trace = ended(make_handset, tmp_path, "packet", "thread")
+    assert status == -118 & 0xFF
+    trace.expect("FATAL ERROR!!!", error_line("main", -118, AGAIN, "amt/main"))
+
+
+def test_event_that_is_lost(make_handset: HandsetFactory, tmp_path: Path) -> None:
+    handset = served(make_handset, tmp_path, "pc")
+    handset.usb.wait_listener()
+    fail(handset, "event")
+    trace = Trace(handset)
+    handset.usb.send("USB_STATE=LOST")
+    PcChannel(handset).at("AT", OK)
+    wait_calm(handset)
+    handset.place(f"{FAILURES}/event", None)
+    handset.usb.send("USB_STATE=HEARD")
+    handset.log.wait("usb_status:[USB_STATE=HEARD]")
+    assert not [text for text in trace.texts() if "LOST" in text]
+
+
 def test_pseudo_terminal_that_cannot_be_had(make_handset: HandsetFactory, tmp_path: Path) -> None:
     status, trace = ended(make_handset, tmp_path, "packet", "ptmx")
     assert status == -118 & 0xFF

@@ -177,6 +177,13 @@ def test_a_copy_that_cannot_be_opened(start: Start) -> None:
     trace.expect_none(f"fchmod  {DRIVER} successfully")
 
 
+def test_a_copy_that_cannot_be_opened_has_its_own_reason(start: Start) -> None:
+    # It is opened first, and told of last: the first stock file is looked for in between.
+    _, trace = start({ADDRESS_FILE: MAC, STOCK: None, STOCK_2: "a=1\n", f"{DRIVER}/in-the-way": ""})
+    trace.expect(f'File "{STOCK}" not exist, so we try to open file "{STOCK_2}"',
+                 error_line(REWRITE, -100, IS_DIRECTORY), f"open  {DRIVER} fail")
+
+
 def test_a_copy_that_vanishes_before_its_mode_is_set(start: Start) -> None:
     handset, trace = start({STOCK: "a=1\n", SYNC: (f"#!/bin/sh\nrm -f {DRIVER}\n", 0o755)})
     assert not handset.path(DRIVER).exists()

@@ -283,6 +283,7 @@ TEST_F(amt_convert_req, atom_head_that_passes_the_packet_is_refused)
         EXPECT_EQ(convert(), PUB_ERR_FAIL) << fill;
         EXPECT_EQ(m_out_len, fill + 1U);
     }
+    EXPECT_EQ(m_log.texts().back(), "atom at 4096 leads outside the packet");
 }
 
 TEST_F(amt_convert_req, block_that_is_too_small_is_refused)

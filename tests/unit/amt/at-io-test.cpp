@@ -200,6 +200,20 @@ TEST(at_write, what_the_reopened_tty_does_not_take_is_a_failure)
     EXPECT_EQ(without_line_numbers(capture).back(), fail_line("write_at", -100, ENOSPC));
 }
 
+TEST(at_write, a_short_write_to_the_reopened_tty_has_no_errno)
+{
+    const lost_channel_c channel;
+    const temp_folder_c folder;
+    /* A file in the place of the tty, which takes two bytes behind the consent. */
+    write_whole_file(folder.path("tty"), std::string(SILENCE) + CONSENT);
+    snprintf(g_amt_cfg.m_tty_at_mux_a, sizeof(g_amt_cfg.m_tty_at_mux_a), "%s", folder.path("tty").c_str());
+    const small_file_c limit(sizeof(SILENCE) - 1 + sizeof(CONSENT) - 1 + 2);
+    const log_capture_c capture;
+    EXPECT_EQ(write_at("AT\r", 3), PUB_ERR_FAIL);
+    EXPECT_EQ(without_line_numbers(capture).back(), fail_line("write_at", -100, 0));
+    EXPECT_EQ(read_whole_file(folder.path("tty")), std::string(SILENCE) + CONSENT + "AT");
+}
+
 TEST(at_write, a_refusal_to_be_silent_is_no_hindrance)
 {
     const lost_channel_c channel;
@@ -313,7 +327,10 @@ TEST(at_read, of_nothing_is_a_good_one)
     const modem_line_c line;
     line.answer("");
     const log_capture_c capture;
+    const auto begin = std::chrono::steady_clock::now();
     const read_st result = read_some(100);
+    EXPECT_GE(std::chrono::steady_clock::now() - begin, std::chrono::milliseconds(90))
+        << "it is asked no faster";
     EXPECT_EQ(result.m_status, PUB_ERR_NONE);
     EXPECT_EQ(result.m_count, 0);
     EXPECT_EQ(result.m_text, "");

@@ -130,9 +130,13 @@ TEST(read_data_from_file, reports_a_missing_and_an_empty_file)
 TEST(read_data_from_file, refuses_an_absent_argument)
 {
     char text_a[8] = "old";
+    const log_capture_c capture;
     EXPECT_EQ(amt_read_data_from_file(nullptr, 8, "/dev/null"), PUB_ERR_PARAM);
+    EXPECT_EQ(capture.texts().back(), "1, 0, 0");
     EXPECT_EQ(amt_read_data_from_file(text_a, 0, "/dev/null"), PUB_ERR_PARAM);
+    EXPECT_EQ(capture.texts().back(), "0, 1, 0");
     EXPECT_EQ(amt_read_data_from_file(text_a, 8, nullptr), PUB_ERR_PARAM);
+    EXPECT_EQ(capture.texts().back(), "0, 0, 1");
     EXPECT_STREQ(text_a, "old");
 }
 

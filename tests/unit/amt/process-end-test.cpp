@@ -44,9 +44,17 @@ int shut_down_audibly()
     return amt_handle_deinit();
 }
 
+/* A shut-down that takes the watchdog's time away: nobody else ends the process. */
+int shut_down_the_watchdog()
+{
+    const itimerval never = {};
+    return setitimer(ITIMER_REAL, &never, nullptr);
+}
+
 /* A shut-down that meets a fault. */
 int shut_down_into_a_fault()
 {
+    shut_down_the_watchdog();
     raise_fault();
     return 0;
 }
@@ -72,13 +80,6 @@ void *end_process(void *)
 {
     amt_process_end_begin(3);
     wait_for_ever();
-}
-
-/* A shut-down that takes the watchdog's time away: nobody else ends the process. */
-int shut_down_the_watchdog()
-{
-    const itimerval never = {};
-    return setitimer(ITIMER_REAL, &never, nullptr);
 }
 
 [[noreturn]] void end_without_a_watchdog()
@@ -110,6 +111,7 @@ int shut_down_the_watchdog()
 [[noreturn]] void end_twice_on_one_thread()
 {
     amt_process_end_begin(4);
+    shut_down_the_watchdog(); /* nobody else is to end it */
     amt_process_end_begin(5); /* as a fault in the shut-down does */
     _exit(99);
 }

@@ -359,6 +359,25 @@ TEST(fd_mode, switches_only_blocking)
     close(file);
 }
 
+/* A pipe's end for reading has no flag at all. */
+TEST(fd_mode, descriptor_0_without_flags_is_one)
+{
+    int fd_a[2];
+    ASSERT_EQ(pipe(fd_a), 0);
+    const int kept_fd = dup(0);
+    ASSERT_EQ(dup2(fd_a[0], 0), 0);
+    EXPECT_EQ(pub_util_set_fd_mode(0, 1), PUB_ERR_NONE);
+    EXPECT_EQ(fcntl(0, F_GETFL), O_NONBLOCK);
+    EXPECT_EQ(pub_util_set_fd_mode(0, 0), PUB_ERR_NONE);
+    EXPECT_EQ(fcntl(0, F_GETFL), 0);
+    if (dup2(kept_fd, 0) < 0) {
+        close(0);
+    }
+    for (const int fd : {kept_fd, fd_a[0], fd_a[1]}) {
+        close(fd);
+    }
+}
+
 TEST(fd_mode, negative_descriptor)
 {
     const log_capture_c capture;

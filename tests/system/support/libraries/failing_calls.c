@@ -6,6 +6,7 @@
  *   camera        its descriptor is 0, as where nobody has one
  *   fopen         of the file whose path the file holds                ptmx        no pseudo-terminal can be opened
  *   pts-name      it is what the file holds
+ *   event         of the kernel's is lost
  *   station       a text whose first line is REFUSED cannot be written
  *   tcgetattr, tcsetattr, thread, fork, system                         always
  *   timer         its id is -1, as a system may number it; what was wished for is written into the file
@@ -68,6 +69,12 @@ ssize_t write(int descriptor, const void *data, size_t size)
         return -1;
     }
     return OTHER(ssize_t, "write", int, const void *, size_t)(descriptor, data, size);
+}
+
+ssize_t recv(int descriptor, void *buffer, size_t size, int flags)
+{
+    const ssize_t count = OTHER(ssize_t, "recv", int, void *, size_t, int)(descriptor, buffer, size, flags);
+    return is_to_fail(FAIL "event", ENOBUFS) ? -1 : count;
 }
 
 /* What the file holds; empty without one. */
