@@ -7,6 +7,7 @@ from amt_station import wire
 from support.channels import AppChannel, PcChannel, integer
 from support.handler import (IS_DIRECTORY, NO_DEVICE, NO_ENTRY, NO_SPACE, HandlerTrace,
                              device_error, done, refusal, refused)
+from support.moments import logged_at
 from support.shell import break_shell
 
 VOLTAGE = 9
@@ -91,6 +92,15 @@ def test_adc(pc: PcChannel) -> None:
         trace.expect_handler(ADC_HANDLER, f"system({MEASURE}) OK",
                              f"ADC value: {value & 0xFFFFFFFF}")
         assert trace.calls() == [f"fopen(sarvo_battery) = 0 [{text}]"]
+
+
+def test_driver_has_its_time_to_measure(pc: PcChannel) -> None:
+    for _ in range(3):
+        mark = pc.handset.log.mark()
+        assert pc.request(READ_ADC).result == 0
+        asked = pc.handset.log.wait(f"system({MEASURE}) OK", after=mark)
+        read = pc.handset.log.wait("ADC value: ", after=mark)
+        assert logged_at(read) - logged_at(asked) >= 0.019
 
 
 def test_adc_command_fails_five_times(pc: PcChannel) -> None:

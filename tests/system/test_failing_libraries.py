@@ -1,7 +1,10 @@
 """Calls into the system's libraries that fail, one at a time; often only the log tells of it."""
 
+import os
 import re
 from datetime import datetime
+from functools import reduce
+from operator import or_
 from pathlib import Path
 
 import pytest
@@ -229,6 +232,38 @@ def test_camera_as_descriptor_0(make_handset: HandsetFactory, tmp_path: Path) ->
     assert app.request(CAMERA) == refusal(CAMERA)
     trace.expect_handler("amt_device_camera", device_error("amt_device_camera", -100))
     assert 0 not in handset.inspect().descriptors
+
+
+def opened(handset: Handset) -> list[str]:
+    """What was opened since the last look, and with which flags."""
+    lines = handset.text(f"{FAILURES}/opened").splitlines()
+    handset.place(f"{FAILURES}/opened", "")
+    return lines
+
+
+def flags(*values: int) -> str:
+    """As they are noted."""
+    return f"{reduce(or_, values, os.O_RDWR | os.O_CLOEXEC):o}"
+
+
+def test_camera_is_opened_for_both_ways_and_for_nobody_else(make_handset: HandsetFactory,
+                                                            tmp_path: Path) -> None:
+    handset = served(make_handset, tmp_path, "packet")
+    handset.place(f"{FAILURES}/opened", "")
+    assert AppChannel(handset).request(CAMERA).result == 0
+    assert [line for line in opened(handset) if "video" in line] == [f"/dev/video0 {flags()}"]
+
+
+def test_screen_is_opened_for_both_ways_and_for_nobody_else(make_handset: HandsetFactory,
+                                                            tmp_path: Path) -> None:
+    handset = prepare(Operator(make_handset, start=False).handset, tmp_path)
+    handset.start()
+    handset.wait_ready()
+    handset.place(f"{FAILURES}/opened", "")
+    shake_hands(handset)
+    wait_until(lambda: "fb0" in handset.text(f"{FAILURES}/opened") or None, "the screen's opening")
+    lines = [line for line in opened(handset) if "tty0" in line or "fb0" in line]
+    assert lines == [f"/dev/tty0 {flags(os.O_SYNC)}", f"/dev/graphics/fb0 {flags()}"]
 
 
 def test_card_without_the_list_of_mounts(make_handset: HandsetFactory, tmp_path: Path) -> None:

@@ -58,6 +58,7 @@ def test_ac_power_refuses(make_handset: HandsetFactory, text: str) -> None:
     assert texts.count(f"set property({PROPERTY}) to 1.") == 1
     # It is refused at once: no limit of time has to end it.
     assert not handset.log.find("usb enum timeout")
+    assert not handset.log.find("amt_write_wifi_to_nvram_file()")
     assert b"init over" not in handset.stdout()
 
 
@@ -77,6 +78,7 @@ def test_permission_file_refuses(make_handset: HandsetFactory, text: str) -> Non
     assert "do not permit to enter amt by handshake. will exit" in texts
     assert handset.get_property(PROPERTY) == "1"
     assert not handset.log.find("usb enum timeout")
+    assert not handset.log.find("amt_write_wifi_to_nvram_file()")
     assert b"init over" not in handset.stdout()
 
 

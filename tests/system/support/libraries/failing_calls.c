@@ -12,6 +12,8 @@
  *   timer         its id is -1, as a system may number it; what was wished for is written into the file
  *   memory        for what is as large as the picture
  *   inflate-init, inflate                                              always
+ *
+ * What is opened, and with which flags, is added to the file opened, while that is there.
  */
 #define _GNU_SOURCE
 #include <dlfcn.h>
@@ -111,12 +113,27 @@ FILE *fopen(const char *path, const char *mode)
     return OTHER(FILE *, "fopen", const char *, const char *)(path, mode);
 }
 
+static void note_opened(const char *path, int flags)
+{
+    char line[128];
+    const int saved_errno = errno;
+    const int note = OTHER(int, "open", const char *, int, ...)(FAIL "opened", O_WRONLY | O_APPEND | O_CLOEXEC);
+    if (note >= 0) {
+        const int length = snprintf(line, sizeof(line), "%s %o\n", path, (unsigned)flags);
+        const ssize_t written = OTHER(ssize_t, "write", int, const void *, size_t)(note, line, (size_t)length);
+        (void)written;
+        close(note);
+    }
+    errno = saved_errno;
+}
+
 int open(const char *path, int flags, ...)
 {
     va_list arguments;
     va_start(arguments, flags);
     const int mode = va_arg(arguments, int);
     va_end(arguments);
+    note_opened(path, flags);
     if (strcmp(path, "/dev/ptmx") == 0 && is_to_fail(FAIL "ptmx", ENOSPC)) {
         return -1;
     }
