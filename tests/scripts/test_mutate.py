@@ -197,7 +197,8 @@ def test_the_area_of_a_source() -> None:
 
 
 @pytest.mark.parametrize("finder, fate", [
-    ("unit release", Fate.UNIT), ("a.py", Fate.AREA), ("tests/system", Fate.SYSTEM),
+    ("unit release", Fate.UNIT), ("a.py", Fate.AREA),
+    ("tests/system --ignore=a.py", Fate.SYSTEM),
     ("unit asan", Fate.SANITIZED), ("nobody", Fate.SURVIVED)])
 def test_the_stages(finder: str, fate: Fate, monkeypatch: pytest.MonkeyPatch) -> None:
     """In this order, each only when the one before has found nothing."""
@@ -211,9 +212,9 @@ def test_the_stages(finder: str, fate: Fate, monkeypatch: pytest.MonkeyPatch) ->
     monkeypatch.setattr(workshop, "area", lambda path: ["a.py"])
     monkeypatch.setattr(workshop, "_build", lambda preset: (0, ""))
     monkeypatch.setattr(workshop, "_unit", lambda preset="release": run(f"unit {preset}"))
-    monkeypatch.setattr(workshop, "_system", lambda tests: run(*tests))
+    monkeypatch.setattr(workshop, "_system", lambda tests: run(" ".join(tests)))
     assert workshop._tested(mutant(1)).fate is fate
-    stages = ["unit release", "a.py", "tests/system", "unit asan"]
+    stages = ["unit release", "a.py", "tests/system --ignore=a.py", "unit asan"]
     assert tried == stages[:stages.index(finder) + 1 if finder in stages else None]
 
 

@@ -70,7 +70,8 @@ class DaemonWorkshop:
         stages: list[tuple[Fate, Callable[[], str]]] = [(Fate.UNIT, self._unit)]
         if area:
             stages.append((Fate.AREA, lambda: self._system(area)))
-        stages += [(Fate.SYSTEM, lambda: self._system(["tests/system"])),
+        others = ["tests/system", *(f"--ignore={test}" for test in area)]
+        stages += [(Fate.SYSTEM, lambda: self._system(others)),
                    (Fate.SANITIZED, self._sanitized)]
         for fate, run in stages:
             failed = run()
