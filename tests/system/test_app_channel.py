@@ -132,7 +132,11 @@ def test_app_line_that_cannot_be_made_again(make_handset: HandsetFactory) -> Non
     handset.log.wait("pty disconnect: pts name(")
     wait_until(lambda: len(handset.inspect().threads) == threads_of(handset) - 1 or None,
                "the end of the app's reader")
-    assert [text for text in handset.log.texts(PTY_TAG) if text.endswith("failed")]
+    texts = handset.log.texts(PTY_TAG)
+    assert [text for text in texts if text.endswith("failed")]
+    # It is closed once more, though it is by then.
+    assert "FUNC-pub_pty_close(), error_code=-101" in texts[-2]
+    assert texts[-1] == "0, 1"
     assert not handset.log.find("sys call: read() failed!"), "of a line that is not there"
     # The daemon itself goes on, and ends as ever.
     assert handset.exits() == []

@@ -378,6 +378,7 @@ def test_reading_an_item_makes_the_file(desk: ModemDesk) -> None:
                  "amt_item_read_test_result read_item ret_val[0]",
                  dump(APP_OUT, item(5, 0).encode()))
     trace.expect_none("write_at()")
+    assert not [text for text in trace.texts() if "FUNC-amt_item_read_test_result" in text]
 
 
 def test_an_item_is_written_before_and_read_at_its_number(desk: ModemDesk) -> None:

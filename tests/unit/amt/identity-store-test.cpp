@@ -8,6 +8,7 @@
 #include <sys/stat.h>
 
 #include "pub/error.h"
+#include "tests/unit/amt/amt-device/shell-record.h"
 #include "tests/unit/support/log-capture.h"
 #include "tests/unit/support/temp-folder.h"
 
@@ -170,6 +171,15 @@ TEST(make_folder, makes_a_missing_folder_that_all_may_write)
     EXPECT_THAT(capture.texts(),
                 ElementsAre("amt_make_folder()", "amt_make_folder: " + path + " does not exist.\r\n",
                             "amt_make_folder mkdir(" + path + ") successfully"));
+}
+
+TEST(make_folder, gives_it_to_the_radio_s_group)
+{
+    const temp_folder_c folder;
+    const shell_record_c shell;
+    const std::string path = folder.path("BT");
+    EXPECT_EQ(amt_make_folder(path.c_str()), PUB_ERR_NONE);
+    EXPECT_THAT(shell.m_commands, ElementsAre("chgrp -R radio " + path, "chmod 766 " + path));
 }
 
 TEST(make_folder, leaves_an_existing_folder_as_it_is)

@@ -107,8 +107,9 @@ TEST_F(wait_on_pipe, no_descriptor)
 TEST_F(wait_on_pipe, descriptor_0_is_one)
 {
     const int kept_fd = dup(0);
-    say("x");
     ASSERT_EQ(dup2(m_fd_a[0], 0), 0);
+    EXPECT_EQ(amt_wait_readable(0, 1), 0);
+    say("x");
     EXPECT_EQ(amt_wait_readable(0, 30000), 1);
     if (dup2(kept_fd, 0) < 0) {
         close(0);
