@@ -11,6 +11,7 @@ PROJECT = Path(__file__).resolve().parents[2]
 sys.path.insert(0, str(PROJECT))
 
 from tools.mutants import copy, draw  # noqa: E402
+from tools.mutants.areas import AREAS, further  # noqa: E402
 from tools.mutants.daemon_workshop import DaemonWorkshop  # noqa: E402
 from tools.mutants import main as mutate  # noqa: E402
 from tools.mutants.fate import Fate, Trial  # noqa: E402
@@ -149,11 +150,13 @@ def test_of_the_code_itself(sources: Callable[[], dict[str, str]], path: str,
     assert len(without) < len(files) / 20, without
 
 
-@pytest.mark.parametrize("name", sorted(draw.known_equal(draw.EQUAL.read_text())))
-def test_what_is_known_to_be_equal_is_still_a_mutant(name: str) -> None:
-    path = name.split(":", 1)[0]
-    assert name in {mutant.listed
-                    for mutant in mutants_of(path, (PROJECT / path).read_text())}
+EQUAL = sorted(draw.known_equal(draw.EQUAL.read_text()))
+
+
+@pytest.mark.parametrize("path", sorted({name.split(":", 1)[0] for name in EQUAL}))
+def test_what_is_known_to_be_equal_is_still_a_mutant(path: str) -> None:
+    mutants = {mutant.listed for mutant in mutants_of(path, (PROJECT / path).read_text())}
+    assert [name for name in EQUAL if name.startswith(f"{path}: ") and name not in mutants] == []
 
 
 def test_the_list_of_equal_ones() -> None:
@@ -194,6 +197,20 @@ def test_the_area_of_a_source() -> None:
     assert workshop.area("amt/amt-handle/at/at-radio.cpp")[0] == "tests/system/test_at_commands.py"
     assert all(name.startswith("tests/system/") for name in
                workshop.area("amt/amt-handle/at/at-radio.cpp"))
+
+
+@pytest.mark.parametrize("row", sorted(AREAS))
+def test_a_row_of_the_further_areas(row: str) -> None:
+    """It is about a source that is there, and names tests that are."""
+    assert [path for path in draw.sources() if path.startswith(row)]
+    assert [name for name in AREAS[row]
+            if not (PROJECT / "tests" / "system" / f"test_{name}.py").is_file()] == []
+
+
+def test_the_further_areas_of_a_source() -> None:
+    assert further("amt/amt-device/hal-library.cpp") == [
+        "tests/system/test_hal.py", "tests/system/test_audio.py", "tests/system/test_dialogues.py"]
+    assert not further("amt/amt-packet.cpp")
 
 
 @pytest.mark.parametrize("finder, fate", [

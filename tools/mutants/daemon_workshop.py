@@ -5,6 +5,7 @@ from pathlib import Path
 from typing import Callable, Sequence
 
 from tools.lint.tested import DOCUMENT, read_rows
+from tools.mutants.areas import further
 from tools.mutants.copy import COPY, TEST_SECONDS, bring_up_to_date, failing_test, quietly
 from tools.mutants.fate import Fate, Trial
 from tools.mutants.operators import Mutant
@@ -80,14 +81,14 @@ class DaemonWorkshop:
         return Trial(mutant, Fate.SURVIVED)
 
     def area(self, path: str) -> list[str]:
-        """The system tests that the architecture document names for a source, and its room's."""
+        """The system tests of a source: by the architecture document, its name, and a table."""
         tests = [test for sources, tests in self._rows for test in tests
                  if test.startswith("tests/system/test_")
                  and any(path == source or path.startswith(f"{source}/") for source in sources)]
         stem = Path(path).stem.replace("-", "_").removeprefix("amt_")
         tests += [str(found.relative_to(COPY)) for found in
                   sorted((COPY / "tests" / "system").glob(f"test_*{stem}*.py"))]
-        return list(dict.fromkeys(tests))
+        return list(dict.fromkeys([*tests, *further(path)]))
 
     def _sanitized(self) -> str:
         """The same with the sanitizer's build, which is made only here: it takes its time."""
