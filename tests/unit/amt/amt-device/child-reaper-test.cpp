@@ -112,22 +112,25 @@ std::map<std::string, uint64_t> blocked_signals()
     return masks;
 }
 
+constexpr uint64_t get_bit(int signal_number)
+{
+    return uint64_t{1} << (signal_number - 1);
+}
+
 /* Signals are for those who serve lines: who waits for a child takes none. */
 TEST(child_reaper, waits_where_no_signal_comes)
 {
+    constexpr uint64_t WANTED = get_bit(SIGHUP) | get_bit(SIGINT) | get_bit(SIGUSR1) | get_bit(SIGUSR2) |
+                                get_bit(SIGALRM) | get_bit(SIGTERM) | get_bit(SIGCHLD);
     const auto before = blocked_signals();
     const pid_t pid = start_hanging_child();
     amt_child_reap(pid);
     usleep(20000); /* while a thread is made, it takes no signals anyway */
-    const auto after = blocked_signals();
-    ASSERT_EQ(after.size(), before.size() + 1);
-    for (const auto &[task, mask] : after) {
-        if (before.count(task) == 0) {
-            for (const int signal_number : {SIGHUP, SIGINT, SIGUSR1, SIGUSR2, SIGALRM, SIGTERM, SIGCHLD}) {
-                EXPECT_NE(mask & 1ULL << (signal_number - 1), 0U) << signal_number;
-            }
-        }
+    int deaf_count = 0;
+    for (const auto &[task, mask] : blocked_signals()) {
+        deaf_count += before.count(task) == 0 && (mask & WANTED) == WANTED ? 1 : 0;
     }
+    EXPECT_GE(deaf_count, 1); /* a sanitizer may have made a thread of its own */
     ASSERT_EQ(kill(pid, SIGKILL), 0);
     EXPECT_TRUE(is_waited_for(pid));
 }
