@@ -224,6 +224,7 @@ TEST_F(worker, ended_by_a_foreign_signal_is_known_to_be_gone)
 TEST_F(worker, does_not_stop_itself)
 {
     start([] {
+        wait_for(g_is_looked_at, 1);
         amt_worker_stop(g_worker_ptr);
         g_step = STEP_STARTED;
         wait_for(g_released, 1);
