@@ -117,6 +117,16 @@ def test_the_mask_keeps_every_place(mask: Callable[[str], str], source: str) -> 
     assert [len(line) for line in code.split("\n")] == [len(line) for line in source.split("\n")]
 
 
+def test_a_list_tells_mutants_of_like_lines_apart() -> None:
+    source = "int f(int a)\n{\n    a += 1 + 1;\n    g();\n    a += 1 + 1;\n    return a;\n}\n"
+    listed = [mutant.listed for mutant in mutants_of("f.cpp", source)]
+    constant = "f.cpp: a += 1 + 1;: constant: 1 -> 2"
+    assert [one for one in listed if "constant" in one] == [
+        f"{constant} ({turn} of 4)" for turn in (1, 2, 3, 4)]
+    assert "f.cpp: g();: statement: g(); -> ;" in listed
+    assert len(set(listed)) == len(listed)
+
+
 def test_what_a_type_checker_is_told_is_no_code() -> None:
     source = "def f(a: int | None) -> int:\n    assert a is not None and a > 7\n    return a\n"
     assert [(mutant.operator, mutant.line) for mutant in mutants_of("f.py", source)] == [

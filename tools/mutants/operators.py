@@ -1,7 +1,8 @@
 """The kinds of defects, as a table: what is looked for in code, and what is put in its place."""
 
 import re
-from dataclasses import dataclass
+from collections import Counter
+from dataclasses import dataclass, replace
 from typing import Callable, Iterator, Mapping
 
 from tools.mutants.masked import masked, masked_python
@@ -31,6 +32,8 @@ class Mutant:
     before: str
     # The line of code that it is in, or begins in.
     code: str = ""
+    # Which one it is where the same line of code and change come again in the file.
+    turn: str = ""
 
     @property
     def name(self) -> str:
@@ -43,8 +46,8 @@ class Mutant:
 
     @property
     def listed(self) -> str:
-        """How a list names it: without numbers, which move."""
-        return f"{self.path}: {self.code}: {self._change}"
+        """How a list names it: without the numbers of lines, which move."""
+        return f"{self.path}: {self.code}: {self._change}{self.turn}"
 
     @property
     def _change(self) -> str:
@@ -163,7 +166,20 @@ LANGUAGES: Mapping[str, tuple[Callable[[str], str], tuple[Operator, ...]]] = {
 
 
 def mutants_of(path: str, source: str) -> Iterator[Mutant]:
-    """Every mutant of one file."""
+    """Every mutant of one file; no two are listed alike."""
+    mutants = list(_changes(path, source))
+    total = Counter(mutant.listed for mutant in mutants)
+    seen: Counter[str] = Counter()
+    for mutant in mutants:
+        listed = mutant.listed
+        seen[listed] += 1
+        if total[listed] == 1:
+            yield mutant
+        else:
+            yield replace(mutant, turn=f" ({seen[listed]} of {total[listed]})")
+
+
+def _changes(path: str, source: str) -> Iterator[Mutant]:
     mask, operators = LANGUAGES[path.rpartition(".")[2]]
     code = mask(source)
     lines = source.split("\n")
