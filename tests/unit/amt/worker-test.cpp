@@ -1,14 +1,17 @@
 #include "amt/amt-handle/channel/worker.h"
 
 #include <atomic>
+#include <cerrno>
 #include <chrono>
 #include <signal.h>
+#include <thread>
 #include <unistd.h>
 
 #include <gtest/gtest.h>
 
 #include "amt/amt-handle/channel/wait.h"
 #include "pub/util/thread-end.h"
+#include "tests/unit/amt/thread-creation.h"
 #include "tests/unit/support/log-capture.h"
 
 namespace {
@@ -287,6 +290,67 @@ TEST_F(worker, can_be_stopped_as_soon_as_it_is_started)
         amt_worker_stop(g_worker_ptr);
         expect_ended();
     }
+}
+
+TEST_F(worker, that_cannot_be_created_is_none)
+{
+    {
+        const no_threads_c nothing;
+        EXPECT_EQ(amt_worker_start(g_worker_ptr, sleep_for_ever), EAGAIN);
+    }
+    EXPECT_EQ(g_worker_ptr->m_id.load(), 0U);
+    EXPECT_EQ(g_worker_ptr->m_is_alive, 0);
+}
+
+/* While a start has made a thread, but not yet written down which one, the record is nobody else's. */
+constexpr useconds_t START_US = 50000;
+
+TEST_F(worker, that_leaves_before_its_start_is_over_waits_for_it)
+{
+    thread_creation_pause_once([] {
+        wait_for(g_step, STEP_STARTED);
+        usleep(START_US);
+    });
+    ASSERT_EQ(amt_worker_start(g_worker_ptr,
+                               [] {
+                                   g_step = STEP_STARTED;
+                                   amt_worker_leave(g_worker_ptr);
+                                   g_released = g_worker_ptr->m_is_alive == 1 ? 1 : 2;
+                                   g_step = STEP_RETURNED;
+                               }),
+              0);
+    wait_for(g_step, STEP_RETURNED);
+    EXPECT_EQ(g_released, 1) << "it has left what was not there yet";
+    expect_ended();
+}
+
+TEST_F(worker, that_ends_before_its_start_is_over_leaves_no_record)
+{
+    thread_creation_pause_once([] {
+        wait_for(g_step, STEP_STARTED);
+        usleep(START_US);
+    });
+    ASSERT_EQ(amt_worker_start(g_worker_ptr, [] { g_step = STEP_STARTED; }), 0);
+    expect_ended();
+}
+
+TEST_F(worker, that_is_stopped_before_its_start_is_over_is_stopped)
+{
+    std::thread starter([] {
+        wait_for(g_is_looked_at, 1);
+        EXPECT_EQ(amt_worker_start(g_worker_ptr, wait_for_ever), 0);
+    });
+    thread_creation_pause_once([] {
+        wait_for(g_released, 1);
+        usleep(START_US);
+    });
+    g_is_looked_at = 1;
+    wait_for(g_step, STEP_STARTED);
+    g_released = 1;
+    amt_worker_stop(g_worker_ptr);
+    starter.join();
+    expect_ended();
+    EXPECT_EQ(g_step, STEP_STARTED);
 }
 
 } // namespace

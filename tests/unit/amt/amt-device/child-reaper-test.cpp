@@ -1,6 +1,5 @@
 #include "amt/amt-device/child-reaper.h"
 
-#include <dlfcn.h>
 #include <errno.h>
 #include <filesystem>
 #include <fstream>
@@ -14,28 +13,10 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "tests/unit/amt/thread-creation.h"
 #include "tests/unit/support/log-capture.h"
 
 namespace {
-
-bool g_is_without_threads = false;
-
-/* While it lives, no thread is to be had. */
-class no_threads_c {
-public:
-    no_threads_c()
-    {
-        g_is_without_threads = true;
-    }
-
-    ~no_threads_c()
-    {
-        g_is_without_threads = false;
-    }
-
-    no_threads_c(const no_threads_c &) = delete;
-    no_threads_c &operator=(const no_threads_c &) = delete;
-};
 
 constexpr char NO_THREAD_LINE[] = "sys call: pthread_create() failed! errno = 11";
 constexpr int DEADLINE_MS = 30000;
@@ -238,14 +219,3 @@ TEST(child_reaper, tells_of_a_child_too_many)
 }
 
 } // namespace
-
-extern "C" int pthread_create(pthread_t *id_ptr, const pthread_attr_t *attributes_ptr, void *(*body)(void *),
-                              void *argument)
-{
-    if (g_is_without_threads) {
-        return EAGAIN;
-    }
-    using create_func = int (*)(pthread_t *, const pthread_attr_t *, void *(*)(void *), void *);
-    static const create_func next = reinterpret_cast<create_func>(dlsym(RTLD_NEXT, "pthread_create"));
-    return next(id_ptr, attributes_ptr, body, argument);
-}
