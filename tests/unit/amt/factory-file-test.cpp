@@ -4,6 +4,7 @@
 #include <errno.h>
 #include <gtest/gtest.h>
 
+#include "tests/unit/amt/amt-device/shell-record.h"
 #include "tests/unit/support/temp-folder.h"
 
 namespace {
@@ -59,9 +60,12 @@ TEST(factory_file, a_full_file_system_is_a_failed_write_and_is_flushed_all_the_s
 
 TEST(factory_file, flush_keeps_errno)
 {
+    shell_record_c shell;
+    shell.m_error = ECHILD;
     errno = EXDEV;
     EXPECT_GE(time_of(amt_factory_file_sync), FLUSH_TIME);
     EXPECT_EQ(errno, EXDEV);
+    EXPECT_EQ(shell.m_commands, std::vector<std::string>(2, "/system/bin/sync"));
 }
 
 } // namespace

@@ -1,3 +1,4 @@
+#include <chrono>
 #include <string.h>
 #include <unistd.h>
 
@@ -147,7 +148,9 @@ TEST_F(missing_platform, an_adc_read_without_a_value_fails)
 {
     const shell_record_c shell;
     const log_capture_c capture;
+    const auto begin = std::chrono::steady_clock::now();
     EXPECT_EQ(request(amt_device_battery_voltage_check, 224, ""), PUB_ERR_FAIL);
+    EXPECT_GE(std::chrono::steady_clock::now() - begin, std::chrono::milliseconds(20)) << "it measures";
     EXPECT_THAT(without_line_numbers(capture),
                 ElementsAre("amt_device_battery_voltage_check()",
                             "system(" + std::string(MEASURE_COMMAND) + ") OK",

@@ -1,6 +1,7 @@
 #include "tests/unit/amt/amt-device/shell-record.h"
 
 #include <dlfcn.h>
+#include <errno.h>
 #include <stdlib.h>
 
 namespace {
@@ -23,6 +24,9 @@ extern "C" int system(const char *command)
 {
     if (g_record != nullptr) {
         g_record->m_commands.emplace_back(command);
+        if (g_record->m_error != 0) {
+            errno = g_record->m_error;
+        }
         return g_record->m_answer;
     }
     using system_func = int (*)(const char *);

@@ -15,5 +15,6 @@ public:
     shell_record_c &operator=(const shell_record_c &) = delete;
 
     int m_answer = 0; /* of every command */
+    int m_error = 0;  /* what every command leaves in errno, unless it is 0 */
     std::vector<std::string> m_commands;
 };
