@@ -19,6 +19,7 @@
 #include "tests/unit/amt/modem-line.h"
 #include "tests/unit/amt/modem-pty.h"
 #include "tests/unit/amt/small-file.h"
+#include "tests/unit/support/descriptor-swap.h"
 #include "tests/unit/support/log-lines.h"
 #include "tests/unit/support/temp-folder.h"
 
@@ -143,8 +144,7 @@ TEST(at_write, has_a_text)
 TEST(at_write, fails_on_a_closed_channel)
 {
     const small_file_c file(100); /* what descriptor 0 is does not count */
-    const int kept_fd = dup(0);
-    ASSERT_EQ(dup2(file.fd(), 0), 0);
+    const descriptor_swap_c swap(0, file.fd());
     for (const int fd : {0, -1}) {
         g_handle_context.m_fd_at = fd;
         const log_capture_c capture;
@@ -153,10 +153,6 @@ TEST(at_write, fails_on_a_closed_channel)
                   (texts_t{"write_at()", "write_at write_len[-1]", "write_at ret_val[-100]",
                            fail_line("write_at", -100, EBADF)}));
     }
-    if (dup2(kept_fd, 0) < 0) {
-        close(0);
-    }
-    close(kept_fd);
     g_handle_context.m_fd_at = 0;
 }
 

@@ -5,6 +5,7 @@
 #include <thread>
 #include <unistd.h>
 
+#include "tests/unit/support/descriptor-swap.h"
 #include <gtest/gtest.h>
 
 namespace {
@@ -40,13 +41,13 @@ TEST(context, never_closes_descriptor_0)
 
 TEST(context, closes_descriptor_1)
 {
-    const int saved_fd = dup(STDOUT_FILENO);
-    ASSERT_GT(saved_fd, STDOUT_FILENO);
-    std::atomic<int> fd{STDOUT_FILENO};
-    amt_handle_close_fd(&fd);
-    const bool is_closed = !is_open(STDOUT_FILENO);
-    dup2(saved_fd, STDOUT_FILENO);
-    close(saved_fd);
+    bool is_closed = false;
+    {
+        const descriptor_swap_c swap(STDOUT_FILENO, STDERR_FILENO);
+        std::atomic<int> fd{STDOUT_FILENO};
+        amt_handle_close_fd(&fd);
+        is_closed = !is_open(STDOUT_FILENO);
+    }
     EXPECT_TRUE(is_closed);
 }
 

@@ -16,6 +16,7 @@
 #include <gtest/gtest.h>
 
 #include "pub/util/thread-end.h"
+#include "tests/unit/support/descriptor-swap.h"
 
 namespace {
 
@@ -106,15 +107,10 @@ TEST_F(wait_on_pipe, no_descriptor)
 
 TEST_F(wait_on_pipe, descriptor_0_is_one)
 {
-    const int kept_fd = dup(0);
-    ASSERT_EQ(dup2(m_fd_a[0], 0), 0);
+    const descriptor_swap_c swap(0, m_fd_a[0]);
     EXPECT_EQ(amt_wait_readable(0, 1), 0);
     say("x");
     EXPECT_EQ(amt_wait_readable(0, 30000), 1);
-    if (dup2(kept_fd, 0) < 0) {
-        close(0);
-    }
-    close(kept_fd);
 }
 
 TEST_F(wait_on_pipe, read_takes_what_is_there)

@@ -19,6 +19,7 @@
 #include "pub/error.h"
 #include "tests/unit/pub/support/child-process.h"
 #include "tests/unit/pub/support/lines.h"
+#include "tests/unit/support/descriptor-swap.h"
 #include "tests/unit/support/log-capture.h"
 #include "tests/unit/support/temp-folder.h"
 
@@ -313,14 +314,9 @@ TEST(serial_attr, no_terminal)
 
 TEST(serial_attr, descriptor_0_is_one)
 {
-    const int kept_fd = dup(0);
     const int fd = open("/dev/null", O_RDWR);
-    ASSERT_EQ(dup2(fd, 0), 0);
+    const descriptor_swap_c swap(0, fd);
     EXPECT_EQ(pub_util_set_serial_dev_attr(0, 230400), PUB_ERR_SYS_CALL);
-    if (dup2(kept_fd, 0) < 0) {
-        close(0);
-    }
-    close(kept_fd);
     close(fd);
 }
 
@@ -364,18 +360,13 @@ TEST(fd_mode, descriptor_0_without_flags_is_one)
 {
     int fd_a[2];
     ASSERT_EQ(pipe(fd_a), 0);
-    const int kept_fd = dup(0);
-    ASSERT_EQ(dup2(fd_a[0], 0), 0);
+    const descriptor_swap_c swap(0, fd_a[0]);
     EXPECT_EQ(pub_util_set_fd_mode(0, 1), PUB_ERR_NONE);
     EXPECT_EQ(fcntl(0, F_GETFL), O_NONBLOCK);
     EXPECT_EQ(pub_util_set_fd_mode(0, 0), PUB_ERR_NONE);
     EXPECT_EQ(fcntl(0, F_GETFL), 0);
-    if (dup2(kept_fd, 0) < 0) {
-        close(0);
-    }
-    for (const int fd : {kept_fd, fd_a[0], fd_a[1]}) {
-        close(fd);
-    }
+    close(fd_a[0]);
+    close(fd_a[1]);
 }
 
 TEST(fd_mode, negative_descriptor)

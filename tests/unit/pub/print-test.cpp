@@ -1,9 +1,12 @@
 #include "pub/log/print.h"
 
+#include <algorithm>
 #include <atomic>
+#include <dlfcn.h>
 #include <errno.h>
 #include <fcntl.h>
 #include <signal.h>
+#include <stdint.h>
 #include <string>
 #include <sys/time.h>
 #include <thread>
@@ -11,12 +14,15 @@
 
 #include <gtest/gtest.h>
 
+#include "tests/unit/support/descriptor-swap.h"
+
 namespace {
 
 constexpr int PIPE_SIZE = 4096;
 constexpr int ALARM_COUNT = 3;
 
 std::atomic<int> g_alarm_count{0};
+std::atomic<size_t> g_most_written{SIZE_MAX}; /* by one write to standard output */
 
 void count_alarm(int)
 {
@@ -64,25 +70,6 @@ template <typename body_t> std::thread start_spared(body_t body)
     return thread;
 }
 
-/* Puts another descriptor in the place of standard output while it lives. */
-class stdout_swap_c {
-public:
-    explicit stdout_swap_c(int fd) : m_saved_fd(dup(STDOUT_FILENO))
-    {
-        fd < 0 ? close(STDOUT_FILENO) : dup2(fd, STDOUT_FILENO);
-    }
-    ~stdout_swap_c()
-    {
-        dup2(m_saved_fd, STDOUT_FILENO);
-        close(m_saved_fd);
-    }
-    stdout_swap_c(const stdout_swap_c &) = delete;
-    stdout_swap_c &operator=(const stdout_swap_c &) = delete;
-
-private:
-    int m_saved_fd;
-};
-
 class print : public testing::Test {
 protected:
     void SetUp() override
@@ -109,7 +96,7 @@ protected:
 
 TEST_F(print, text_is_in_the_pipe_at_once)
 {
-    const stdout_swap_c swap(m_pipe_a[1]);
+    const descriptor_swap_c swap(STDOUT_FILENO, m_pipe_a[1]);
     pub_print("no line end yet: %d", 5);
     EXPECT_EQ(take(), "no line end yet: 5");
     pub_print("%s", "one line\n");
@@ -120,7 +107,7 @@ TEST_F(print, text_is_in_the_pipe_at_once)
 
 TEST_F(print, long_text_is_cut_at_4607_bytes)
 {
-    const stdout_swap_c swap(m_pipe_a[1]);
+    const descriptor_swap_c swap(STDOUT_FILENO, m_pipe_a[1]);
     pub_print("%s", std::string(4607, 'a').c_str());
     EXPECT_EQ(take(), std::string(4607, 'a'));
     pub_print("%s", std::string(4608, 'b').c_str());
@@ -146,7 +133,7 @@ TEST_F(print, text_is_whole_though_its_writes_are_interrupted)
         }
     });
     {
-        const stdout_swap_c swap(m_pipe_a[1]);
+        const descriptor_swap_c swap(STDOUT_FILENO, m_pipe_a[1]);
         const alarms_c alarms;
         pub_print("%s", text.c_str());
     }
@@ -158,9 +145,18 @@ TEST_F(print, text_is_whole_though_its_writes_are_interrupted)
     EXPECT_EQ(taken, text);
 }
 
+TEST_F(print, goes_on_where_a_single_byte_was_taken)
+{
+    const descriptor_swap_c swap(STDOUT_FILENO, m_pipe_a[1]);
+    g_most_written = 1;
+    pub_print("whole");
+    g_most_written = SIZE_MAX;
+    EXPECT_EQ(take(), "whole");
+}
+
 TEST_F(print, errno_survives_a_closed_output)
 {
-    const stdout_swap_c swap(-1);
+    const descriptor_swap_c swap(STDOUT_FILENO, -1);
     errno = EXDEV;
     pub_print("lost");
     EXPECT_EQ(errno, EXDEV);
@@ -168,8 +164,15 @@ TEST_F(print, errno_survives_a_closed_output)
 
 TEST_F(print, empty_text_writes_nothing)
 {
-    const stdout_swap_c swap(m_pipe_a[1]);
+    const descriptor_swap_c swap(STDOUT_FILENO, m_pipe_a[1]);
     pub_print("%s", "");
     pub_print("next");
     EXPECT_EQ(take(), "next");
+}
+
+extern "C" ssize_t write(int fd, const void *data, size_t size)
+{
+    using write_func = ssize_t (*)(int, const void *, size_t);
+    static const write_func next = reinterpret_cast<write_func>(dlsym(RTLD_NEXT, "write"));
+    return next(fd, data, fd == STDOUT_FILENO ? std::min(size, g_most_written.load()) : size);
 }
