@@ -12,7 +12,8 @@ from tools import children
 from tools.progress import Progress
 from tools.project import PROJECT, die, note, say
 
-PRESETS = ("release", "asan", "tsan", "coverage", "fuzz", "armhf", "armhf-asan", "android")
+PRESETS = ("release", "asan", "tsan", "coverage", "fuzz", "fuzz-plain", "armhf", "armhf-asan",
+           "android")
 # What ninja puts before each step.
 STEP = re.compile(rb"\[(\d+)/(\d+)\] ")
 FIRST_FAILURE = re.compile(r"^FAILED: |^CMake Error", re.MULTILINE)

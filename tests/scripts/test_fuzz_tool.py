@@ -21,8 +21,10 @@ stat::new_units_added:          56
 """
 # In the engine's place: says what it says, and makes an input, or takes one.
 ENGINE = """#!/bin/sh
+echo "$(basename "$(dirname "$0")") $1" >> {log}
 case $1 in
     -merge=1) cp "$4"/* "$3" ;;
+    -runs=0) echo "again: $(cat "$3/one")"; exit {again} ;;
     *) echo input > "$6/one"; cat {said} ;;
 esac
 exit {status}
@@ -35,13 +37,17 @@ def options(monkeypatch: pytest.MonkeyPatch, *words: str) -> dict[str, object]:
     return vars(fuzz.parse())
 
 
-def place_engine(monkeypatch: pytest.MonkeyPatch, folder: Path, status: int = 0) -> None:
-    """Targets that are one shell script."""
+def place_engine(monkeypatch: pytest.MonkeyPatch, folder: Path, status: int = 0,
+                 again: int = 0) -> None:
+    """Targets that are one shell script; AGAIN is the status of a run with the sanitizers alone."""
     (folder / "said").write_bytes(SAID)
-    program = folder / "packet-fuzz"
-    program.write_text(ENGINE.format(said=folder / "said", status=status))
-    program.chmod(0o755)
-    monkeypatch.setattr(targets, "PROGRAMS", folder)
+    for name in ("PROGRAMS", "PLAIN_PROGRAMS"):
+        program = folder / name / "packet-fuzz"
+        program.parent.mkdir()
+        program.write_text(ENGINE.format(said=folder / "said", status=status, again=again,
+                                         log=folder / "ran"))
+        program.chmod(0o755)
+        monkeypatch.setattr(targets, name, program.parent)
     monkeypatch.setattr(targets, "CORPORA", folder / "corpus")
     monkeypatch.setattr(fuzz, "FOUND", folder / "found")
 
@@ -59,7 +65,9 @@ def test_other_options(monkeypatch: pytest.MonkeyPatch) -> None:
 
 
 @pytest.mark.parametrize("words", [
-    ("0",), ("x",), ("5", "--nightly"), ("-j", "0"), ("--nightly", "0"), ("--target", "none")])
+    ("0",), ("x",), ("5", "--nightly"), ("-j", "0"), ("--nightly", "0"), ("--target", "none"),
+    ("--executions", "0"), ("--executions", "2147483648"), ("--executions", "5", "--nightly"),
+    ("5", "--executions", "5")])
 def test_nonsense_is_refused(monkeypatch: pytest.MonkeyPatch, words: Sequence[str]) -> None:
     with pytest.raises(SystemExit) as ended:
         options(monkeypatch, *words)
@@ -93,6 +101,24 @@ def test_what_a_finding_needs_is_not_taken(monkeypatch: pytest.MonkeyPatch,
     figures = fuzz.run_target("packet", 1, True)
     assert figures.is_finding and not (tmp_path / "corpus").exists()
     assert "number_of_executed_units" in figures.report
+
+
+@pytest.mark.parametrize("again", [0, 77])
+def test_executions_are_counted_without_sanitizers_and_what_is_new_runs_with_them(
+        monkeypatch: pytest.MonkeyPatch, tmp_path: Path, again: int) -> None:
+    place_engine(monkeypatch, tmp_path, again=again)
+    figures = fuzz.run_target("packet", 1, False, 1_000_000_000)
+    assert (tmp_path / "ran").read_text().splitlines() == [
+        "PLAIN_PROGRAMS -runs=1000000000", "PROGRAMS -runs=0"]
+    assert (figures.executions, figures.status, figures.is_finding) == (12960, again, again != 0)
+    assert figures.report.endswith("again: input\n")
+
+
+def test_what_fails_without_sanitizers_is_a_finding(monkeypatch: pytest.MonkeyPatch,
+                                                    tmp_path: Path) -> None:
+    place_engine(monkeypatch, tmp_path, status=77)
+    assert fuzz.run_target("packet", 1, False, 5).is_finding
+    assert len((tmp_path / "ran").read_text().splitlines()) == 1
 
 
 def test_the_table_and_its_last_line() -> None:

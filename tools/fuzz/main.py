@@ -19,11 +19,11 @@ SECONDS, NIGHTLY_HOURS = 60, 1.0
 HEAD = ("target", "executions", "a second", "edges", "new edges", "inputs taken")
 
 
-def run_target(name: str, seconds: int, is_grown: bool) -> Figures:
+def run_target(name: str, seconds: int, is_grown: bool, executions: int = 0) -> Figures:
     """Run a target, and let its corpus grow by what it has found."""
     found = FOUND / name
     shutil.rmtree(found, ignore_errors=True)
-    figures = targets.run(name, seconds, found)
+    figures = targets.run(name, seconds, found, executions)
     if is_grown and not figures.is_finding:
         figures.grown = targets.grow(name, found)
     note(f"{name}: {'FINDING' if figures.is_finding else 'done'}")
@@ -64,6 +64,10 @@ def parse() -> argparse.Namespace:
                         help=f"for each target (default: {SECONDS})")
     parser.add_argument("--nightly", nargs="?", type=float, const=NIGHTLY_HOURS, metavar="HOURS",
                         help=f"so many hours for each target instead (default: {NIGHTLY_HOURS:g})")
+    parser.add_argument("--executions", type=int, metavar="N",
+                        help="so many executions of each target instead, however long they take, "
+                        "without the sanitizers, and no Python; what has reached new edges then "
+                        "runs with them")
     parser.add_argument("-j", "--jobs", type=int, default=CORES, metavar="N",
                         help="targets at once (default: %(default)s)")
     parser.add_argument("--grow", action="store_true",
@@ -71,8 +75,11 @@ def parse() -> argparse.Namespace:
     parser.add_argument("--target", action="append", choices=targets.names(),
                         help="only this one, and no Python; may be given again")
     options = parser.parse_args()
-    if options.nightly is not None and options.seconds is not None:
-        parser.error("SECONDS or --nightly, not both")
+    lengths = (options.seconds, options.nightly, options.executions)
+    if sum(length is not None for length in lengths) > 1:
+        parser.error("one of SECONDS, --nightly and --executions")
+    if options.executions is not None and not 0 < options.executions <= targets.MOST_EXECUTIONS:
+        parser.error(f"the executions are a whole number from 1 to {targets.MOST_EXECUTIONS}")
     if options.nightly is not None:
         options.seconds = round(options.nightly * 3600)
     if options.seconds is None:
@@ -87,13 +94,17 @@ def parse() -> argparse.Namespace:
 def main() -> int:
     """Build the targets and run them; a finding is shown, and ends with a status of its own."""
     options = parse()
-    build("fuzz")
+    executions = options.executions or 0
+    for preset in (targets.PRESET, targets.PLAIN_PRESET)[:2 if executions else 1]:
+        build(preset)
     FOUND.mkdir(parents=True, exist_ok=True)
     chosen = options.target or targets.names()
-    say(f"{len(chosen)} targets, {options.seconds} s each, {options.jobs} at once")
+    each = f"{executions:,} executions" if executions else f"{options.seconds} s"
+    say(f"{len(chosen)} targets, {each} each, {options.jobs} at once")
     pool = ThreadPoolExecutor(options.jobs)
     try:
-        runs = list(pool.map(lambda name: run_target(name, options.seconds, options.grow), chosen))
+        runs = list(pool.map(
+            lambda name: run_target(name, options.seconds, options.grow, executions), chosen))
     finally:
         # Interrupted, it must not wait for what it has begun.
         pool.shutdown(wait=False, cancel_futures=True)
@@ -101,7 +112,7 @@ def main() -> int:
     for figures in wrong:
         print(f"\n{figures.name}:\n{figures.report}\n(its input: {FOUND}/{figures.name}-*)")
     print(describe(runs), flush=True)
-    if options.target:
+    if options.target or executions:
         return 1 if wrong else 0
     properties = readers.run(options.seconds, options.jobs)
     if properties.status != readers.PASSED:

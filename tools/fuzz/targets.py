@@ -12,7 +12,12 @@ from tools.project import PROJECT
 
 SOURCES = PROJECT / "tests" / "fuzz"
 CORPORA = SOURCES / "corpus"
-PROGRAMS = PROJECT / "build" / "fuzz" / "bin"
+# Without the sanitizers a target runs many times faster, but sees only what it checks itself.
+PRESET, PLAIN_PRESET = "fuzz", "fuzz-plain"
+PROGRAMS = PROJECT / "build" / PRESET / "bin"
+PLAIN_PROGRAMS = PROJECT / "build" / PLAIN_PRESET / "bin"
+# The engine counts no further.
+MOST_EXECUTIONS = 2 ** 31 - 1
 SHOWN_BYTES = 6000
 
 # An input that takes so long hangs; and nothing here needs so much.
@@ -57,9 +62,9 @@ class Figures:
         return self.said[-SHOWN_BYTES:].decode("utf-8", "replace")
 
 
-def command(name: str, *words: str) -> list[str]:
+def command(name: str, *words: str, is_plain: bool = False) -> list[str]:
     """The command line of a target."""
-    return [str(PROGRAMS / f"{name}-fuzz"), *words]
+    return [str((PLAIN_PROGRAMS if is_plain else PROGRAMS) / f"{name}-fuzz"), *words]
 
 
 def read_figures(name: str, said: bytes) -> Figures:
@@ -71,19 +76,33 @@ def read_figures(name: str, said: bytes) -> Figures:
                    said=said)
 
 
-def run(name: str, seconds: int, found: Path) -> Figures:
-    """Run a target from its corpus; its new inputs, and what is wrong, lie in FOUND then."""
+def run(name: str, seconds: int, found: Path, executions: int = 0) -> Figures:
+    """Run a target from its corpus; its new inputs, and what is wrong, lie in FOUND then.
+
+    With EXECUTIONS it runs so often, however long it takes, without the sanitizers; what has taken
+    new ways runs with them in the end.
+    """
     found.mkdir(parents=True, exist_ok=True)
+    length = f"-runs={executions}" if executions else f"-max_total_time={seconds}"
     said: list[bytes] = []
     began = time.monotonic()
     status = children.run(
-        command(name, f"-max_total_time={seconds}", f"-timeout={INPUT_SECONDS}",
-                f"-rss_limit_mb={MEMORY_MIB}", "-print_final_stats=1",
-                f"-artifact_prefix={found.parent}/{name}-", str(found), str(CORPORA / name)),
+        command(name, length, f"-timeout={INPUT_SECONDS}", f"-rss_limit_mb={MEMORY_MIB}",
+                "-print_final_stats=1", f"-artifact_prefix={found.parent}/{name}-",
+                str(found), str(CORPORA / name), is_plain=executions > 0),
         said.append, {"ASAN_OPTIONS": "detect_leaks=1"})
     figures = read_figures(name, b"".join(said))
     figures.status, figures.seconds = status, time.monotonic() - began
+    if executions and status == 0:
+        figures.status = replay(name, found, said)
+        figures.said = b"".join(said)
     return figures
+
+
+def replay(name: str, found: Path, said: list[bytes]) -> int:
+    """Run what was found once more, with the sanitizers; the status, and in SAID their words."""
+    return children.run(command(name, "-runs=0", f"-artifact_prefix={found.parent}/{name}-",
+                                str(found), str(CORPORA / name)), said.append)
 
 
 def grow(name: str, found: Path) -> int:

@@ -54,6 +54,7 @@ UNTYPED: dict[str, Row] = {
     "./dev fuzz 600 --target packet --target hub": _LONG,
     "./dev fuzz --nightly 2 -j 2 --grow": _LONG,
     "./dev fuzz --nightly 2 --grow": _LONG,
+    "./dev fuzz --executions 1000000000 --target envelope -j 1": _LONG,
     "./dev bench": _LONG,
     "./dev bench --runs 20 --only round-trip": _LONG,
     "./dev bench --all-cores": _LONG,
