@@ -95,6 +95,15 @@ def test_switch_property_chooses_the_path(make_handset: HandsetFactory, value: s
     assert ("will create amt1/4 thread. " in texts) == is_pc
 
 
+@pytest.mark.parametrize("mode, path", [("pc", "init_for_amt_1_4"),
+                                        ("packet", "init_for_amt_2_3")])
+def test_start_is_logged_step_by_step(make_handset: HandsetFactory, mode: str, path: str) -> None:
+    handset = make_handset(mode)
+    texts = handset.log.texts(TAG)
+    steps = ["amt_handle_init()", "amt_write_wifi_to_nvram_file()", f"{path}()"]
+    assert [text for text in texts if text in steps] == steps
+
+
 @pytest.mark.parametrize("path", ["simplified", "usb-inserted"])
 def test_simplified_mode_serves_the_pc(make_handset: HandsetFactory, path: str) -> None:
     handset = make_handset(path, properties={SWITCH: "0"})
