@@ -92,6 +92,14 @@ def test_other_options_print_the_usage(idle_handset: Handset, arguments: list[st
     assert idle_handset.log.texts() == []
 
 
+@pytest.mark.parametrize("arguments", [["-u", "-u"], ["-uuu"]])
+def test_one_option_may_be_given_again(idle_handset: Handset, arguments: list[str]) -> None:
+    idle_handset.place("/system/etc/vx-kel-amt.cfg", None)
+    ended = idle_handset.run([PROGRAM, *arguments])
+    assert ended.stdout.decode().startswith("g_usb_activate:1.\n")
+    assert ended.status == status_byte(-118)
+
+
 def test_words_that_are_no_options_are_ignored(idle_handset: Handset) -> None:
     idle_handset.place("/system/etc/vx-kel-amt.cfg", None)
     ended = idle_handset.run([PROGRAM, "word"])
