@@ -2,6 +2,7 @@
 
 #include <atomic>
 #include <dlfcn.h>
+#include <optional>
 #include <string>
 #include <sys/resource.h>
 #include <sys/socket.h>
@@ -43,7 +44,11 @@ public:
 
     ~heard_monitor_c()
     {
+        m_capture.reset(); /* it allocates, which the signal that stops a worker must not */
         amt_worker_stop(&g_handle_context.m_usb_monitor);
+        while (g_handle_context.m_usb_monitor.m_is_alive != 0) {
+            usleep(1000);
+        }
         g_event_socket = NO_SOCKET;
         close(m_fd_a[0]);
         close(m_fd_a[1]);
@@ -55,22 +60,22 @@ public:
     /* Sends an event, and waits until it is logged. */
     void send(const std::string &event)
     {
-        const size_t before = m_capture.texts().size();
+        const size_t before = texts().size();
         EXPECT_EQ(write(m_fd_a[1], event.data(), event.size()), static_cast<ssize_t>(event.size()));
-        for (int i = 0; i < DEADLINE_MS && m_capture.texts().size() == before; i++) {
+        for (int i = 0; i < DEADLINE_MS && texts().size() == before; i++) {
             usleep(1000);
         }
     }
 
     std::vector<std::string> texts() const
     {
-        return m_capture.texts();
+        return m_capture->texts();
     }
 
 private:
     static constexpr int DEADLINE_MS = 30000;
     int m_fd_a[2];
-    log_capture_c m_capture;
+    std::optional<log_capture_c> m_capture{std::in_place};
 };
 
 std::string heard(const std::string &text)

@@ -88,11 +88,21 @@ protected:
     pthread_t m_handle = 0; /* the handle that the operation clears */
 };
 
+/*
+ * ThreadSanitizer makes its record of a thread's signals with the thread's first call that waits, and loses a
+ * signal that comes at that very moment.
+ */
+void say_started()
+{
+    usleep(1);
+    g_step = 1;
+}
+
 void *read_for_ever(void *)
 {
     pub_util_defer_thread_end();
     pub_util_allow_thread_end();
-    g_step = 1;
+    say_started();
     char byte = 0;
     while (read(g_pipe_a[0], &byte, 1) != 1) {
     }
@@ -103,7 +113,7 @@ void *work_then_allow(void *)
 {
     pub_util_defer_thread_end();
     g_thread_id = static_cast<int>(gettid());
-    g_step = 1;
+    say_started();
     while (g_released == 0) {
         usleep(1000);
     }
@@ -117,7 +127,7 @@ void *work_then_allow(void *)
 void *work_then_sleep(void *)
 {
     pub_util_defer_thread_end();
-    g_step = 1;
+    say_started();
     pub_util_sleep_ms(600000);
     return &g_return_mark;
 }
@@ -125,7 +135,7 @@ void *work_then_sleep(void *)
 void *wait_on_a_pipe_for_ever(void *)
 {
     pub_util_defer_thread_end();
-    g_step = 1;
+    say_started();
     pub_util_wait_fd(g_pipe_a[0], POLLIN, 600000);
     return &g_return_mark;
 }
@@ -133,7 +143,7 @@ void *wait_on_a_pipe_for_ever(void *)
 void *kill_another(void *handle_ptr)
 {
     pub_util_defer_thread_end();
-    g_step = 1;
+    say_started();
     while (g_released == 0) {
         usleep(1000);
     }
@@ -147,7 +157,7 @@ void *kill_another(void *handle_ptr)
 void *open_for_ever(void *)
 {
     pub_util_defer_thread_end();
-    g_step = 1;
+    say_started();
     int fd = -1;
     pub_util_try_to_open_device(&fd, "/dev/null/none", O_RDWR, 60, 60000);
     return &g_return_mark;
@@ -156,7 +166,7 @@ void *open_for_ever(void *)
 void *forbid_after_note(void *)
 {
     pub_util_defer_thread_end();
-    g_step = 1;
+    say_started();
     while (g_released == 0) {
         usleep(1000);
     }
@@ -184,7 +194,7 @@ void *handle_directly(void *)
 
 void *return_at_once(void *)
 {
-    g_step = 1;
+    say_started();
     return &g_return_mark;
 }
 
