@@ -1,5 +1,7 @@
 #include "amt/amt-handle/request/modem-value.h"
 
+#include <algorithm>
+#include <errno.h>
 #include <fcntl.h>
 #include <poll.h>
 #include <sys/socket.h>
@@ -13,7 +15,7 @@
 #include "amt/amt-handle/channel/context.h"
 #include "pub/error.h"
 #include "tests/unit/amt/modem-line.h"
-#include "tests/unit/support/log-capture.h"
+#include "tests/unit/support/log-lines.h"
 #include "tests/unit/support/temp-folder.h"
 
 namespace {
@@ -139,7 +141,11 @@ TEST_F(temperature, without_a_file_is_a_failure)
     const log_capture_c capture;
     EXPECT_EQ(m_line.handle(amt_modem_handle_temperature, wire_packet(55, "")), PUB_ERR_NONE);
     EXPECT_EQ(m_line.app_packets(), std::vector<std::string>{failure_packet(56)});
-    EXPECT_TRUE(capture.has("fopen error: errno=2"));
+    const std::vector<std::string> texts = without_line_numbers(capture);
+    const auto failure = std::find(texts.begin(), texts.end(), "fopen error: errno=2");
+    ASSERT_TRUE(failure != texts.begin() && failure != texts.end());
+    EXPECT_EQ(*std::prev(failure),
+              error_line("amt/amt-handle", "amt_modem_handle_temperature", PUB_ERR_FILE, ENOENT));
 }
 
 /* The end of a thread runs no destructors, and strikes where it waits: for the app that does not read, too. */

@@ -41,7 +41,7 @@ TEST(write_test_result, leaves_an_empty_description_out)
 
 TEST(write_test_result, takes_126_characters_of_a_description)
 {
-    for (const size_t size : {125U, 126U, 127U, 128U, 300U}) {
+    for (const size_t size : {1U, 125U, 126U, 127U, 128U, 300U}) {
         const modem_line_c line;
         line.answer(OK);
         const std::string atoms = int_atom(39, 20) + int_atom(36, 1) + text_atom(37, std::string(size, 'd'));

@@ -54,17 +54,19 @@ std::vector<line_st> read_lines(const std::string &content, uint32_t capacity = 
 /* Splits a copy of the text: "KEY|VALUE", or the status. */
 std::string split(const std::string &text)
 {
-    std::string line = text;
+    std::string area = " " + text; /* the blank is no part of it */
+    char *const line = area.data() + 1;
     char *key = nullptr;
     char *value = nullptr;
-    const int status = pub_cfg_get_param_and_value(line.data(), &key, &value);
+    const int status = pub_cfg_get_param_and_value(line, &key, &value);
+    EXPECT_EQ(area[0], ' ');
     if (status != PUB_ERR_NONE) {
         EXPECT_EQ(key, nullptr);
         EXPECT_EQ(value, nullptr);
         return std::to_string(status);
     }
-    EXPECT_TRUE(key >= line.data() && key <= line.data() + line.size());
-    EXPECT_TRUE(value >= line.data() && value <= line.data() + line.size());
+    EXPECT_TRUE(key >= line && key <= line + text.size());
+    EXPECT_TRUE(value >= line && value <= line + text.size());
     return std::string(key) + "|" + value;
 }
 
