@@ -29,7 +29,7 @@ AREAS: Mapping[str, tuple[str, ...]] = {
     "amt/amt-handle/request/station-result": ("test_results",),
     "amt/amt-handle/startup": ("ends", "failing_libraries", "signals"),
     "amt/main": ("handshake", "failing_libraries", "signals"),
-    "amt/signal-treatment": ("signals", "entry", "failing_libraries", "handshake"),
+    "amt/signal-treatment": ("signals", "faults", "entry", "failing_libraries", "handshake"),
     "pub/pty/": ("app_channel", "failing_libraries"),
 }
 

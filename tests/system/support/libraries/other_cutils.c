@@ -23,8 +23,13 @@ __attribute__((weak)) int property_get(const char *key, char *value, const char 
     return other_property_get(key, value, default_value);
 }
 
-int property_set(const char *key, const char *value)
+int other_property_set(const char *key, const char *value)
 {
     int (*set)(const char *, const char *) = find("property_set");
     return set(key, value);
+}
+
+__attribute__((weak)) int property_set(const char *key, const char *value)
+{
+    return other_property_set(key, value);
 }
