@@ -107,9 +107,10 @@ def test_what_a_finding_needs_is_not_taken(monkeypatch: pytest.MonkeyPatch,
 def test_executions_are_counted_without_sanitizers_and_what_is_new_runs_with_them(
         monkeypatch: pytest.MonkeyPatch, tmp_path: Path, again: int) -> None:
     place_engine(monkeypatch, tmp_path, again=again)
-    figures = fuzz.run_target("packet", 1, False, 1_000_000_000)
+    figures = fuzz.run_target("packet", 1, True, 1_000_000_000)
     assert (tmp_path / "ran").read_text().splitlines() == [
-        "PLAIN_PROGRAMS -runs=1000000000", "PROGRAMS -runs=0"]
+        "PLAIN_PROGRAMS -runs=1000000000", "PROGRAMS -runs=0",
+        *([] if again else ["PLAIN_PROGRAMS -merge=1"])]
     assert (figures.executions, figures.status, figures.is_finding) == (12960, again, again != 0)
     assert figures.report.endswith("again: input\n")
 

@@ -25,7 +25,7 @@ def run_target(name: str, seconds: int, is_grown: bool, executions: int = 0) -> 
     shutil.rmtree(found, ignore_errors=True)
     figures = targets.run(name, seconds, found, executions)
     if is_grown and not figures.is_finding:
-        figures.grown = targets.grow(name, found)
+        figures.grown = targets.grow(name, found, executions > 0)
     note(f"{name}: {'FINDING' if figures.is_finding else 'done'}")
     return figures
 

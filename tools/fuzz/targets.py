@@ -105,14 +105,15 @@ def replay(name: str, found: Path, said: list[bytes]) -> int:
                                 str(found), str(CORPORA / name)), said.append)
 
 
-def grow(name: str, found: Path) -> int:
+def grow(name: str, found: Path, is_plain: bool = False) -> int:
     """Take into the corpus what reaches edges that it does not; how many inputs that were.
 
-    The engine takes the smallest inputs first.
+    The edges are those of the build that has found them. The engine takes the smallest inputs
+    first.
     """
     corpus = CORPORA / name
     corpus.mkdir(parents=True, exist_ok=True)
     before = len(list(corpus.iterdir()))
-    children.run(command(name, "-merge=1", "-use_counters=0", str(corpus), str(found)),
-                 lambda piece: None)
+    children.run(command(name, "-merge=1", "-use_counters=0", str(corpus), str(found),
+                         is_plain=is_plain), lambda piece: None)
     return len(list(corpus.iterdir())) - before
