@@ -166,6 +166,7 @@ def test_what_is_no_file(tmp_path: Path, path: str) -> None:
 
 ASKS = "[[step]]\nenter = 'Text?'\nname = 'e'\nsave = 'x'\n"
 USES = "[[step]]\nat = 'AT^A=${x}'\n"
+SAVED = "[[step]]\ncommand = 'battery adc'\nsave = { adc = 'a' }\nstop = true\n"
 
 
 @pytest.mark.parametrize("text, words", [
@@ -184,6 +185,8 @@ USES = "[[step]]\nat = 'AT^A=${x}'\n"
      "with.index: a text, and index is a whole number"),
     ("[input.n]\nformat = 'int'\n[[step]]\ncommand = 'imei write'\nwith = { imei = '${n}' }",
      "with.imei: 'n' is a number, and imei is a text"),
+    (SAVED + "[[step]]\ncommand = 'imei write'\nwith = { imei = '${a}' }",
+     "with.imei: 'a' is a number, and imei is a text"),
     (SN + "[[step]]\ncommand = 'battery adc'\nlimits.adc = { min = '${sn}' }",
      "limits.adc.min: 'sn' is a text, adc a number"),
     (SN + ASKS.replace("'x'", "'sn'"), "'sn' is no free name"),
@@ -208,6 +211,7 @@ def test_references_are_followed_when_the_plan_is_read(tmp_path: Path, text: str
     "[[step]]\ncommand = 'test-result write'\nforce = true\n"
     "with = { station = 3, verdict = 7 }\n",
     ADC + "save = { adc = 'a' }\nstop = true\n" + ADC.replace("10", "'${a}'"),
+    SAVED + "[[step]]\ncommand = 'gps read'\nwith = { index = '${a}' }\n",
 ])
 def test_good_references(tmp_path: Path, text: str) -> None:
     assert problems(tmp_path, text) == []
