@@ -4,11 +4,12 @@
 #include <cerrno>
 #include <dlfcn.h>
 #include <pthread.h>
+#include <utility>
 
 namespace {
 
 std::atomic<bool> g_is_without_threads{false};
-std::atomic<void (*)()> g_pause{nullptr};
+thread_local void (*t_pause)() = nullptr;
 
 } // namespace
 
@@ -24,7 +25,7 @@ no_threads_c::~no_threads_c()
 
 void thread_creation_pause_once(void (*pause)())
 {
-    g_pause = pause;
+    t_pause = pause;
 }
 
 extern "C" int pthread_create(pthread_t *id_ptr, const pthread_attr_t *attributes_ptr, void *(*body)(void *),
@@ -36,7 +37,7 @@ extern "C" int pthread_create(pthread_t *id_ptr, const pthread_attr_t *attribute
     using create_func = int (*)(pthread_t *, const pthread_attr_t *, void *(*)(void *), void *);
     static const create_func next = reinterpret_cast<create_func>(dlsym(RTLD_NEXT, "pthread_create"));
     const int error = next(id_ptr, attributes_ptr, body, argument);
-    if (void (*const pause)() = g_pause.exchange(nullptr); pause != nullptr) {
+    if (void (*const pause)() = std::exchange(t_pause, nullptr); pause != nullptr) {
         pause();
     }
     return error;

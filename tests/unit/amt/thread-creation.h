@@ -14,5 +14,5 @@ public:
     no_threads_c &operator=(const no_threads_c &) = delete;
 };
 
-/* What the next creation calls, by the creator, when the new thread may run already; nullptr forgets it. */
+/* What the calling thread's next creation calls, on that thread, when the new one may run already. */
 void thread_creation_pause_once(void (*pause)());

@@ -351,14 +351,12 @@ TEST_F(worker, that_ends_before_its_start_is_over_leaves_no_record)
 TEST_F(worker, that_is_stopped_before_its_start_is_over_is_stopped)
 {
     std::thread starter([] {
-        wait_for(g_is_looked_at, 1);
+        thread_creation_pause_once([] {
+            wait_for(g_released, 1);
+            usleep(START_US);
+        });
         EXPECT_EQ(amt_worker_start(g_worker_ptr, wait_for_ever), 0);
     });
-    thread_creation_pause_once([] {
-        wait_for(g_released, 1);
-        usleep(START_US);
-    });
-    g_is_looked_at = 1;
     wait_for(g_step, STEP_STARTED);
     g_released = 1;
     amt_worker_stop(g_worker_ptr);
